@@ -1,0 +1,23 @@
+/* Plain functions of libfileindex, with C linkage. */
+#pragma once
+
+#ifdef __cplusplus
+extern "C" {
+#endif
+
+/* 1 when the share holds an indexed folder; 0 when not or on any failure. */
+int FILEIDXIsShareIndexed(const char* share);
+/* 1 when the share path lies in an indexed folder; 0 when not or on any failure. */
+int FILEIDXIsPathIndexed(const char* path);
+/* 1 when the full path lies in an indexed folder; 0 when not or on any failure. */
+int FILEIDXIsFullPathIndexed(const char* full_path);
+
+/* The share's index database directory (created) and event queue file path, written with
+ * snprintf semantics into the buffer. Returns the length written, -1 on a bad argument or an
+ * unknown share. */
+int FILEIDXDBPathGet(const char* szName, char* szOutDBPath, int cbOutLen);
+int FILEIDXQueuePathGet(const char* szName, char* szOutQueuePath, int cbOutLen);
+
+#ifdef __cplusplus
+}
+#endif

@@ -1,0 +1,46 @@
+// folder.conf: the list of indexed folders, keyed by share path.
+#pragma once
+
+#include <map>
+#include <string>
+#include <vector>
+
+#include <json/value.h>
+
+#include "fileindex/config.h"
+#include "fileindex/folder.h"
+
+namespace QIRA {
+namespace FILEINDEX {
+
+constexpr size_t MAX_FOLDER_COUNT = 1000;
+
+class Folders : public Config {
+public:
+    ~Folders() override;
+
+    bool Load() override;
+    bool Save() override;
+    std::string GetLockPath() const override;
+    std::string GetPath() const override;
+
+    bool Get(Json::Value& out, const std::string& path);
+    bool List(std::vector<Folder>& out);
+    bool List(std::vector<Folder>& out, const std::string& share);
+    // Sorted, paged listing: {"total", "offset", "folder"}. An offset above the number of
+    // folders yields an empty page.
+    bool List(Json::Value& out, unsigned long offset, unsigned long limit, const std::string& sort_by,
+              const std::string& sort_direction, const Json::Value& additional);
+    // Adds or updates one folder in memory; `changed` = which media switches changed.
+    bool Upsert(Json::Value& changed, const Json::Value& request);
+    // Removes one folder in memory; `changed` = {path: which media switches changed}.
+    bool Delete(Json::Value& changed, const std::string& path);
+
+    size_t Count() const { return folders.size(); }
+
+private:
+    std::map<std::string, Folder> folders;
+};
+
+}  // namespace FILEINDEX
+}  // namespace QIRA

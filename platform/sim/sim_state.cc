@@ -1,0 +1,160 @@
+#include "sim_state.h"
+
+#include <fcntl.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstdlib>
+#include <fstream>
+#include <memory>
+#include <sstream>
+
+#include <json/reader.h>
+#include <json/writer.h>
+
+#include "qira/qlib_core.h"
+#include "qira_sim/appliance.h"
+
+namespace qira_sim {
+namespace detail {
+namespace {
+
+bool ParseJson(const std::string& text, Json::Value& out) {
+    Json::CharReaderBuilder builder;
+    builder["collectComments"] = false;
+    std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
+    std::string errors;
+    try {
+        return reader->parse(text.data(), text.data() + text.size(), &out, &errors);
+    } catch (const std::exception&) {
+        return false;
+    }
+}
+
+std::string Serialise(const Json::Value& value) {
+    Json::StreamWriterBuilder builder;
+    builder["indentation"] = "";
+    builder["emitUTF8"] = true;
+    return Json::writeString(builder, value);
+}
+
+// Holds the simulation's lock file for the lifetime of the object.
+class StateLock {
+public:
+    StateLock() : fd_(open(StatePath("sim.lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0644)) {
+        if (fd_ >= 0) flock(fd_, LOCK_EX);
+    }
+    ~StateLock() {
+        if (fd_ >= 0) close(fd_);
+    }
+    StateLock(const StateLock&) = delete;
+    StateLock& operator=(const StateLock&) = delete;
+
+private:
+    int fd_;
+};
+
+int g_error_code = 0;
+std::string g_error_file;
+int g_error_line = 0;
+
+}  // namespace
+
+std::string StatePath(const std::string& name) { return StateDir() + "/" + name; }
+
+Json::Value ReadState(const std::string& name, const Json::Value& fallback) {
+    std::ifstream in(StatePath(name));
+    if (!in) return fallback;
+    std::stringstream text;
+    text << in.rdbuf();
+    Json::Value value;
+    if (!ParseJson(text.str(), value)) return fallback;
+    return value;
+}
+
+void WriteState(const std::string& name, const Json::Value& value) {
+    const std::string path = StatePath(name);
+    const std::string tmp = path + ".tmp." + std::to_string(getpid());
+    {
+        std::ofstream out(tmp, std::ios::trunc);
+        out << Serialise(value) << "\n";
+    }
+    rename(tmp.c_str(), path.c_str());
+}
+
+void UpdateState(const std::string& name, const Json::Value& fallback,
+                 const std::function<void(Json::Value&)>& change) {
+    StateLock lock;
+    Json::Value value = ReadState(name, fallback);
+    change(value);
+    WriteState(name, value);
+}
+
+void AppendJournal(const std::string& op, const Json::Value& args, const Json::Value& result) {
+    Json::Value entry(Json::objectValue);
+    entry["op"] = op;
+    entry["args"] = args;
+    entry["result"] = result;
+    const std::string line = Serialise(entry) + "\n";
+    StateLock lock;
+    const int fd = open(StatePath("journal.jsonl").c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644);
+    if (fd < 0) return;
+    if (write(fd, line.data(), line.size()) < 0) {
+        // The journal is best effort: a full disk must not change the platform's answer.
+    }
+    close(fd);
+}
+
+bool Faulted(const char* op, const std::string& arg) {
+    const Json::Value faults = ReadState("faults.json", Json::Value(Json::objectValue));
+    if (!faults.isObject() || !faults.isMember(op)) return false;
+    const Json::Value& fault = faults[op];
+    if (!fault.isObject()) return false;
+    if (fault.isMember("arg") && fault["arg"].isString() && fault["arg"].asString() != arg) return false;
+    const int err = fault.get("err", 0x0100).isInt() ? fault.get("err", 0x0100).asInt() : 0x0100;
+    SetError(err, (std::string("sim/") + op).c_str(), 1);
+    return true;
+}
+
+void SetError(int code, const char* file, int line) {
+    g_error_code = code;
+    g_error_file = file ? file : "";
+    g_error_line = line;
+}
+
+bool IsUnder(const std::string& path, const std::string& dir) {
+    const std::string prefix = dir + "/";
+    const std::string probe = path + "/";
+    return probe.compare(0, prefix.size(), prefix) == 0;
+}
+
+bool FindShareOf(const std::string& fullPath, std::string& name, Json::Value& share) {
+    const Json::Value shares = ReadState("shares.json", Json::Value(Json::objectValue));
+    if (!shares.isObject()) return false;
+    size_t best = 0;
+    for (const auto& key : shares.getMemberNames()) {
+        const Json::Value& candidate = shares[key];
+        if (!candidate.isObject() || !candidate["path"].isString()) continue;
+        const std::string dir = candidate["path"].asString();
+        if (!IsUnder(fullPath, dir) || dir.size() < best) continue;
+        best = dir.size();
+        name = key;
+        share = candidate;
+    }
+    return best > 0;
+}
+
+}  // namespace detail
+}  // namespace qira_sim
+
+extern "C" {
+
+int QLIBCErrGet(void) { return qira_sim::detail::g_error_code; }
+
+void QLIBCErrSetEx(int code, const char* szFile, int line) { qira_sim::detail::SetError(code, szFile, line); }
+
+const char* QLIBCErrorGetFile(void) { return qira_sim::detail::g_error_file.c_str(); }
+
+int QLIBCErrorGetLine(void) { return qira_sim::detail::g_error_line; }
+}

@@ -1,0 +1,59 @@
+// The sorted, paged folder listing of the management interface.
+#include <algorithm>
+#include <functional>
+
+#include "fileindex/folders.h"
+#include "qira/qlib_core.h"
+
+namespace QIRA {
+namespace FILEINDEX {
+namespace {
+
+using Comparator = std::function<bool(const Folder&, const Folder&)>;
+
+Comparator FlagFalseFirst(bool Folder::*flag) {
+    return [flag](const Folder& a, const Folder& b) { return !(a.*flag) && (b.*flag); };
+}
+
+Comparator ChooseComparator(const std::string& sortBy) {
+    if (sortBy == "name") {
+        return [](const Folder& a, const Folder& b) {
+            return QLIBCUnicodeUTF8StrCaseCmp(a.name.c_str(), b.name.c_str()) < 0;
+        };
+    }
+    if (sortBy == "document") return FlagFalseFirst(&Folder::document);
+    if (sortBy == "audio") return FlagFalseFirst(&Folder::audio);
+    if (sortBy == "video") return FlagFalseFirst(&Folder::video);
+    if (sortBy == "photo") return FlagFalseFirst(&Folder::photo);
+    return [](const Folder& a, const Folder& b) {
+        return QLIBCUnicodeUTF8StrCaseCmp(a.path.c_str(), b.path.c_str()) < 0;
+    };
+}
+
+}  // namespace
+
+bool Folders::List(Json::Value& out, unsigned long offset, unsigned long limit, const std::string& sort_by,
+                   const std::string& sort_direction, const Json::Value& additional) {
+    std::vector<Folder> all;
+    List(all);
+    out = Json::Value(Json::objectValue);
+    out["total"] = static_cast<Json::UInt64>(all.size());
+    out["offset"] = static_cast<Json::UInt64>(offset);
+    std::sort(all.begin(), all.end(), ChooseComparator(sort_by));
+
+    // The page never reaches past the end: an offset beyond the list gives an empty page.
+    const unsigned long available = offset < all.size() ? all.size() - offset : 0;
+    const unsigned long count = std::min(limit, available);
+    Json::Value page(Json::arrayValue);
+    if (sort_direction == "DESC") {
+        // Deliberately the first `count` records reversed: the offset only shortens the page.
+        for (unsigned long i = count; i > 0; --i) page.append(all[i - 1].asJson(additional));
+    } else {
+        for (unsigned long i = offset; i < offset + count; ++i) page.append(all[i].asJson(additional));
+    }
+    out["folder"] = page;
+    return true;
+}
+
+}  // namespace FILEINDEX
+}  // namespace QIRA

@@ -1,0 +1,95 @@
+// Index queries: folder lists and the membership questions, also as plain functions.
+#include "fileindex/index_mgr.h"
+
+#include "fileindex/fileidx.h"
+#include "fileindex/folders.h"
+#include "fileindex/utils.h"
+#include "index_support.h"
+
+namespace QIRA {
+namespace FILEINDEX {
+
+bool IndexMgr::List(std::vector<Folder>& out) {
+    Folders folders;
+    return folders.Load() && folders.List(out);
+}
+
+bool IndexMgr::List(Json::Value& out, unsigned long offset, unsigned long limit, const std::string& sort_by,
+                    const std::string& sort_direction, const Json::Value& additional) {
+    Folders folders;
+    return folders.Load() && folders.List(out, offset, limit, sort_by, sort_direction, additional);
+}
+
+bool IndexMgr::Get(Json::Value& out, const std::string& path) {
+    Folders folders;
+    detail::UnlockOnExit unlock(folders);
+    return folders.Lock(true) && folders.Load() && folders.Get(out, path);
+}
+
+bool IndexMgr::IsShareIndexed(const std::string& share) {
+    std::vector<Folder> list;
+    if (!List(list)) return false;
+    for (const auto& folder : list) {
+        std::string name;
+        if (!GetShareNameByPath(name, folder.path)) {
+            FILEIDX_LOG("Failed to get share name from path: %s", folder.path.c_str());
+            continue;
+        }
+        if (name == share) return true;
+    }
+    return false;
+}
+
+bool IndexMgr::IsPathIndexed(const std::string& path) {
+    std::vector<Folder> list;
+    return List(list) && IsPathIndexed(path, list);
+}
+
+bool IndexMgr::IsPathContainIndexed(const std::string& path) {
+    std::vector<Folder> list;
+    return List(list) && IsPathContainIndexed(path, list);
+}
+
+bool IndexMgr::IsFullPathIndexed(const std::string& full_path) {
+    std::vector<Folder> list;
+    return List(list) && IsFullPathIndexed(full_path, list);
+}
+
+bool IndexMgr::IsPathIndexed(const std::string& path, const std::vector<Folder>& list) {
+    const std::string probe = path + "/";
+    for (const auto& folder : list) {
+        if (StringStartWith(probe, folder.path + "/")) return true;
+    }
+    return false;
+}
+
+bool IndexMgr::IsPathContainIndexed(const std::string& path, const std::vector<Folder>& list) {
+    const std::string prefix = path + "/";
+    for (const auto& folder : list) {
+        if (StringStartWith(folder.path + "/", prefix)) return true;
+    }
+    return false;
+}
+
+bool IndexMgr::IsFullPathIndexed(const std::string& full_path, const std::vector<Folder>& list) {
+    const std::string probe = full_path + "/";
+    for (const auto& folder : list) {
+        if (StringStartWith(probe, folder.GetFullPath() + "/")) return true;
+    }
+    return false;
+}
+
+}  // namespace FILEINDEX
+}  // namespace QIRA
+
+extern "C" int FILEIDXIsShareIndexed(const char* share) {
+    return QIRA::FILEINDEX::IndexMgr::IsShareIndexed(std::string(share)) ? 1 : 0;
+}
+
+extern "C" int FILEIDXIsPathIndexed(const char* path) {
+    return QIRA::FILEINDEX::IndexMgr::IsPathIndexed(std::string(path)) ? 1 : 0;
+}
+
+extern "C" int FILEIDXIsFullPathIndexed(const char* full_path) {
+    return QIRA::FILEINDEX::IndexMgr::IsFullPathIndexed(std::string(full_path)) ? 1 : 0;
+}

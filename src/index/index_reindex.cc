@@ -1,0 +1,65 @@
+// Reindex: validate every path, revive out-of-space shares, queue reindex events.
+#include <set>
+
+#include "fileindex/index_mgr.h"
+#include "fileindex/json.h"
+#include "fileindex/status_mgr.h"
+#include "fileindex/utils.h"
+#include "index_support.h"
+
+namespace QIRA {
+namespace FILEINDEX {
+namespace {
+
+bool Malformed(const Json::Value& value) {
+    FILEIDX_LOG("Malformed jsArrPath: %s", toString(value).c_str());
+    ErrorHandler::SetError(FILEINDEX_ERR_BAD_PARAM);
+    return false;
+}
+
+// Nothing changes unless every element is a path in an indexed share.
+bool Validate(const Json::Value& paths, std::set<std::string>& noSpaceShares) {
+    for (const auto& element : paths) {
+        if (!element.isString()) return Malformed(element);
+        std::string share;
+        if (!GetShareNameByPath(share, element.asString())) {
+            FILEIDX_LOG("Failed to get share name from path: %s", element.asString().c_str());
+            return false;
+        }
+        if (!IndexMgr::IsShareIndexed(share)) return false;
+        if (StatusMgr::ShareIsNoSpace(share)) noSpaceShares.insert(share);
+    }
+    return true;
+}
+
+bool QueueReindexEvents(const Json::Value& paths) {
+    for (const auto& element : paths) {
+        const std::string path = element.asString();
+        std::string fullPath;
+        if (!GetFullPath(fullPath, path)) {
+            FILEIDX_LOG("GetFullPath failed, path=%s", path.c_str());
+            ErrorHandler::SetError(FILEINDEX_ERR_PATH);
+            return false;
+        }
+        if (!AddCustomEvent(kEventReindex, fullPath, Json::Value())) {
+            FILEIDX_LOG("AddCustomEvent failed, path=%s", path.c_str());
+            return false;
+        }
+    }
+    return true;
+}
+
+}  // namespace
+
+bool IndexMgr::Reindex(const Json::Value& paths) {
+    if (!paths.isArray()) return Malformed(paths);
+    std::set<std::string> noSpaceShares;
+    if (!Validate(paths, noSpaceShares)) return false;
+    for (const auto& share : noSpaceShares) {
+        if (!StatusMgr::ShareRevive(share)) FILEIDX_LOG("ShareRevice failed, share=%s", share.c_str());
+    }
+    return QueueReindexEvents(paths);
+}
+
+}  // namespace FILEINDEX
+}  // namespace QIRA

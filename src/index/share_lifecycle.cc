@@ -1,0 +1,96 @@
+// Following the life of a share: removal, rename, pause, resume and wiping its index data.
+#include "fileindex/fileidx.h"
+#include "fileindex/folders.h"
+#include "fileindex/index_mgr.h"
+#include "fileindex/utils.h"
+#include "index_support.h"
+#include "queue_file.h"
+
+namespace QIRA {
+namespace FILEINDEX {
+namespace {
+
+Json::Value ShareData(const std::string& share) {
+    Json::Value data(Json::objectValue);
+    data["share_name"] = share;
+    return data;
+}
+
+bool LockAndListShare(Folders& folders, const std::string& share, std::vector<Folder>& list) {
+    return folders.Lock(true) && folders.Load() && folders.List(list, share);
+}
+
+// "@eaDir" must be a real directory before anything inside it is removed.
+bool HasRealEaDir(const std::string& storagePath) {
+    const size_t slash = storagePath.rfind('/');
+    return slash != std::string::npos && IsDirExist(storagePath.substr(0, slash));
+}
+
+void RemoveTree(const std::string& path) { QLIBCExec("/bin/rm", "-rf", path.c_str(), nullptr, nullptr); }
+
+}  // namespace
+
+bool IndexMgr::ShareRemove(const std::string& share) {
+    Folders folders;
+    detail::UnlockOnExit unlock(folders);
+    std::vector<Folder> list;
+    if (!LockAndListShare(folders, share, list)) return false;
+    for (const auto& folder : list) {
+        Json::Value report;
+        if (!folders.Delete(report, folder.path)) return false;
+    }
+    if (!folders.Save()) return false;
+    if (folders.Count() == 0) detail::StopIndexingServices();
+    return true;
+}
+
+bool IndexMgr::ShareRename(const std::string& oldName, const std::string& newName) {
+    Folders folders;
+    detail::UnlockOnExit unlock(folders);
+    std::vector<Folder> list;
+    if (!LockAndListShare(folders, oldName, list)) return false;
+    for (auto& folder : list) {
+        Json::Value report;
+        if (!folders.Delete(report, folder.path)) return false;
+        folder.SetPath(ReplaceShareName(folder.path, newName));
+        if (!folders.Upsert(report, folder.asJson())) return false;
+    }
+    return folders.Save();
+}
+
+bool IndexMgr::SharePause(const std::string& share) {
+    if (!SendCammandToDaemon("delete_share_worker", ShareData(share))) return false;
+    if (!DeleteQIRANotifydCfg(share)) {
+        FILEIDX_LOG("DeleteQIRANotifydCfg failed, share=%s", share.c_str());
+        return false;
+    }
+    return true;
+}
+
+bool IndexMgr::ShareResume(const std::string& share) {
+    if (!UpsertQIRANotifydCfg(share)) {
+        FILEIDX_LOG("UpsertQIRANotifydCfg failed, share=%s", share.c_str());
+        return false;
+    }
+    return SendCammandToDaemon("revive_share_worker", ShareData(share));
+}
+
+bool IndexMgr::CleanShareIndexData(const std::string& share) {
+    std::string queuePath;
+    if (!detail::ShareQueuePath(share, queuePath)) return false;
+    const bool removable = HasRealEaDir(queuePath);
+    if (removable) {
+        RemoveTree(queuePath);
+        RemoveTree(queuePath + ".tmp");
+    }
+    char dbPath[4096] = {0};
+    if (FILEIDXDBPathGet(share.c_str(), dbPath, sizeof dbPath) < 0) {
+        FILEIDX_LOG("FILEIDXDBPathGet failed, share=%s", share.c_str());
+        return false;
+    }
+    if (removable && HasRealEaDir(dbPath)) RemoveTree(dbPath);
+    return true;
+}
+
+}  // namespace FILEINDEX
+}  // namespace QIRA

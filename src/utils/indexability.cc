@@ -1,0 +1,151 @@
+// Which shares, paths and file names may be indexed; room for the index; governing folder.
+#include <climits>
+#include <cstdlib>
+#include <cstring>
+#include <memory>
+
+#include "fileindex/utils.h"
+#include "log.h"
+#include "qira/qira_fs.h"
+#include "qira/qira_quota.h"
+#include "qira/qira_share.h"
+#include "qira/qlib_core.h"
+
+namespace QIRA {
+namespace FILEINDEX {
+namespace {
+
+const std::vector<std::string> kSystemPreservedNames = {".TemporaryItems", "QIRA@.fileindexdb",
+                                                        "QIRA@file_index_queue", ".QIRAPPSDB", ".DS_Store"};
+const std::vector<std::string> kSkippedShareNames = {"surveillance", "NetBackup"};
+
+constexpr int kNeverIndexedFsType = 12;
+constexpr unsigned long long kIndexSpaceNeeded = 10485760ULL;
+
+struct ShareDeleter {
+    void operator()(QIRASHARE* share) const { QIRAShareFree(share); }
+};
+using SharePtr = std::unique_ptr<QIRASHARE, ShareDeleter>;
+
+bool Contains(const std::string& text, const char* part) { return text.find(part) != std::string::npos; }
+
+bool InRecycleBin(const std::string& fullPath) {
+    return Contains(fullPath, "#recycle") && QIRAShareIsShareRecycle(fullPath.c_str()) != 0;
+}
+
+bool InSnapshot(const std::string& fullPath) {
+    if (!Contains(fullPath, "#snapshot")) return false;
+    int inSnapshot = 0;
+    return QLIBFhsPathInSnapshot(fullPath.c_str(), &inSnapshot) == 0 && inSnapshot == 1;
+}
+
+bool IsUnindexableFsType(int type) {
+    return QIRAFSIsRemoteFS(type) != 0 || QIRAFSIsImageFS(type) != 0 || type == kNeverIndexedFsType;
+}
+
+bool IsListed(const std::vector<std::string>& names, const std::string& name) {
+    for (const auto& listed : names) {
+        if (listed == name) return true;
+    }
+    return false;
+}
+
+// A mount point may be indexed only in a share that uses encryption.
+bool IsForbiddenMountPoint(const std::string& fullPath, QIRASHARE* share) {
+    int isEncryption = 0;
+    return QIRAFSDirIsMntPoint(fullPath.c_str()) == 1 && QLIBShareIsEncryptionGet(share, &isEncryption) == 0 &&
+           isEncryption == 0;
+}
+
+bool IsCanonical(const std::string& fullPath) {
+    char resolved[4096];
+    return realpath(fullPath.c_str(), resolved) != nullptr && fullPath == resolved;
+}
+
+}  // namespace
+
+bool IsSystemPreservedFileName(const std::string& name) {
+    return QIRAEAIsHiddenDir(name.c_str()) == 1 || IsListed(kSystemPreservedNames, name);
+}
+
+bool IsSkipIndex(const std::string& fullPath) {
+    const int type = QIRAGetFSType(fullPath.c_str(), 0);
+    const size_t slash = fullPath.rfind('/');
+    if (slash == std::string::npos) return true;
+    if (IsSystemPreservedFileName(fullPath.substr(slash + 1))) return true;
+    if (InRecycleBin(fullPath) || InSnapshot(fullPath)) return true;
+    if (type == -1) return false;
+    return IsUnindexableFsType(type);
+}
+
+bool CanShareBeIndexed(_tag_QIRASHARE* share) {
+    if (share == nullptr || IsListed(kSkippedShareNames, share->szName)) return false;
+    int encrypted = 0;
+    int readOnly = 0;
+    if (QLIBShareIsEncryptedGet(share, &encrypted) < 0) return false;
+    if (QLIBShareIsReadOnlyGet(share, &readOnly) < 0 || encrypted != 0) return false;
+    return readOnly == 0;
+}
+
+bool CanPathBeIndexed(const std::string& path) {
+    std::string fullPath;
+    if (!GetFullPath(fullPath, path)) {
+        FILEIDX_LOG("GetFullPath failed, path=%s", path.c_str());
+        ErrorHandler::SetError(FILEINDEX_ERR_PATH);
+        return false;
+    }
+    return CanFullPathBeIndexed(fullPath);
+}
+
+bool CanFullPathBeIndexed(const std::string& fullPath) {
+    if (InRecycleBin(fullPath) || InSnapshot(fullPath)) return false;
+    const int type = QIRAGetFSType(fullPath.c_str(), 0);
+    if (type == -1 || IsUnindexableFsType(type)) return false;
+    std::string shareName;
+    std::string sharePath;
+    if (!GetShareNamePathByFullPath(shareName, sharePath, fullPath)) {
+        FILEIDX_LOG("GetShareNamePathByFullPath failed, path=%s", fullPath.c_str());
+        return false;
+    }
+    QIRASHARE* raw = nullptr;
+    if (QIRAShareGet(shareName.c_str(), &raw) < 0) {
+        FILEIDX_LOG("QIRAShareGet failed, share=%s", shareName.c_str());
+        return false;
+    }
+    const SharePtr share(raw);
+    if (!CanShareBeIndexed(share.get())) return false;
+    if (IsForbiddenMountPoint(fullPath, share.get())) {
+        FILEIDX_LOG("Mount point[%s] is not allowed to be indexed", fullPath.c_str());
+        return false;
+    }
+    if (!IsCanonical(fullPath)) {
+        FILEIDX_LOG("check realpath failed, path=%s", fullPath.c_str());
+        return false;
+    }
+    return true;
+}
+
+bool IsShareSpaceEnough(const std::string& shareName) {
+    QIRASHARE* raw = nullptr;
+    if (QIRAShareGet(shareName.c_str(), &raw) < 0) {
+        FILEIDX_LOG("QIRAShareGet failed, share=%s", shareName.c_str());
+        return false;
+    }
+    const SharePtr share(raw);
+    if (QIRAQuotaIsEnough(0, share->szPath, kIndexSpaceNeeded) != 0) return true;
+    const int err = QLIBCErrGet();
+    return err != QLIBC_ERR_NO_SPACE && err != QLIBC_ERR_QUOTA_EXCEEDED;
+}
+
+Json::Value GetMostSuitableCfg(std::vector<Folder> folders, const std::string& fullPath) {
+    const Folder* chosen = nullptr;
+    const std::string probe = fullPath + "/";
+    for (const auto& folder : folders) {
+        const std::string folderPath = folder.GetFullPath();
+        if (!folderPath.empty() && StringStartWith(probe, folderPath + "/")) chosen = &folder;
+    }
+    return chosen ? chosen->asJson() : Json::Value(Json::objectValue);
+}
+
+}  // namespace FILEINDEX
+}  // namespace QIRA
