@@ -45,6 +45,26 @@ const Json::StreamWriterBuilder& CompactWriter() {
     return builder;
 }
 
+// jsoncpp skips comments inside objects and arrays even when comments are not allowed; in strict
+// JSON a '/' can only stand inside a string.
+bool HasSlashOutsideStrings(const std::string& text) {
+    bool inString = false;
+    bool escaped = false;
+    for (const char c : text) {
+        if (escaped) {
+            escaped = false;
+        } else if (inString) {
+            escaped = c == '\\';
+            inString = c != '"';
+        } else if (c == '"') {
+            inString = true;
+        } else if (c == '/') {
+            return true;
+        }
+    }
+    return false;
+}
+
 bool ReadWholeFile(const std::string& path, std::string& text) {
     const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
     if (fd < 0) return false;
@@ -69,6 +89,7 @@ bool WriteAll(int fd, const std::string& text) {
 }  // namespace
 
 bool fromString(Json::Value& out, const std::string& text) {
+    if (HasSlashOutsideStrings(text)) return false;
     std::unique_ptr<Json::CharReader> reader(StrictReader().newCharReader());
     Json::Value parsed;
     std::string errors;

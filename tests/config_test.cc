@@ -1,0 +1,197 @@
+// Error state, configuration loading and saving, and the advisory lock between processes.
+#include <signal.h>
+#include <sys/stat.h>
+#include <syslog.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <string>
+
+#include "fileindex/folders.h"
+#include "fileindex/status.h"
+#include "log_capture.h"
+#include "sandbox.h"
+
+using namespace QIRA::FILEINDEX;
+using testkit::Logged;
+
+namespace {
+
+class ConfigTest : public testkit::Sandbox {};
+
+// Runs `child` in a forked process that signals readiness through a pipe, then waits for the
+// parent to release it.
+class ChildHolding {
+public:
+    template <typename F>
+    explicit ChildHolding(F child) {
+        int ready[2];
+        if (pipe(ready) != 0 || pipe(release_) != 0) throw std::runtime_error("pipe");
+        pid_ = fork();
+        if (pid_ == 0) {
+            close(ready[0]);
+            const char ok = child() ? 'y' : 'n';
+            if (write(ready[1], &ok, 1) != 1) _exit(2);
+            char go;
+            if (read(release_[0], &go, 1) < 0) _exit(2);
+            _exit(0);
+        }
+        close(ready[1]);
+        if (read(ready[0], &state_, 1) != 1) state_ = '?';
+        close(ready[0]);
+    }
+    ~ChildHolding() {
+        const char go = 'g';
+        if (write(release_[1], &go, 1) != 1) kill(pid_, SIGKILL);
+        waitpid(pid_, nullptr, 0);
+    }
+    bool ChildSucceeded() const { return state_ == 'y'; }
+
+private:
+    pid_t pid_ = -1;
+    int release_[2] = {-1, -1};
+    char state_ = '?';
+};
+
+TEST(ErrorHandlerTest, CodeIsStickyAndTheLaterFailureWins) {
+    ErrorHandler::SetError(FILEINDEX_ERR_LOCK);
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
+    ErrorHandler::SetError(FILEINDEX_ERR_PATH);
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_PATH);
+    EXPECT_EQ(static_cast<int>(FILEINDEX_ERR_MALFORMED_FOLDERS), 8);
+    EXPECT_EQ(LOG_LEVEL, 3);
+}
+
+TEST_F(ConfigTest, MissingFileLoadsAsEmptyConfiguration) {
+    Folders folders;
+    ASSERT_TRUE(folders.Load());
+    std::vector<Folder> list;
+    folders.List(list);
+    EXPECT_TRUE(list.empty());
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NONE);
+}
+
+TEST_F(ConfigTest, UnparsableFilesFailWithErrorSixAndTheirPath) {
+    const std::string nested(100000, '[');
+    for (const std::string& content : std::vector<std::string>{"", "{\"a\": ", "not json", "{} {}", "{/*c*/}", nested}) {
+        testkit::WriteFile(StatusConf(), content);
+        testkit::ClearError();
+        testkit::ClearLog();
+        Status status;
+        EXPECT_FALSE(status.Load()) << content.substr(0, 20);
+        EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOAD_JSON);
+        EXPECT_TRUE(Logged("Failed to load json from " + StatusConf()));
+        ASSERT_EQ(testkit::LogLines().size(), 1u);
+        EXPECT_EQ(testkit::LogLines()[0].source, "config.cc");
+        EXPECT_EQ(testkit::LogLines()[0].priority, LOG_ERR);
+    }
+}
+
+TEST_F(ConfigTest, SaveReplacesTheFileWithMode0644AndNoTemporaryLeft) {
+    Status status;
+    status.Pause(0);
+    ASSERT_TRUE(status.Save());
+    EXPECT_EQ(testkit::ReadFile(StatusConf()), "{\"resume_time\":0}\n");
+    struct stat st;
+    ASSERT_EQ(stat(StatusConf().c_str(), &st), 0);
+    EXPECT_EQ(st.st_mode & 0777, 0644u);
+    EXPECT_FALSE(testkit::Exists(StatusConf() + ".tmp"));
+}
+
+TEST_F(ConfigTest, SaveIntoAMissingDirectoryFailsWithErrorSeven) {
+    rmdir(Path("/usr/qira/etc/fileindex").c_str());
+    Status status;
+    EXPECT_FALSE(status.Save());
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_SAVE_JSON);
+    EXPECT_TRUE(Logged("Failed to save json to " + StatusConf()));
+}
+
+TEST_F(ConfigTest, ExclusiveLockFailsWhileAnotherProcessHoldsAShareLock) {
+    ChildHolding reader([] {
+        Folders folders;
+        return folders.Lock(false);
+    });
+    ASSERT_TRUE(reader.ChildSucceeded());
+    Folders shared;
+    EXPECT_TRUE(shared.Lock(false));
+    shared.Unlock();
+    Folders writer;
+    EXPECT_FALSE(writer.Lock(true));
+    writer.Unlock();
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
+    EXPECT_TRUE(Logged("Failed to lock folder"));
+}
+
+TEST_F(ConfigTest, LockIsFreeAgainWhenTheHolderUnlocks) {
+    Folders first;
+    ASSERT_TRUE(first.Lock(true));
+    Folders second;
+    EXPECT_FALSE(second.Lock(true));  // two descriptors of one process conflict too
+    second.Unlock();
+    first.Unlock();
+    Folders third;
+    EXPECT_TRUE(third.Lock(true));
+    third.Unlock();
+}
+
+TEST_F(ConfigTest, StatusLockUsesItsOwnFileAndTheSameMessage) {
+    Folders folders;
+    ASSERT_TRUE(folders.Lock(true));
+    Status status;
+    EXPECT_TRUE(status.Lock(true));
+    Status other;
+    EXPECT_FALSE(other.Lock(true));
+    EXPECT_TRUE(Logged("Failed to lock folder"));
+    other.Unlock();
+    status.Unlock();
+    folders.Unlock();
+    EXPECT_TRUE(testkit::Exists(Path("/tmp/fileidx_cfg_folder.lock")));
+    EXPECT_TRUE(testkit::Exists(Path("/tmp/fileidx_cfg_status.lock")));
+}
+
+TEST_F(ConfigTest, LockRefusesASymbolicLinkOrANonRegularLockFile) {
+    const std::string canary = Path("/canary");
+    testkit::WriteFile(canary, "keep");
+    ASSERT_EQ(symlink(canary.c_str(), Path("/tmp/fileidx_cfg_folder.lock").c_str()), 0);
+    Folders folders;
+    EXPECT_FALSE(folders.Lock(true));
+    folders.Unlock();
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
+    mkdir(Path("/tmp/fileidx_cfg_status.lock").c_str(), 0755);
+    Status status;
+    EXPECT_FALSE(status.Lock(true));
+    status.Unlock();
+    EXPECT_EQ(testkit::ReadFile(canary), "keep");
+}
+
+TEST_F(ConfigTest, UnlockWithoutLockDoesNothing) {
+    Folders folders;
+    folders.Unlock();
+    Folders other;
+    EXPECT_TRUE(other.Lock(true));
+    other.Unlock();
+}
+
+TEST_F(ConfigTest, ReaderNeverSeesAPartialFileWhileAnotherProcessSaves) {
+    const pid_t writer = fork();
+    if (writer == 0) {
+        for (int round = 0; round < 300; ++round) {
+            Status status;
+            status.Load();
+            for (int i = 0; i < 50; ++i) status.SetUpdated("marker_" + std::to_string(round) + "_" + std::to_string(i));
+            status.Save();
+        }
+        _exit(0);
+    }
+    int reads = 0;
+    int status = 0;
+    while (waitpid(writer, &status, WNOHANG) == 0) {
+        Status reader;
+        ASSERT_TRUE(reader.Load()) << "partial file seen";
+        ++reads;
+    }
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0);
+    EXPECT_GT(reads, 0);
+}
+
+}  // namespace

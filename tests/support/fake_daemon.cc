@@ -1,0 +1,62 @@
+#include "fake_daemon.h"
+
+#include <fcntl.h>
+#include <sys/socket.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include <cstring>
+#include <stdexcept>
+
+#include "fileindex/json.h"
+
+namespace testkit {
+
+FakeDaemon::FakeDaemon(const std::string& socketPath) : fd_(-1), path_(socketPath) {
+    unlink(path_.c_str());
+    fd_ = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
+    sockaddr_un address;
+    std::memset(&address, 0, sizeof address);
+    address.sun_family = AF_UNIX;
+    std::strncpy(address.sun_path, path_.c_str(), sizeof address.sun_path - 1);
+    if (fd_ < 0 || bind(fd_, reinterpret_cast<sockaddr*>(&address), sizeof address) != 0 || listen(fd_, 512) != 0) {
+        throw std::runtime_error("fake daemon cannot listen on " + path_);
+    }
+}
+
+FakeDaemon::~FakeDaemon() {
+    close(fd_);
+    unlink(path_.c_str());
+}
+
+Frame FakeDaemon::Decode(const std::string& bytes) {
+    Frame frame;
+    if (bytes.size() < 4) return frame;
+    std::memcpy(&frame.length, bytes.data(), 4);
+    frame.payload = bytes.substr(4);
+    frame.whole = frame.payload.size() == frame.length && !frame.payload.empty() && frame.payload.back() == '\0';
+    if (frame.whole) QIRA::FILEINDEX::fromString(frame.message, frame.payload.substr(0, frame.payload.size() - 1));
+    return frame;
+}
+
+std::vector<Frame> FakeDaemon::Drain() {
+    std::vector<Frame> frames;
+    int client;
+    while ((client = accept4(fd_, nullptr, nullptr, SOCK_CLOEXEC)) >= 0) {
+        std::string bytes;
+        char buffer[4096];
+        ssize_t got;
+        while ((got = read(client, buffer, sizeof buffer)) > 0) bytes.append(buffer, static_cast<size_t>(got));
+        close(client);
+        frames.push_back(Decode(bytes));
+    }
+    return frames;
+}
+
+std::vector<Json::Value> FakeDaemon::Messages() {
+    std::vector<Json::Value> messages;
+    for (const auto& frame : Drain()) messages.push_back(frame.message);
+    return messages;
+}
+
+}  // namespace testkit

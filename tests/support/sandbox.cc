@@ -1,0 +1,105 @@
+#include "sandbox.h"
+
+#include <ftw.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstdlib>
+#include <fstream>
+#include <sstream>
+
+#include "fileindex/json.h"
+#include "log_capture.h"
+#include "qira_sim/appliance.h"
+
+namespace testkit {
+namespace {
+
+int RemoveEntry(const char* path, const struct stat*, int, struct FTW*) { return remove(path); }
+
+}  // namespace
+
+void Sandbox::SetUp() {
+    char tmpl[] = "/tmp/fileindex-test-XXXXXX";
+    ASSERT_NE(mkdtemp(tmpl), nullptr);
+    root_ = tmpl;
+    setenv("QIRA_ROOT", root_.c_str(), 1);
+    ASSERT_TRUE(qira_sim::InitAppliance(root_));
+    MakeDir(root_ + "/volume1");
+    ClearError();
+    ClearLog();
+}
+
+void Sandbox::TearDown() {
+    nftw(root_.c_str(), RemoveEntry, 16, FTW_DEPTH | FTW_PHYS);
+    unsetenv("QIRA_ROOT");
+}
+
+std::string Sandbox::ShareDir(const std::string& name) const { return root_ + "/volume1/" + name; }
+
+std::string Sandbox::AddShare(const std::string& name, const Json::Value& props) {
+    const std::string dir = ShareDir(name);
+    MakeDir(dir);
+    qira_sim::PutShare(name, dir, props);
+    return dir;
+}
+
+std::string Sandbox::QueueOf(const std::string& share) const {
+    return ShareDir(share) + "/@eaDir/QIRA@file_index_queue";
+}
+
+void Sandbox::MakeDir(const std::string& path) const {
+    std::string partial;
+    std::stringstream parts(path);
+    std::string part;
+    while (std::getline(parts, part, '/')) {
+        if (part.empty()) continue;
+        partial += "/" + part;
+        mkdir(partial.c_str(), 0755);
+    }
+}
+
+std::string ReadFile(const std::string& path) {
+    std::ifstream in(path);
+    std::stringstream text;
+    text << in.rdbuf();
+    return text.str();
+}
+
+void WriteFile(const std::string& path, const std::string& content) { std::ofstream(path, std::ios::trunc) << content; }
+
+bool Exists(const std::string& path) {
+    struct stat st;
+    return lstat(path.c_str(), &st) == 0;
+}
+
+Json::Value ParseJson(const std::string& text) {
+    Json::Value value;
+    if (!QIRA::FILEINDEX::fromString(value, text)) ADD_FAILURE() << "not JSON: " << text;
+    return value;
+}
+
+Json::Value J(const std::string& text) { return ParseJson(text); }
+
+std::vector<Json::Value> ReadJsonLines(const std::string& path) {
+    std::vector<Json::Value> records;
+    std::stringstream lines(ReadFile(path));
+    std::string line;
+    while (std::getline(lines, line)) records.push_back(ParseJson(line));
+    return records;
+}
+
+std::vector<std::string> JournalOps() {
+    std::vector<std::string> ops;
+    for (const auto& entry : qira_sim::Journal()) {
+        std::string text = entry["op"].asString();
+        for (const auto& arg : entry["args"]) {
+            if (arg.isString()) text += " " + arg.asString();
+            else if (arg.isIntegral()) text += " " + std::to_string(arg.asInt64());
+        }
+        ops.push_back(text);
+    }
+    return ops;
+}
+
+}  // namespace testkit

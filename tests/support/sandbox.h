@@ -1,0 +1,50 @@
+// Test kit: a fresh simulated appliance under its own QIRA_ROOT for every test.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+#include <json/value.h>
+
+#include "fileindex/error.h"
+
+namespace testkit {
+
+class Sandbox : public ::testing::Test {
+protected:
+    void SetUp() override;
+    void TearDown() override;
+
+    // Creates <root>/volume1/<name> and registers it as a share.
+    std::string AddShare(const std::string& name, const Json::Value& props = Json::Value());
+    std::string ShareDir(const std::string& name) const;
+    std::string Path(const std::string& fixedPath) const { return root_ + fixedPath; }
+    std::string FolderConf() const { return Path("/usr/qira/etc/fileindex/folder.conf"); }
+    std::string StatusConf() const { return Path("/usr/qira/etc/fileindex/status.conf"); }
+    std::string QueueOf(const std::string& share) const;
+    void MakeDir(const std::string& path) const;
+
+    const std::string& root() const { return root_; }
+
+private:
+    std::string root_;
+};
+
+// Whole file content ("" when missing) and writing one.
+std::string ReadFile(const std::string& path);
+void WriteFile(const std::string& path, const std::string& content);
+bool Exists(const std::string& path);
+Json::Value ParseJson(const std::string& text);
+std::vector<Json::Value> ReadJsonLines(const std::string& path);
+
+// Journal entries as "op" or "op arg1 arg2 ..." strings.
+std::vector<std::string> JournalOps();
+
+// Resets the sticky error code between steps of one test.
+inline void ClearError() { QIRA::FILEINDEX::ErrorHandler::SetError(QIRA::FILEINDEX::FILEINDEX_ERR_NONE); }
+
+// Builds a JSON value from text (test data).
+Json::Value J(const std::string& text);
+
+}  // namespace testkit
