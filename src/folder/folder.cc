@@ -11,13 +11,12 @@ namespace QIRA {
 namespace FILEINDEX {
 
 bool Folder::Load(const std::string& newPath, const Json::Value& obj) {
-    path = newPath;
     RetrieveStringFromJsonObj(name, "name", obj);
     RetrieveBoolFromJsonObj(document, "document", obj);
     RetrieveBoolFromJsonObj(audio, "audio", obj);
     RetrieveBoolFromJsonObj(video, "video", obj);
     RetrieveBoolFromJsonObj(photo, "photo", obj);
-    return QIRA::FILEINDEX::GetFullPath(full_path, path);
+    return SetPath(newPath);
 }
 
 bool Folder::Reload(const std::string& newPath, const Json::Value& obj) {
@@ -29,6 +28,7 @@ bool Folder::Reload(const std::string& newPath, const Json::Value& obj) {
 
 bool Folder::SetPath(const std::string& newPath) {
     path = newPath;
+    full_path.clear();  // empty, not stale, when the share does not resolve
     return QIRA::FILEINDEX::GetFullPath(full_path, path);
 }
 

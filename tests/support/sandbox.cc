@@ -103,3 +103,5 @@ std::vector<std::string> JournalOps() {
 }
 
 }  // namespace testkit
+
+void Json::PrintTo(const Json::Value& value, std::ostream* os) { *os << QIRA::FILEINDEX::toString(value); }

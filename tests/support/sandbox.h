@@ -48,3 +48,8 @@ inline void ClearError() { QIRA::FILEINDEX::ErrorHandler::SetError(QIRA::FILEIND
 Json::Value J(const std::string& text);
 
 }  // namespace testkit
+
+namespace Json {
+// Readable values in test failure messages.
+void PrintTo(const Value& value, std::ostream* os);
+}  // namespace Json

@@ -1,0 +1,191 @@
+// The folder record and folder.conf: layout, limit, change reports.
+#include "fileindex/folders.h"
+#include "fileindex/json.h"
+#include "log_capture.h"
+#include "qira_sim/appliance.h"
+#include "sandbox.h"
+
+using namespace QIRA::FILEINDEX;
+using testkit::J;
+
+namespace {
+
+class FolderTest : public testkit::Sandbox {
+protected:
+    void SetUp() override {
+        Sandbox::SetUp();
+        AddShare("music");
+        AddShare("Music");
+    }
+    Json::Value UpsertOne(Folders& folders, const std::string& request) {
+        Json::Value changed;
+        EXPECT_TRUE(folders.Upsert(changed, J(request)));
+        return changed;
+    }
+};
+
+Json::Value Flags(bool document, bool audio, bool video, bool photo) {
+    Json::Value flags(Json::objectValue);
+    flags["document"] = document;
+    flags["audio"] = audio;
+    flags["video"] = video;
+    flags["photo"] = photo;
+    return flags;
+}
+
+TEST_F(FolderTest, LoadMergesOnlyMembersOfTheRightType) {
+    Folder folder;
+    ASSERT_TRUE(folder.Reload("/music/live", J(R"({"name": "Live", "photo": true, "audio": true})")));
+    EXPECT_EQ(folder.full_path, ShareDir("music") + "/live");
+    folder.Load("/music/live", J(R"({"name": 5, "photo": "false", "audio": false})"));
+    EXPECT_EQ(folder.name, "Live");
+    EXPECT_TRUE(folder.photo);
+    EXPECT_FALSE(folder.audio);
+    folder.Reload("/music/live", J("{}"));
+    EXPECT_EQ(folder.asJson(), J(R"({"path": "/music/live", "name": "", "document": false, "audio": false,
+                                     "video": false, "photo": false})"));
+    EXPECT_FALSE(folder.SetPath("/gone/x"));
+    EXPECT_EQ(folder.path, "/gone/x");
+    EXPECT_EQ(folder.GetFullPath(), "");
+    EXPECT_TRUE(testkit::Logged("Failed to get full path from /gone/x"));
+    Json::Value notObject = J("[]");
+    EXPECT_FALSE(folder.AddToJson(notObject));
+    EXPECT_EQ(notObject, J("[]"));
+}
+
+TEST_F(FolderTest, SaveWritesSortedMembersWithTheSixKeysOnly) {
+    Folders folders;
+    UpsertOne(folders, R"({"path": "/music/b", "name": "B", "audio": true, "extra": 1})");
+    UpsertOne(folders, R"({"path": "/Music/a", "name": "A"})");
+    ASSERT_TRUE(folders.Save());
+    EXPECT_EQ(testkit::ReadFile(FolderConf()),
+              "{\"/Music/a\":{\"audio\":false,\"document\":false,\"name\":\"A\",\"path\":\"/Music/a\",\"photo\":false,"
+              "\"video\":false},\"/music/b\":{\"audio\":true,\"document\":false,\"name\":\"B\",\"path\":\"/music/b\","
+              "\"photo\":false,\"video\":false}}\n");
+    Folders reloaded;
+    ASSERT_TRUE(reloaded.Load());
+    std::vector<Folder> list;
+    reloaded.List(list);
+    ASSERT_EQ(list.size(), 2u);
+    EXPECT_EQ(list[0].asJson(), J(R"({"path":"/Music/a","name":"A","document":false,"audio":false,"video":false,"photo":false})"));
+    reloaded.List(list, "music");
+    ASSERT_EQ(list.size(), 1u);
+    EXPECT_EQ(list[0].path, "/music/b");
+}
+
+TEST_F(FolderTest, LoadTakesTheMemberNameAndKeepsUnresolvableFolders) {
+    testkit::WriteFile(FolderConf(), R"({"/music/x": {"path": "/other/y", "name": "X"}, "/gone/z": {"name": "Z"},
+                                        "/music/n": 7})");
+    Folders folders;
+    ASSERT_TRUE(folders.Load());
+    std::vector<Folder> list;
+    folders.List(list);
+    ASSERT_EQ(list.size(), 3u);
+    EXPECT_EQ(list[0].path, "/gone/z");
+    EXPECT_EQ(list[0].full_path, "");
+    EXPECT_EQ(list[1].path, "/music/n");
+    EXPECT_EQ(list[1].name, "");
+    EXPECT_EQ(list[2].path, "/music/x");
+    EXPECT_EQ(list[2].name, "X");
+}
+
+TEST_F(FolderTest, LoadAddsToTheMapWithoutReplacing) {
+    Folders folders;
+    UpsertOne(folders, R"({"path": "/music/x", "name": "memory"})");
+    testkit::WriteFile(FolderConf(), R"({"/music/x": {"name": "disk"}, "/music/y": {"name": "Y"}})");
+    ASSERT_TRUE(folders.Load());
+    Json::Value out;
+    ASSERT_TRUE(folders.Get(out, "/music/x"));
+    EXPECT_EQ(out["name"].asString(), "memory");
+    EXPECT_EQ(folders.Count(), 2u);
+}
+
+TEST_F(FolderTest, MalformedFolderConfFailsWithErrorEight) {
+    for (const char* text : {"[]", "7", "\"x\"", "null"}) {
+        testkit::WriteFile(FolderConf(), text);
+        testkit::ClearLog();
+        Folders folders;
+        EXPECT_FALSE(folders.Load()) << text;
+        EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_MALFORMED_FOLDERS);
+        EXPECT_TRUE(testkit::Logged(std::string("Malformed folders: ") + text));
+    }
+}
+
+TEST_F(FolderTest, GetFindsExactKeysOnly) {
+    Folders folders;
+    UpsertOne(folders, R"({"path": "/music/Live"})");
+    Json::Value out = "untouched";
+    EXPECT_FALSE(folders.Get(out, "/music/live"));
+    EXPECT_EQ(out.asString(), "untouched");
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NO_SUCH_FOLDER);
+    EXPECT_TRUE(testkit::Logged("No such folder: /music/live"));
+    EXPECT_TRUE(folders.Get(out, "/music/Live"));
+}
+
+TEST_F(FolderTest, UpsertRejectsBadRequestsAndLogsThemWhole) {
+    Folders folders;
+    for (const char* request : {R"({"path":7})", R"({"name":"x"})", R"({"path":"/nosuch/x"})", "[1]", "\"p\""}) {
+        testkit::ClearLog();
+        testkit::ClearError();
+        Json::Value changed = "untouched";
+        EXPECT_FALSE(folders.Upsert(changed, J(request))) << request;
+        EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
+        EXPECT_TRUE(testkit::Logged("Bad param: " + toString(J(request))));
+        EXPECT_EQ(changed.asString(), "untouched");
+    }
+    EXPECT_EQ(folders.Count(), 0u);
+}
+
+TEST_F(FolderTest, ChangeReportsAgainstTheGoverningFolder) {
+    Folders folders;
+    EXPECT_EQ(UpsertOne(folders, R"({"path": "/music/a", "audio": true})"), Flags(true, true, true, true));
+    EXPECT_EQ(UpsertOne(folders, R"({"path": "/music/a", "name": "renamed"})"), Flags(false, false, false, false));
+    EXPECT_EQ(UpsertOne(folders, R"({"path": "/music/a/b", "audio": true, "photo": true})"),
+              Flags(false, false, false, true));
+    Json::Value stored;
+    folders.Get(stored, "/music/a");
+    EXPECT_EQ(stored["name"].asString(), "renamed");
+    EXPECT_TRUE(stored["audio"].asBool());
+}
+
+TEST_F(FolderTest, DeleteNestsItsReportUnderThePath) {
+    Folders folders;
+    UpsertOne(folders, R"({"path": "/music/a", "audio": true})");
+    UpsertOne(folders, R"({"path": "/music/a/b", "photo": true})");
+    Json::Value changed;
+    ASSERT_TRUE(folders.Delete(changed, "/music/a/b"));
+    Json::Value expected(Json::objectValue);
+    expected["/music/a/b"] = Flags(false, true, false, true);
+    EXPECT_EQ(changed, expected);
+    ASSERT_TRUE(folders.Delete(changed, "/music/a/unknown"));
+    expected = Json::Value(Json::objectValue);
+    expected["/music/a/unknown"] = Flags(false, false, false, false);
+    EXPECT_EQ(changed, expected);
+    ASSERT_TRUE(folders.Delete(changed, "/music/ungoverned"));
+    EXPECT_EQ(changed["/music/ungoverned"], Flags(true, true, true, true));
+    changed = "untouched";
+    ASSERT_TRUE(folders.Delete(changed, "/nosuch/x"));
+    EXPECT_EQ(changed.asString(), "untouched");
+    ASSERT_TRUE(folders.Delete(changed, "/music/a"));
+    EXPECT_EQ(changed["/music/a"], Flags(true, true, true, true));
+}
+
+TEST_F(FolderTest, AThousandFoldersAtMostOnInsertButUpdatesStillWork) {
+    Folders folders;
+    for (int i = 0; i < 1000; ++i) UpsertOne(folders, R"({"path": "/music/f)" + std::to_string(i) + "\"}");
+    Json::Value changed;
+    EXPECT_TRUE(folders.Upsert(changed, J(R"({"path": "/music/f7", "name": "seven"})")));
+    testkit::ClearLog();
+    EXPECT_FALSE(folders.Upsert(changed, J(R"({"path": "/music/new"})")));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_EXCEED_MAX_FOLDER);
+    EXPECT_TRUE(testkit::Logged("Exceed max folder size"));
+}
+
+TEST_F(FolderTest, KeysAreCaseSensitive) {
+    Folders folders;
+    UpsertOne(folders, R"({"path": "/music/live"})");
+    UpsertOne(folders, R"({"path": "/music/Live"})");
+    EXPECT_EQ(folders.Count(), 2u);
+}
+
+}  // namespace

@@ -1,0 +1,98 @@
+// Share paths, full paths and the small helpers.
+#include "fileindex/utils.h"
+#include "log_capture.h"
+#include "qira_sim/appliance.h"
+#include "sandbox.h"
+
+using namespace QIRA::FILEINDEX;
+
+namespace {
+
+class PathsTest : public testkit::Sandbox {};
+
+TEST(ShareNameTest, FirstCharacterIsAlwaysDropped) {
+    std::string name = "untouched";
+    EXPECT_FALSE(GetShareNameByPath(name, ""));
+    EXPECT_EQ(name, "untouched");
+    const std::pair<const char*, const char*> cases[] = {
+        {"/music/live", "music"}, {"/music", "music"}, {"music/live", "usic"}, {"/", ""}, {"//x", ""}};
+    for (const auto& c : cases) {
+        ASSERT_TRUE(GetShareNameByPath(name, c.first));
+        EXPECT_EQ(name, c.second) << c.first;
+    }
+}
+
+TEST(ShareNameTest, ReplaceShareNameKeepsTheRest) {
+    EXPECT_EQ(ReplaceShareName("", "z"), "");
+    EXPECT_EQ(ReplaceShareName("/a/b/c", "z"), "/z/b/c");
+    EXPECT_EQ(ReplaceShareName("/music", "audio"), "/audio");
+    EXPECT_EQ(ReplaceShareName("/music/live", "audio"), "/audio/live");
+}
+
+TEST(HelpersTest, PrefixAndJsonMembers) {
+    EXPECT_TRUE(StringStartWith("abc", ""));
+    EXPECT_TRUE(StringStartWith("abc", "ab"));
+    EXPECT_FALSE(StringStartWith("ab", "abc"));
+    EXPECT_FALSE(StringStartWith("Abc", "ab"));
+    bool flag = true;
+    std::string text = "keep";
+    const auto obj = testkit::J(R"({"one": 1, "t": true, "s": "x", "n": null})");
+    EXPECT_FALSE(RetrieveBoolFromJsonObj(flag, "one", obj));
+    EXPECT_FALSE(RetrieveBoolFromJsonObj(flag, "missing", obj));
+    EXPECT_FALSE(RetrieveBoolFromJsonObj(flag, "t", testkit::J("[true]")));
+    EXPECT_TRUE(flag);
+    flag = false;
+    EXPECT_TRUE(RetrieveBoolFromJsonObj(flag, "t", obj));
+    EXPECT_TRUE(flag);
+    EXPECT_FALSE(RetrieveStringFromJsonObj(text, "n", obj));
+    EXPECT_FALSE(RetrieveStringFromJsonObj(text, "one", obj));
+    EXPECT_EQ(text, "keep");
+    EXPECT_TRUE(RetrieveStringFromJsonObj(text, "s", obj));
+    EXPECT_EQ(text, "x");
+}
+
+TEST_F(PathsTest, FullPathTakesTheVolumeFromTheSharesOwnPath) {
+    AddShare("music");
+    std::string full;
+    ASSERT_TRUE(GetFullPath(full, "/music"));
+    EXPECT_EQ(full, ShareDir("music"));
+    ASSERT_TRUE(GetFullPath(full, "/music/live//x/"));
+    EXPECT_EQ(full, ShareDir("music") + "/live//x/");
+    testkit::ClearLog();
+    EXPECT_FALSE(GetFullPath(full, "/nosuch/x"));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_PATH);
+    EXPECT_TRUE(testkit::LogLines().empty());
+    testkit::ClearError();
+    EXPECT_FALSE(GetFullPath(full, ""));
+    EXPECT_TRUE(testkit::Logged("GetShareNameByPath failed, path="));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NONE);
+}
+
+TEST_F(PathsTest, ShareOfAFullPathComesFromThePlatform) {
+    AddShare("music");
+    std::string name;
+    std::string inside;
+    ASSERT_TRUE(GetShareNamePathByFullPath(name, inside, ShareDir("music") + "/live"));
+    EXPECT_EQ(name, "music");
+    EXPECT_EQ(inside, "/live");
+    name = "keep";
+    EXPECT_FALSE(GetShareNamePathByFullPath(name, inside, Path("/volume1/other/x")));
+    EXPECT_EQ(name, "keep");
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_PATH);
+    EXPECT_TRUE(testkit::Logged("QIRAShareNamePathGet failed, path=" + Path("/volume1/other/x")));
+}
+
+TEST_F(PathsTest, FileTestsDoNotFollowSymbolicLinks) {
+    const std::string file = Path("/f");
+    testkit::WriteFile(file, "x");
+    ASSERT_EQ(symlink(file.c_str(), Path("/link").c_str()), 0);
+    ASSERT_EQ(symlink(Path("/volume1").c_str(), Path("/dirlink").c_str()), 0);
+    EXPECT_TRUE(IsFileExist(file));
+    EXPECT_FALSE(IsFileExist(Path("/link")));
+    EXPECT_FALSE(IsFileExist(Path("/volume1")));
+    EXPECT_TRUE(IsDirExist(Path("/volume1")));
+    EXPECT_FALSE(IsDirExist(Path("/dirlink")));
+    EXPECT_FALSE(IsDirExist(Path("/nothing")));
+}
+
+}  // namespace
