@@ -1,0 +1,114 @@
+// What is indexed: lists, membership questions and the plain functions.
+#include <dlfcn.h>
+
+#include "fileindex/fileidx.h"
+#include "fileindex/folders.h"
+#include "fileindex/index_mgr.h"
+#include "log_capture.h"
+#include "qira_sim/appliance.h"
+#include "sandbox.h"
+
+using namespace QIRA::FILEINDEX;
+using testkit::J;
+
+namespace {
+
+class QueriesTest : public testkit::Sandbox {
+protected:
+    void SetUp() override {
+        Sandbox::SetUp();
+        AddShare("music");
+        AddShare("Music");
+    }
+    void Index(const std::string& conf) { testkit::WriteFile(FolderConf(), conf); }
+};
+
+TEST_F(QueriesTest, PathsInsideAndContainingAFolder) {
+    Index(R"({"/music/live": {"name": "Live"}})");
+    for (const char* inside : {"/music/live", "/music/live/2015", "/music/live/"}) {
+        EXPECT_TRUE(IndexMgr::IsPathIndexed(inside)) << inside;
+    }
+    for (const char* outside : {"/music/liveset", "/music", "/Music/live"}) {
+        EXPECT_FALSE(IndexMgr::IsPathIndexed(outside)) << outside;
+    }
+    for (const char* container : {"/music", "/music/live"}) {
+        EXPECT_TRUE(IndexMgr::IsPathContainIndexed(container)) << container;
+    }
+    for (const char* notContainer : {"/music/live/2015", "/music/live/", "/mus"}) {
+        EXPECT_FALSE(IndexMgr::IsPathContainIndexed(notContainer)) << notContainer;
+    }
+}
+
+TEST_F(QueriesTest, FullPathsAndTheUnresolvableFolder) {
+    Index(R"({"/music/live": {}})");
+    const std::string dir = ShareDir("music");
+    EXPECT_TRUE(IndexMgr::IsFullPathIndexed(dir + "/live/a"));
+    EXPECT_FALSE(IndexMgr::IsFullPathIndexed(dir + "/livex"));
+    EXPECT_EQ(FILEIDXIsFullPathIndexed((dir + "/live").c_str()), 1);
+    EXPECT_EQ(FILEIDXIsFullPathIndexed("/elsewhere"), 0);
+    Index(R"({"/gone/x": {}})");
+    EXPECT_TRUE(IndexMgr::IsFullPathIndexed("/elsewhere/entirely"));
+    EXPECT_TRUE(testkit::Logged("Failed to get full path from /gone/x"));
+}
+
+TEST_F(QueriesTest, ShareNamesAreCaseSensitive) {
+    Index(R"({"/Music/a": {}})");
+    EXPECT_TRUE(IndexMgr::IsShareIndexed("Music"));
+    EXPECT_FALSE(IndexMgr::IsShareIndexed("music"));
+    EXPECT_EQ(FILEIDXIsShareIndexed("Music"), 1);
+    EXPECT_EQ(FILEIDXIsShareIndexed("music"), 0);
+    EXPECT_EQ(FILEIDXIsPathIndexed("/Music/a/b"), 1);
+    EXPECT_EQ(FILEIDXIsPathIndexed("/music/a/b"), 0);
+}
+
+TEST_F(QueriesTest, EmptyShareNamesAreLoggedAndSkipped) {
+    Index(R"({"": {}, "/music/a": {}})");
+    EXPECT_TRUE(IndexMgr::IsShareIndexed("music"));
+    EXPECT_FALSE(IndexMgr::IsShareIndexed("x"));
+    EXPECT_TRUE(testkit::Logged("Failed to get share name from path: "));
+}
+
+TEST_F(QueriesTest, NoFileMeansNothingIndexed) {
+    std::vector<Folder> list(3);
+    EXPECT_TRUE(IndexMgr::List(list));
+    EXPECT_TRUE(list.empty());
+    EXPECT_FALSE(IndexMgr::IsPathIndexed("/music"));
+    EXPECT_FALSE(IndexMgr::IsShareIndexed("music"));
+}
+
+TEST_F(QueriesTest, MalformedFileAnswersNoEverywhere) {
+    Index("[\"/music/a\"]");
+    std::vector<Folder> list;
+    EXPECT_FALSE(IndexMgr::List(list));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_MALFORMED_FOLDERS);
+    EXPECT_EQ(FILEIDXIsShareIndexed("music"), 0);
+    EXPECT_EQ(FILEIDXIsPathIndexed("/music/a"), 0);
+    EXPECT_EQ(FILEIDXIsFullPathIndexed((ShareDir("music") + "/a").c_str()), 0);
+    Index("{\"/music/a\": ");
+    EXPECT_EQ(FILEIDXIsPathIndexed("/music/a"), 0);
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOAD_JSON);
+}
+
+TEST_F(QueriesTest, GetTakesTheExclusiveLock) {
+    Index(R"({"/music/a": {"name": "A"}})");
+    Json::Value out;
+    ASSERT_TRUE(IndexMgr::Get(out, "/music/a"));
+    EXPECT_EQ(out["name"].asString(), "A");
+    EXPECT_FALSE(IndexMgr::Get(out, "/music/b"));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NO_SUCH_FOLDER);
+    Folders holder;
+    ASSERT_TRUE(holder.Lock(false));
+    EXPECT_FALSE(IndexMgr::Get(out, "/music/a"));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
+    EXPECT_TRUE(IndexMgr::IsPathIndexed("/music/a"));  // the membership questions take no lock
+    holder.Unlock();
+}
+
+TEST(PlainFunctionsTest, HaveUnmangledNames) {
+    for (const char* name : {"FILEIDXIsShareIndexed", "FILEIDXIsPathIndexed", "FILEIDXIsFullPathIndexed",
+                             "FILEIDXDBPathGet", "FILEIDXQueuePathGet"}) {
+        EXPECT_NE(dlsym(RTLD_DEFAULT, name), nullptr) << name;
+    }
+}
+
+}  // namespace

@@ -1,0 +1,95 @@
+// Locations of a share's index database and event queue.
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "fileindex/fileidx.h"
+#include "log_capture.h"
+#include "qira/qlib_core.h"
+#include "qira_sim/appliance.h"
+#include "sandbox.h"
+
+namespace {
+
+class StoragePathsTest : public testkit::Sandbox {};
+
+TEST_F(StoragePathsTest, PathsLieInTheSharesEaDirAndTheDatabaseIsCreated) {
+    const std::string dir = AddShare("music");
+    char buffer[4096];
+    const std::string db = dir + "/@eaDir/QIRA@.fileindexdb";
+    EXPECT_EQ(FILEIDXDBPathGet("music", buffer, sizeof buffer), static_cast<int>(db.size()));
+    EXPECT_EQ(std::string(buffer), db);
+    struct stat st;
+    ASSERT_EQ(lstat(db.c_str(), &st), 0);
+    EXPECT_TRUE(S_ISDIR(st.st_mode));
+    const std::string queue = dir + "/@eaDir/QIRA@file_index_queue";
+    EXPECT_EQ(FILEIDXQueuePathGet("music", buffer, sizeof buffer), static_cast<int>(queue.size()));
+    EXPECT_EQ(std::string(buffer), queue);
+    EXPECT_FALSE(testkit::Exists(queue));
+    EXPECT_EQ(FILEIDXDBPathGet("music", buffer, sizeof buffer), static_cast<int>(db.size()));  // exists: no log
+    EXPECT_TRUE(testkit::LogLines().empty());
+}
+
+TEST_F(StoragePathsTest, BadArgumentsFailBeforeAnyLookup) {
+    AddShare("music");
+    char buffer[64];
+    struct Case {
+        const char* name;
+        char* out;
+        int size;
+        const char* message;
+    };
+    const Case cases[] = {
+        {nullptr, buffer, 64, "Invaild Argument (__null != szName)=[0]\n"},
+        {"music", nullptr, 64, "Invaild Argument (__null != szOutQueuePath)=[0]\n"},
+        {"music", buffer, 0, "Invaild Argument (cbOutLen > 0)=[0]\n"},
+        {"music", buffer, -5, "Invaild Argument (cbOutLen > 0)=[-5]\n"},
+    };
+    for (const auto& c : cases) {
+        testkit::ClearLog();
+        QLIBCErrSetEx(0, "", 0);
+        EXPECT_EQ(FILEIDXQueuePathGet(c.name, c.out, c.size), -1);
+        EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{c.message});
+        EXPECT_EQ(QLIBCErrGet(), 0x0D00);
+        EXPECT_STREQ(QLIBCErrorGetFile(), "storage_paths.cc");
+    }
+    testkit::ClearLog();
+    EXPECT_EQ(FILEIDXDBPathGet("music", nullptr, 10), -1);
+    EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"Invaild Argument (__null != szOutDBPath)=[0]\n"});
+    EXPECT_FALSE(testkit::Exists(ShareDir("music") + "/@eaDir"));
+}
+
+TEST_F(StoragePathsTest, UnknownShareFails) {
+    char buffer[4096];
+    qira_sim::InjectFault("QIRAShareGet", 0x0B01);
+    EXPECT_EQ(FILEIDXQueuePathGet("nosuch", buffer, sizeof buffer), -1);
+    EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"QIRAShareGet failed, name=nosuch, code=2817"});
+}
+
+TEST_F(StoragePathsTest, ShortBufferTruncatesAndReturnsTheTruncatedLength) {
+    const std::string dir = AddShare("music");
+    char buffer[10];
+    EXPECT_EQ(FILEIDXQueuePathGet("music", buffer, sizeof buffer), 9);
+    EXPECT_EQ(std::string(buffer), dir.substr(0, 9));
+    EXPECT_EQ(FILEIDXDBPathGet("music", buffer, sizeof buffer), 9);
+}
+
+TEST_F(StoragePathsTest, EaDirFailuresAreLoggedAndThePathStillReturned) {
+    const std::string dir = AddShare("music");
+    qira_sim::InjectFault("QIRAEAMKDir", 0x0A00);
+    char buffer[4096];
+    EXPECT_GT(FILEIDXDBPathGet("music", buffer, sizeof buffer), 0);
+    EXPECT_TRUE(testkit::Logged("QIRAEAMKDir failed, path=" + dir + "/@eaDir, code=2560"));
+    EXPECT_TRUE(testkit::Logged("mkdir failed, path=" + dir + "/@eaDir/QIRA@.fileindexdb, reason=No such file or directory"));
+}
+
+TEST_F(StoragePathsTest, APlantedEaDirLinkIsNotFollowed) {
+    const std::string dir = AddShare("music");
+    const std::string outside = Path("/outside");
+    MakeDir(outside);
+    ASSERT_EQ(symlink(outside.c_str(), (dir + "/@eaDir").c_str()), 0);
+    char buffer[4096];
+    EXPECT_GT(FILEIDXDBPathGet("music", buffer, sizeof buffer), 0);
+    EXPECT_FALSE(testkit::Exists(outside + "/QIRA@.fileindexdb"));
+}
+
+}  // namespace
