@@ -1,0 +1,89 @@
+// Commands to fileindexd: frames on the wire and the chunked writer.
+#include <sys/socket.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cstring>
+
+#include "daemon_channel.h"
+#include "fake_daemon.h"
+#include "fileindex/json.h"
+#include "fileindex/utils.h"
+#include "sandbox.h"
+
+using namespace QIRA::FILEINDEX;
+
+namespace {
+
+class DaemonChannelTest : public testkit::Sandbox {};
+
+TEST_F(DaemonChannelTest, FrameIsLengthThenJsonThenNul) {
+    testkit::FakeDaemon daemon(detail::DaemonSocketPath());
+    ASSERT_TRUE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));
+    const auto frames = daemon.Drain();
+    ASSERT_EQ(frames.size(), 1u);
+    const std::string text = "{\"data\":{},\"type\":\"resume\"}";
+    EXPECT_EQ(frames[0].length, text.size() + 1);
+    EXPECT_EQ(frames[0].payload, text + std::string(1, '\0'));
+}
+
+TEST_F(DaemonChannelTest, NoDaemonMeansFalse) {
+    EXPECT_FALSE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));
+    testkit::WriteFile(detail::DaemonSocketPath(), "not a socket");
+    EXPECT_FALSE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));
+}
+
+TEST_F(DaemonChannelTest, SocketPathLivesUnderTheRoot) {
+    EXPECT_EQ(detail::DaemonSocketPath(), Path("/var/run/fileindexd.sock"));
+    unsetenv("QIRA_ROOT");
+    EXPECT_EQ(detail::DaemonSocketPath(), "/var/run/fileindexd.sock");
+    setenv("QIRA_ROOT", root().c_str(), 1);
+}
+
+TEST_F(DaemonChannelTest, RootTooLongForASocketAddressFailsCleanly) {
+    const std::string longRoot = root() + "/" + std::string(80, 'r');
+    MakeDir(longRoot + "/var/run");
+    setenv("QIRA_ROOT", longRoot.c_str(), 1);
+    EXPECT_FALSE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));
+    setenv("QIRA_ROOT", root().c_str(), 1);
+}
+
+// A socket pair whose reading side records pieces as the writer produced them.
+TEST(ChunkedWriterTest, LargeMessageGoesInPiecesOfAtMost1024) {
+    int pair[2];
+    ASSERT_EQ(socketpair(AF_UNIX, SOCK_SEQPACKET, 0, pair), 0);
+    const std::string text(2001, 'x');
+    ASSERT_TRUE(detail::WriteChunked(pair[0], text.data(), text.size()));
+    close(pair[0]);
+    std::vector<size_t> pieces;
+    char buffer[4096];
+    ssize_t got;
+    while ((got = read(pair[1], buffer, sizeof buffer)) > 0) pieces.push_back(static_cast<size_t>(got));
+    close(pair[1]);
+    EXPECT_EQ(pieces, (std::vector<size_t>{1024, 977}));
+    EXPECT_TRUE(detail::WriteChunked(-1, "", 0));  // empty buffer succeeds at once
+}
+
+TEST_F(DaemonChannelTest, TwoThousandByteMessageIsOneWholeFrame) {
+    testkit::FakeDaemon daemon(detail::DaemonSocketPath());
+    Json::Value data(Json::objectValue);
+    data["folder_path"] = std::string(1942, 'p');
+    ASSERT_TRUE(SendCammandToDaemon("upsert_folder_setting", data));
+    const auto frames = daemon.Drain();
+    ASSERT_EQ(frames.size(), 1u);
+    EXPECT_EQ(frames[0].length, 2001u);
+    EXPECT_TRUE(frames[0].whole);
+    EXPECT_EQ(frames[0].message["data"], data);
+}
+
+TEST(ChunkedWriterTest, AFailedFirstWriteNeverReadsBeforeTheBuffer) {
+    int pair[2];
+    ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM, 0, pair), 0);
+    close(pair[1]);
+    signal(SIGPIPE, SIG_IGN);
+    const std::string text(100, 'x');
+    EXPECT_FALSE(detail::WriteChunked(pair[0], text.data(), text.size()));
+    close(pair[0]);
+}
+
+}  // namespace

@@ -1,0 +1,220 @@
+// status.conf, the status manager's writers and readers, and the no-space notice.
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <ctime>
+
+#include "daemon_channel.h"
+#include "fake_daemon.h"
+#include "fileindex/status.h"
+#include "fileindex/status_mgr.h"
+#include "fileindex/utils.h"
+#include "log_capture.h"
+#include "qira_sim/appliance.h"
+#include "sandbox.h"
+
+using namespace QIRA::FILEINDEX;
+using testkit::J;
+
+namespace {
+
+const std::vector<std::string> kNoticeArgs = {
+    "-e", "false", "-c", "QIRA.ZOR.AdminCenter.Application", "@administrators", "fileindex:fileindex_title",
+    "fileindex:notify_no_space",
+    "<a data-qira-app=\"QIRA.ZOR.AdminCenter.Application\" data-qira-fn=\"QIRA.ZOR.AdminCenter.MediaIndex.Main\" "
+    "data-qira-tab=\"fileIndex\">",
+    "</a>"};
+
+class StatusTest : public testkit::Sandbox {
+protected:
+    Json::Value File() { return testkit::ParseJson(testkit::ReadFile(StatusConf())); }
+};
+
+TEST_F(StatusTest, NoticeRunsTheNotifierWithTheTenArguments) {
+    EXPECT_TRUE(NotifyNoSpace());
+    ASSERT_EQ(qira_sim::NotifierCalls().size(), 1u);
+    EXPECT_EQ(qira_sim::NotifierCalls()[0], kNoticeArgs);
+    const auto journal = qira_sim::Journal();
+    ASSERT_EQ(journal.size(), 1u);
+    EXPECT_EQ(journal[0]["op"].asString(), "QLIBCExecv");
+    EXPECT_EQ(journal[0]["args"][0].asString(), Path("/usr/qira/bin/qiralumnotify"));
+    EXPECT_EQ(journal[0]["args"].size(), 10u);
+    qira_sim::SetNotifierExitStatus(1);
+    EXPECT_FALSE(NotifyNoSpace());
+    qira_sim::InjectFault("QLIBCExecv", 0x0F00);
+    EXPECT_FALSE(NotifyNoSpace());
+    EXPECT_TRUE(testkit::LogLines().empty());
+}
+
+TEST_F(StatusTest, MissingFileReadsAsRunningAndUnflagged) {
+    long long resume = 5;
+    EXPECT_TRUE(StatusMgr::GetPauseInfo(resume));
+    EXPECT_EQ(resume, -1);
+    EXPECT_FALSE(StatusMgr::ShareIsNoSpace("s"));
+    EXPECT_FALSE(StatusMgr::ShareIsNeedReindex("s"));
+    EXPECT_FALSE(StatusMgr::IsUpdated("m"));
+    EXPECT_FALSE(testkit::Exists(StatusConf()));
+}
+
+TEST_F(StatusTest, NoticeOnlyOnTheTransitionToFlagged) {
+    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("s", true));
+    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("s", true));
+    EXPECT_EQ(qira_sim::NotifierCalls().size(), 1u);
+    EXPECT_EQ(File(), J(R"({"no_space": {"s": true}})"));
+    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("s", false));
+    EXPECT_EQ(File(), J(R"({"no_space": {}})"));
+    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("s", true));
+    EXPECT_EQ(qira_sim::NotifierCalls().size(), 2u);
+    EXPECT_TRUE(StatusMgr::ShareIsNoSpace("s"));
+}
+
+TEST_F(StatusTest, FailedNoticeIsLoggedAndTheFlagStillSet) {
+    qira_sim::SetNotifierExitStatus(2);
+    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("s", true));
+    EXPECT_TRUE(testkit::Logged("NotifyNoSpace failed"));
+    EXPECT_TRUE(StatusMgr::ShareIsNoSpace("s"));
+}
+
+TEST_F(StatusTest, ClearingOnAFreshFileLeavesANullMember) {
+    EXPECT_TRUE(StatusMgr::ShareSetNeedReindex("s", false));
+    EXPECT_EQ(File(), J(R"({"need_reindex": null})"));
+    EXPECT_FALSE(StatusMgr::ShareIsNeedReindex("s"));
+    EXPECT_TRUE(StatusMgr::ShareSetNeedReindex("s", true));
+    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("s"));
+    EXPECT_FALSE(StatusMgr::ShareIsNoSpace("s"));
+}
+
+TEST_F(StatusTest, MembershipNotValueDecidesAFlag) {
+    testkit::WriteFile(StatusConf(), R"({"no_space": {"s": false}, "need_reindex": ["s"]})");
+    EXPECT_TRUE(StatusMgr::ShareIsNoSpace("s"));
+    EXPECT_FALSE(StatusMgr::ShareIsNeedReindex("s"));
+    testkit::WriteFile(StatusConf(), R"({"no_space": "s"})");
+    EXPECT_FALSE(StatusMgr::ShareIsNoSpace("s"));
+}
+
+TEST_F(StatusTest, FlagSetOfTheWrongTypeIsNotRepaired) {
+    const std::string content = R"({"no_space": ["s"], "need_reindex": 3})";
+    testkit::WriteFile(StatusConf(), content);
+    EXPECT_FALSE(StatusMgr::ShareSetNoSpace("s", true));
+    EXPECT_FALSE(StatusMgr::ShareSetNeedReindex("s", false));
+    EXPECT_EQ(testkit::ReadFile(StatusConf()), content);
+    EXPECT_TRUE(qira_sim::NotifierCalls().empty());
+}
+
+TEST_F(StatusTest, MarkersReadAsBooleans) {
+    testkit::WriteFile(StatusConf(), R"({"f": false, "one": 1, "zero": 0, "s": "yes", "o": {}})");
+    EXPECT_FALSE(StatusMgr::IsUpdated("f"));
+    EXPECT_TRUE(StatusMgr::IsUpdated("one"));
+    EXPECT_FALSE(StatusMgr::IsUpdated("zero"));
+    EXPECT_FALSE(StatusMgr::IsUpdated("s"));
+    EXPECT_FALSE(StatusMgr::IsUpdated("o"));
+    EXPECT_TRUE(StatusMgr::SetUpdated("f"));
+    EXPECT_TRUE(StatusMgr::IsUpdated("f"));
+}
+
+TEST_F(StatusTest, MalformedResumeTimeIsAJsonException) {
+    for (const char* content : {R"({"resume_time": "x"})", R"({"resume_time": {}})", R"({"resume_time": 1e300})",
+                                "[1]"}) {
+        testkit::WriteFile(StatusConf(), content);
+        testkit::ClearLog();
+        long long resume = 42;
+        EXPECT_FALSE(StatusMgr::GetPauseInfo(resume)) << content;
+        EXPECT_EQ(resume, 42);
+        EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"json exception"});
+        EXPECT_EQ(testkit::LogLines()[0].source, "status.cc");
+    }
+}
+
+TEST_F(StatusTest, PauseAndResumeWriteTheFileAndTellTheDaemon) {
+    testkit::FakeDaemon daemon(detail::DaemonSocketPath());
+    ASSERT_TRUE(StatusMgr::Pause(0));
+    EXPECT_EQ(File(), J(R"({"resume_time": 0})"));
+    const long long before = time(nullptr);
+    ASSERT_TRUE(StatusMgr::Pause(2));
+    const long long stored = File()["resume_time"].asInt64();
+    EXPECT_GE(stored, before + 7200);
+    EXPECT_LE(stored, time(nullptr) + 7200);
+    ASSERT_TRUE(StatusMgr::Resume());
+    EXPECT_EQ(File(), J(R"({"resume_time": -1})"));
+    const auto messages = daemon.Messages();
+    ASSERT_EQ(messages.size(), 3u);
+    EXPECT_EQ(messages[0], J(R"({"type": "pause", "data": {"resume_time": 0}})"));
+    EXPECT_EQ(messages[1]["data"]["resume_time"].asInt64(), stored);
+    EXPECT_EQ(messages[2], J(R"({"type": "resume", "data": {}})"));
+}
+
+TEST_F(StatusTest, LongPausesWrapIn32Bits) {
+    testkit::FakeDaemon daemon(detail::DaemonSocketPath());
+    const int hours = 600000;  // 2,160,000,000 s: past 2^31 from any present time
+    const long long now = time(nullptr);
+    ASSERT_TRUE(StatusMgr::Pause(hours));
+    const long long expected = static_cast<int32_t>(static_cast<uint32_t>(now) + 3600u * hours);
+    const long long stored = File()["resume_time"].asInt64();
+    EXPECT_LT(stored, 0);
+    EXPECT_NEAR(static_cast<double>(stored), static_cast<double>(expected), 2.0);
+}
+
+TEST_F(StatusTest, NegativePauseTouchesNothing) {
+    testkit::FakeDaemon daemon(detail::DaemonSocketPath());
+    EXPECT_FALSE(StatusMgr::Pause(-1));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
+    EXPECT_FALSE(testkit::Exists(StatusConf()));
+    EXPECT_FALSE(testkit::Exists(Path("/tmp/fileidx_cfg_status.lock")));
+    EXPECT_TRUE(daemon.Drain().empty());
+}
+
+TEST_F(StatusTest, UnreachableDaemonLeavesTheFileChangedAndFails) {
+    EXPECT_FALSE(StatusMgr::Pause(1));
+    EXPECT_GT(File()["resume_time"].asInt64(), 0);
+    EXPECT_TRUE(testkit::Logged("SendCammandToDaemon failed"));
+    EXPECT_EQ(testkit::LogLines().back().source, "status_mgr.cc");
+}
+
+TEST_F(StatusTest, ReviveClearsOnlyTheNoSpaceFlagAndSendsTheCommand) {
+    testkit::WriteFile(StatusConf(), R"({"no_space": {"s": true, "t": true}, "need_reindex": {"s": true}})");
+    testkit::FakeDaemon daemon(detail::DaemonSocketPath());
+    ASSERT_TRUE(StatusMgr::ShareRevive("s"));
+    ASSERT_TRUE(StatusMgr::ShareRevive("never"));
+    EXPECT_EQ(File(), J(R"({"no_space": {"t": true}, "need_reindex": {"s": true}})"));
+    const auto messages = daemon.Messages();
+    ASSERT_EQ(messages.size(), 2u);
+    EXPECT_EQ(messages[0], J(R"({"type": "revive_share_worker", "data": {"share_name": "s"}})"));
+}
+
+TEST_F(StatusTest, WritersFailWithErrorNineWhileAnotherProcessHoldsTheLock) {
+    testkit::WriteFile(StatusConf(), R"({"resume_time": -1})");
+    testkit::FakeDaemon daemon(detail::DaemonSocketPath());
+    int ready[2];
+    int release[2];
+    ASSERT_EQ(pipe(ready), 0);
+    ASSERT_EQ(pipe(release), 0);
+    const pid_t child = fork();
+    if (child == 0) {
+        Status holder;
+        const char ok = holder.Lock(true) ? 'y' : 'n';
+        if (write(ready[1], &ok, 1) != 1) _exit(1);
+        char go;
+        if (read(release[0], &go, 1) < 0) _exit(1);
+        _exit(0);
+    }
+    char ok = 0;
+    ASSERT_EQ(read(ready[0], &ok, 1), 1);
+    ASSERT_EQ(ok, 'y');
+    EXPECT_FALSE(StatusMgr::Pause(0));
+    EXPECT_FALSE(StatusMgr::Resume());
+    EXPECT_FALSE(StatusMgr::ShareSetNoSpace("s", true));
+    EXPECT_FALSE(StatusMgr::ShareSetNeedReindex("s", true));
+    EXPECT_FALSE(StatusMgr::SetUpdated("m"));
+    EXPECT_FALSE(StatusMgr::ShareRevive("s"));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
+    long long resume = 0;
+    EXPECT_TRUE(StatusMgr::GetPauseInfo(resume));  // readers take no lock
+    EXPECT_EQ(resume, -1);
+    if (write(release[1], "g", 1) != 1) ADD_FAILURE();
+    waitpid(child, nullptr, 0);
+    EXPECT_EQ(testkit::ReadFile(StatusConf()), R"({"resume_time": -1})");
+    EXPECT_TRUE(daemon.Drain().empty());
+    EXPECT_TRUE(StatusMgr::Resume());
+}
+
+}  // namespace
