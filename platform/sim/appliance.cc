@@ -115,11 +115,12 @@ void SetSpotlightState(bool on) {
 
 bool SpotlightState() { return ReadState("services.json", DefaultServices())["spotlight"].asBool(); }
 
-void InjectFault(const std::string& op, int err, const std::string& arg) {
+void InjectFault(const std::string& op, int err, const std::string& arg, int skip) {
     UpdateState("faults.json", Json::Value(Json::objectValue), [&](Json::Value& faults) {
         Json::Value fault(Json::objectValue);
         fault["err"] = err;
         if (!arg.empty()) fault["arg"] = arg;
+        if (skip > 0) fault["skip"] = skip;
         faults[op] = fault;
     });
 }

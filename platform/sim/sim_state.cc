@@ -112,6 +112,12 @@ bool Faulted(const char* op, const std::string& arg) {
     const Json::Value& fault = faults[op];
     if (!fault.isObject()) return false;
     if (fault.isMember("arg") && fault["arg"].isString() && fault["arg"].asString() != arg) return false;
+    if (fault.get("skip", 0).isInt() && fault.get("skip", 0).asInt() > 0) {
+        UpdateState("faults.json", Json::Value(Json::objectValue), [op](Json::Value& all) {
+            if (all[op].isObject()) all[op]["skip"] = all[op].get("skip", 1).asInt() - 1;
+        });
+        return false;
+    }
     const int err = fault.get("err", 0x0100).isInt() ? fault.get("err", 0x0100).asInt() : 0x0100;
     SetError(err, (std::string("sim/") + op).c_str(), 1);
     return true;

@@ -30,8 +30,8 @@ void SetSpotlightState(bool on);
 bool SpotlightState();
 
 // Makes platform operation `op` fail with platform error `err`; with `arg`, only when the
-// operation's first argument equals it.
-void InjectFault(const std::string& op, int err, const std::string& arg = std::string());
+// operation's first argument equals it; with `skip`, only after that many matching calls passed.
+void InjectFault(const std::string& op, int err, const std::string& arg = std::string(), int skip = 0);
 void ClearFault(const std::string& op);
 void ClearFaults();
 Json::Value Faults();

@@ -1,0 +1,125 @@
+// Appending custom events to a share's queue; duplicates of a pending reindex; the fallback.
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <algorithm>
+
+#include "fileindex/error.h"
+#include "fileindex/status_mgr.h"
+#include "fileindex/utils.h"
+#include "log_capture.h"
+#include "qira_sim/appliance.h"
+#include "sandbox.h"
+
+using namespace QIRA::FILEINDEX;
+using testkit::J;
+
+namespace {
+
+class CustomEventTest : public testkit::Sandbox {
+protected:
+    void SetUp() override {
+        Sandbox::SetUp();
+        dir_ = AddShare("s");
+    }
+    std::string dir_;
+};
+
+TEST_F(CustomEventTest, FirstEventCreatesTheQueueWithOneWholeLine) {
+    ASSERT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/a", J(R"({"audio": true})")));
+    EXPECT_EQ(testkit::ReadFile(QueueOf("s")),
+              "{\"data\":{\"audio\":true},\"event\":131072,\"path\":\"" + dir_ + "/a\"}\n");
+    struct stat st;
+    ASSERT_EQ(stat(QueueOf("s").c_str(), &st), 0);
+    EXPECT_EQ(st.st_mode & 0022, 0u);
+    ASSERT_TRUE(AddCustomEvent(kEventReindex, dir_ + "/b", Json::Value()));
+    const auto records = testkit::ReadJsonLines(QueueOf("s"));
+    ASSERT_EQ(records.size(), 2u);
+    EXPECT_EQ(records[1], J("{\"event\": 65536, \"path\": \"" + dir_ + "/b\", \"data\": null}"));
+}
+
+TEST_F(CustomEventTest, APendingReindexOfExactlyThePathSuppressesAnyEvent) {
+    MakeDir(dir_ + "/@eaDir");
+    const std::string queued = "{\"event\":65536,\"path\":\"" + dir_ + "/a\",\"data\":null}\n";
+    testkit::WriteFile(QueueOf("s"), "garbage\n{\"event\":\"x\",\"path\":1}\n" + queued);
+    EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/a", J("{}")));
+    EXPECT_TRUE(AddCustomEvent(kEventReindex, dir_ + "/a", J("{}")));
+    EXPECT_EQ(testkit::ReadFile(QueueOf("s")), "garbage\n{\"event\":\"x\",\"path\":1}\n" + queued);
+    for (const std::string& other : std::vector<std::string>{dir_ + "/a/b", dir_, dir_ + "/A"}) {
+        EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, other, J("{}")));
+    }
+    const std::string content = testkit::ReadFile(QueueOf("s"));
+    EXPECT_EQ(std::count(content.begin(), content.end(), '\n'), 6);
+}
+
+TEST_F(CustomEventTest, OnlyReindexRecordsSuppressAndTheTmpCompanionCounts) {
+    MakeDir(dir_ + "/@eaDir");
+    testkit::WriteFile(QueueOf("s"), "{\"event\":131072,\"path\":\"" + dir_ + "/a\",\"data\":{}}\n");
+    EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/a", J("{}")));
+    EXPECT_EQ(testkit::ReadJsonLines(QueueOf("s")).size(), 2u);
+    testkit::WriteFile(QueueOf("s") + ".tmp", "{\"event\":65536,\"path\":\"" + dir_ + "/c\",\"data\":null}\n");
+    EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/c", J("{}")));
+    EXPECT_EQ(testkit::ReadJsonLines(QueueOf("s")).size(), 2u);
+}
+
+TEST_F(CustomEventTest, ContendedQueueGivesUpAfterThreeAttemptsAndReportsSuccess) {
+    MakeDir(dir_ + "/@eaDir");
+    testkit::WriteFile(QueueOf("s"), "");
+    int ready[2];
+    int release[2];
+    ASSERT_EQ(pipe(ready), 0);
+    ASSERT_EQ(pipe(release), 0);
+    const pid_t child = fork();
+    if (child == 0) {
+        const int fd = open(QueueOf("s").c_str(), O_RDWR);
+        const char ok = flock(fd, LOCK_EX) == 0 ? 'y' : 'n';
+        if (write(ready[1], &ok, 1) != 1) _exit(1);
+        char go;
+        if (read(release[0], &go, 1) < 0) _exit(1);
+        _exit(0);
+    }
+    char ok = 0;
+    ASSERT_EQ(read(ready[0], &ok, 1), 1);
+    LOG_LEVEL = 7;
+    EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/a", J("{}")));
+    LOG_LEVEL = 3;
+    EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/a", J("{}")));
+    if (write(release[1], "g", 1) != 1) ADD_FAILURE();
+    waitpid(child, nullptr, 0);
+    EXPECT_EQ(testkit::ReadFile(QueueOf("s")), "");
+    EXPECT_FALSE(testkit::Exists(StatusConf()));
+    ASSERT_EQ(testkit::LogLines().size(), 1u);  // the debug-only line, once
+    EXPECT_EQ(testkit::LogLines()[0].message.rfind("try lock too many times, path=" + QueueOf("s") + ", reason=", 0), 0u);
+}
+
+TEST_F(CustomEventTest, UnknownShareMarksTheEmptyShareNameAndFails) {
+    EXPECT_FALSE(AddCustomEvent(kEventReindex, Path("/volume2/x"), Json::Value()));
+    EXPECT_TRUE(testkit::Logged("QIRAShareNamePathGet failed, path=" + Path("/volume2/x")));
+    EXPECT_EQ(testkit::ParseJson(testkit::ReadFile(StatusConf())), J(R"({"need_reindex": {"": true}})"));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NONE);
+}
+
+TEST_F(CustomEventTest, QueuePathFailureMarksTheShare) {
+    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "s");
+    EXPECT_FALSE(AddCustomEvent(kEventReindex, dir_ + "/x", Json::Value()));
+    EXPECT_TRUE(testkit::Logged("FILEIDXQueuePathGet failed, share=s"));
+    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("s"));
+}
+
+TEST_F(CustomEventTest, UnopenableQueueMarksTheShare) {
+    MakeDir(QueueOf("s"));  // a directory where the queue file should be
+    EXPECT_FALSE(AddCustomEvent(kEventReindex, dir_ + "/x", Json::Value()));
+    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("s"));
+}
+
+TEST_F(CustomEventTest, FailedMarkingIsLoggedToo) {
+    MakeDir(QueueOf("s"));
+    mkdir(Path("/tmp/fileidx_cfg_status.lock").c_str(), 0755);
+    EXPECT_FALSE(AddCustomEvent(kEventReindex, dir_ + "/x", Json::Value()));
+    EXPECT_TRUE(testkit::Logged("ShareSetNeedReindex failed, share=s"));
+}
+
+}  // namespace

@@ -1,0 +1,79 @@
+// Monitor-queue registrations with qiranotifyd.
+#include "fileindex/index_mgr.h"
+#include "index_fixture.h"
+
+using namespace QIRA::FILEINDEX;
+using testkit::J;
+
+namespace {
+
+class NotifydCfgTest : public testkit::IndexFixture {};
+
+TEST_F(NotifydCfgTest, QueueDescriptionListsEachFolderOfTheShare) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/b": {}, "/photo/a": {}})");
+    ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("music"));
+    const auto registrations = qira_sim::Registrations();
+    ASSERT_EQ(registrations.size(), 1u);
+    EXPECT_EQ(registrations[0]["owner"].asString(), "fileindex");
+    EXPECT_EQ(registrations[0]["type"].asInt(), 1);
+    EXPECT_EQ(registrations[0]["description"],
+              J("{\"queue\": \"" + QueueOf("music") + "\", \"config\": [" +
+                "{\"path\": \"" + music_ + "/a\", \"mask\": 65486, \"ignore\": [\"@eaDir\"]}, " +
+                "{\"path\": \"" + music_ + "/b\", \"mask\": 65486, \"ignore\": [\"@eaDir\"]}]}"));
+    EXPECT_TRUE(registrations[0]["description"]["config"][0]["mask"].isInt());
+}
+
+TEST_F(NotifydCfgTest, SecondUpsertReplacesAndEmptyShareRegistersAnEmptyConfig) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
+    ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("music"));
+    testkit::WriteFile(FolderConf(), R"({})");
+    ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("music"));
+    const auto registrations = qira_sim::Registrations();
+    ASSERT_EQ(registrations.size(), 1u);
+    EXPECT_EQ(registrations[0]["description"]["config"], J("[]"));
+}
+
+TEST_F(NotifydCfgTest, AnUnresolvableFolderChangesNoRegistration) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
+    ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("music"));
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/b": {}, "/music/c": {}})");
+    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music");
+    Settle();
+    EXPECT_FALSE(IndexMgr::UpsertQIRANotifydCfg("music"));
+    EXPECT_TRUE(testkit::Logged("FILEIDXQueuePathGet failed, share=music"));
+    // Queue path and the first folder resolve, the second folder does not.
+    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", 5);  // queue path, three loads, /music/a
+    testkit::ClearLog();
+    EXPECT_FALSE(IndexMgr::UpsertQIRANotifydCfg("music"));
+    EXPECT_TRUE(testkit::Logged("GetFullPath failed, path=/music/b"));
+    EXPECT_TRUE(qira_sim::Journal().empty());
+    EXPECT_EQ(qira_sim::Registrations()[0]["description"]["config"].size(), 1u);
+}
+
+TEST_F(NotifydCfgTest, PlatformRefusalsAreLogged) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
+    qira_sim::InjectFault("MonitorQueue::MonitorQueue", 0x50);
+    EXPECT_FALSE(IndexMgr::UpsertQIRANotifydCfg("music"));
+    EXPECT_EQ(testkit::LogMessages()[0].rfind("Failed to create MonitorQueue, jsQueue={\"config\":[{", 0), 0u);
+    qira_sim::ClearFaults();
+    qira_sim::InjectFault("MonitorQueue::Upsert", 0x51);
+    EXPECT_FALSE(IndexMgr::UpsertQIRANotifydCfg("music"));
+    EXPECT_TRUE(testkit::Logged("MonitorQueue::Add failed"));
+    qira_sim::InjectFault("MonitorQueue::Delete", 0x52);
+    EXPECT_FALSE(IndexMgr::DeleteQIRANotifydCfg("music"));
+    EXPECT_TRUE(testkit::Logged("MonitorQueue::Delete failed"));
+    EXPECT_FALSE(IndexMgr::DeleteQIRANotifydCfg("nosuch"));
+    EXPECT_TRUE(testkit::Logged("FILEIDXQueuePathGet failed, share=nosuch"));
+}
+
+TEST_F(NotifydCfgTest, DeleteRemovesTheSharesRegistration) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/photo/a": {}})");
+    ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("music"));
+    ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("photo"));
+    ASSERT_TRUE(IndexMgr::DeleteQIRANotifydCfg("music"));
+    const auto registrations = qira_sim::Registrations();
+    ASSERT_EQ(registrations.size(), 1u);
+    EXPECT_EQ(registrations[0]["queue"].asString(), QueueOf("photo"));
+}
+
+}  // namespace
