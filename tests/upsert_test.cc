@@ -1,0 +1,198 @@
+// Folder upsert end to end: folder.conf, platform calls, registrations, frames and events.
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include "fileindex/folders.h"
+#include "fileindex/index_mgr.h"
+#include "index_fixture.h"
+
+using namespace QIRA::FILEINDEX;
+using testkit::J;
+
+namespace {
+
+class UpsertTest : public testkit::IndexFixture {
+protected:
+    Json::Value Event(const std::string& path, const std::string& data) {
+        return J("{\"event\": 131072, \"path\": \"" + path + "\", \"data\": " + data + "}");
+    }
+};
+
+const char kAllChanged[] = R"({"document": true, "audio": true, "video": true, "photo": true})";
+
+TEST_F(UpsertTest, NewFoldersRunEveryStepInOrder) {
+    ASSERT_TRUE(IndexMgr::Upsert(J(R"([{"path": "/photo/b", "photo": true}, {"path": "/music/a", "name": "A"}])")));
+    EXPECT_EQ(Conf().getMemberNames(), (std::vector<std::string>{"/music/a", "/photo/b"}));
+    EXPECT_EQ(Conf()["/music/a"]["name"].asString(), "A");
+    const std::vector<std::string> ops = {
+        "MonitorQueue::Upsert " + QueueOf("music") + " fileindex 1",
+        "MonitorQueue::Upsert " + QueueOf("photo") + " fileindex 1",
+        "QLIBServiceStart fileindexd 1",
+        "QIRASMBSetSpotlight 1",
+        "QLIBServiceRestart samba",
+    };
+    EXPECT_EQ(testkit::JournalOps(), ops);
+    EXPECT_EQ(qira_sim::ServiceState("fileindexd"), "running");
+    EXPECT_TRUE(qira_sim::SpotlightState());
+    const auto messages = Messages();
+    ASSERT_EQ(messages.size(), 2u);
+    EXPECT_EQ(messages[0], J(R"({"type": "upsert_folder_setting", "data": {"folder_path": "/photo/b"}})"));
+    EXPECT_EQ(messages[1], J(R"({"type": "upsert_folder_setting", "data": {"folder_path": "/music/a"}})"));
+    EXPECT_EQ(Queue("music"), std::vector<Json::Value>{Event(music_ + "/a", kAllChanged)});
+    EXPECT_EQ(Queue("photo"), std::vector<Json::Value>{Event(photo_ + "/b", kAllChanged)});
+    EXPECT_TRUE(testkit::LogLines().empty());
+}
+
+TEST_F(UpsertTest, SpotlightAlreadyOnIsLeftAlone) {
+    qira_sim::SetSpotlightState(true);
+    ASSERT_TRUE(IndexMgr::Add(J(R"([{"path": "/music/a"}])")));
+    EXPECT_EQ(testkit::JournalOps(), (std::vector<std::string>{"MonitorQueue::Upsert " + QueueOf("music") + " fileindex 1",
+                                                               "QLIBServiceStart fileindexd 1"}));
+}
+
+TEST_F(UpsertTest, SpotlightFailuresNeverFailTheUpsert) {
+    qira_sim::InjectFault("QIRASMBSetSpotlight", 0x61);
+    ASSERT_TRUE(IndexMgr::Set(J(R"([{"path": "/music/a"}])")));
+    EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"QIRASMBSetSpotlight failed: err=[0x0061 sim/QIRASMBSetSpotlight:1]"});
+    EXPECT_EQ(testkit::JournalOps().back(), "QIRASMBSetSpotlight 1");
+    Settle();
+    qira_sim::ClearFaults();
+    qira_sim::InjectFault("QLIBServiceRestart", 0x62);
+    ASSERT_TRUE(IndexMgr::Upsert(J(R"([{"path": "/music/b"}])")));
+    EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"QLIBServiceRestart failed: err=[0x0062 sim/QLIBServiceRestart:1]"});
+}
+
+TEST_F(UpsertTest, BadRequestsFailBeforeTouchingAnything) {
+    for (const char* request : {R"({"path": "/music/a"})", "\"/music/a\"", "null"}) {
+        Settle();
+        EXPECT_FALSE(IndexMgr::Upsert(J(request)));
+        EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
+        EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"Bad param: " + toString(J(request))});
+        EXPECT_FALSE(testkit::Exists(FolderConf()));
+        EXPECT_TRUE(qira_sim::Journal().empty());
+    }
+}
+
+TEST_F(UpsertTest, EmptyArrayStartsTheServiceAndNothingElse) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {"name": "A"}})");
+    ASSERT_TRUE(IndexMgr::Upsert(J("[]")));
+    EXPECT_EQ(Conf()["/music/a"]["name"].asString(), "A");
+    EXPECT_EQ(testkit::JournalOps(),
+              (std::vector<std::string>{"QLIBServiceStart fileindexd 1", "QIRASMBSetSpotlight 1", "QLIBServiceRestart samba"}));
+    EXPECT_TRUE(Messages().empty());
+    EXPECT_FALSE(testkit::Exists(QueueOf("music")));
+}
+
+TEST_F(UpsertTest, ARejectedElementSavesNothing) {
+    testkit::WriteFile(FolderConf(), R"({"/music/c": {"name": "C"}})");
+    const std::string before = testkit::ReadFile(FolderConf());
+    for (const char* bad : {R"({"path": 7})", R"({"path": "/nosuch/x"})", R"([1])", R"("s")", R"({"path": {}})"}) {
+        Settle();
+        const std::string request = std::string(R"([{"path": "/music/a"}, )") + bad + R"(, {"path": "/music/b"}])";
+        EXPECT_FALSE(IndexMgr::Upsert(J(request))) << bad;
+        EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
+        EXPECT_TRUE(testkit::Logged("Upsert failed, folder=" + toString(J(bad))));
+        EXPECT_EQ(testkit::ReadFile(FolderConf()), before);
+        EXPECT_TRUE(qira_sim::Journal().empty());
+        EXPECT_TRUE(Messages().empty());
+    }
+}
+
+TEST_F(UpsertTest, DuplicatePathsGiveTwoCommandsAndOneEventWithTheLaterReport) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {"name": "A", "document": false, "audio": false,
+                                                      "video": false, "photo": false}})");
+    ASSERT_TRUE(IndexMgr::Upsert(J(R"([{"path": "/music/a", "audio": true}, {"path": "/music/a", "name": "x"},
+                                       {"path": "/music/a/b", "video": true}])")));
+    EXPECT_EQ(Messages().size(), 3u);
+    const auto queue = Queue("music");
+    ASSERT_EQ(queue.size(), 2u);
+    EXPECT_EQ(queue[0], Event(music_ + "/a", R"({"document": false, "audio": false, "video": false, "photo": false})"));
+    EXPECT_EQ(queue[1], Event(music_ + "/a/b", R"({"document": false, "audio": true, "video": true, "photo": false})"));
+}
+
+TEST_F(UpsertTest, EventsGoInAscendingPathOrderCommandsInRequestOrder) {
+    ASSERT_TRUE(IndexMgr::Upsert(J(R"([{"path": "/music/c"}, {"path": "/music/a"}, {"path": "/music/b"}])")));
+    const auto messages = Messages();
+    ASSERT_EQ(messages.size(), 3u);
+    EXPECT_EQ(messages[0]["data"]["folder_path"].asString(), "/music/c");
+    const auto queue = Queue("music");
+    ASSERT_EQ(queue.size(), 3u);
+    EXPECT_EQ(queue[0]["path"].asString(), music_ + "/a");
+    EXPECT_EQ(queue[2]["path"].asString(), music_ + "/c");
+}
+
+TEST_F(UpsertTest, LaterStepsFailWithFolderConfAlreadyWritten) {
+    struct Case {
+        const char* op;
+        std::string message;
+    };
+    const Case cases[] = {
+        {"MonitorQueue::Upsert", "UpsertQIRANtifydCfg failed, share=music"},
+        {"QLIBServiceStart", "QLIBServiceStart failed: err=[0x0070 sim/QLIBServiceStart:1]"},
+    };
+    for (const auto& c : cases) {
+        unlink(FolderConf().c_str());
+        qira_sim::ClearFaults();
+        qira_sim::InjectFault(c.op, 0x70);
+        Settle();
+        EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])"))) << c.op;
+        EXPECT_TRUE(testkit::Logged(c.message)) << c.op;
+        EXPECT_TRUE(Conf().isMember("/music/a"));
+        EXPECT_TRUE(Messages().empty());
+        EXPECT_FALSE(testkit::Exists(QueueOf("music")));
+    }
+}
+
+TEST_F(UpsertTest, UnreachableDaemonStopsBeforeTheEvents) {
+    daemon_.reset();
+    EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])")));
+    EXPECT_TRUE(testkit::Logged("SendCammandToDaemon failed"));
+    EXPECT_TRUE(Conf().isMember("/music/a"));
+    EXPECT_FALSE(testkit::Exists(QueueOf("music")));
+    EXPECT_EQ(qira_sim::ServiceState("fileindexd"), "running");
+}
+
+TEST_F(UpsertTest, EventPathThatNoLongerResolvesFailsWithErrorTwo) {
+    // Five lookups of "music" pass (the element twice, then the registration's queue path, load
+    // and folder); the event's full path is the sixth.
+    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", 5);
+    EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])")));
+    EXPECT_TRUE(testkit::Logged("GetFullPath failed, path=/music/a"));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_PATH);
+    EXPECT_EQ(Messages().size(), 1u);
+}
+
+TEST_F(UpsertTest, UnqueueableEventFailsAndMarksTheShare) {
+    MakeDir(QueueOf("music"));
+    EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])")));
+    EXPECT_TRUE(testkit::Logged("AddCustomEvent failed"));
+    EXPECT_TRUE(testkit::ParseJson(testkit::ReadFile(StatusConf()))["need_reindex"].isMember("music"));
+}
+
+TEST_F(UpsertTest, HeldFolderLockFailsWithErrorNineAndChangesNothing) {
+    testkit::WriteFile(FolderConf(), R"({"/music/c": {}})");
+    const std::string before = testkit::ReadFile(FolderConf());
+    Folders holder;
+    ASSERT_TRUE(holder.Lock(true));
+    Settle();
+    EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])")));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
+    EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/c"])")));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
+    holder.Unlock();
+    EXPECT_EQ(testkit::ReadFile(FolderConf()), before);
+    EXPECT_TRUE(qira_sim::Journal().empty());
+    EXPECT_TRUE(Messages().empty());
+}
+
+TEST_F(UpsertTest, LimitOfAThousandFoldersRejectsTheWholeRequest) {
+    Json::Value conf(Json::objectValue);
+    for (int i = 0; i < 1000; ++i) conf["/music/f" + std::to_string(i)] = Json::Value(Json::objectValue);
+    testkit::WriteFile(FolderConf(), toString(conf));
+    EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/f1", "name": "x"}, {"path": "/music/new"}])")));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_EXCEED_MAX_FOLDER);
+    EXPECT_EQ(Conf().size(), 1000u);
+    EXPECT_EQ(Conf()["/music/f1"]["name"], Json::Value());
+}
+
+}  // namespace
