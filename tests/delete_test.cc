@@ -1,0 +1,151 @@
+// Folder delete end to end.
+#include <unistd.h>
+
+#include "fileindex/index_mgr.h"
+#include "index_fixture.h"
+
+using namespace QIRA::FILEINDEX;
+using testkit::J;
+
+namespace {
+
+class DeleteTest : public testkit::IndexFixture {
+protected:
+    void Seed(const std::string& conf) {
+        testkit::WriteFile(FolderConf(), conf);
+        qira_sim::SetServiceState("fileindexd", "running");
+        MakeDir(music_ + "/@eaDir/QIRA@.fileindexdb/sub");
+        testkit::WriteFile(QueueOf("music") + ".tmp", "");
+        ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("music"));
+        Settle();
+    }
+};
+
+TEST_F(DeleteTest, LastFolderOfTheApplianceStopsEverything) {
+    Seed(R"({"/music/a": {}})");
+    qira_sim::SetSpotlightState(true);
+    ASSERT_TRUE(IndexMgr::Delete(J(R"(["/music/a"])")));
+    EXPECT_EQ(Conf(), J("{}"));
+    const std::vector<std::string> ops = {
+        "QLIBServiceStop fileindexd 1",
+        "QIRASMBSetSpotlight 0",
+        "QLIBServiceRestart samba",
+        "QLIBCExec /bin/rm -rf " + QueueOf("music"),
+        "QLIBCExec /bin/rm -rf " + QueueOf("music") + ".tmp",
+        "QLIBCExec /bin/rm -rf " + music_ + "/@eaDir/QIRA@.fileindexdb",
+        "MonitorQueue::Delete " + QueueOf("music") + " fileindex 1",
+    };
+    EXPECT_EQ(testkit::JournalOps(), ops);
+    EXPECT_TRUE(Messages().empty());
+    EXPECT_FALSE(testkit::Exists(QueueOf("music")));
+    EXPECT_FALSE(testkit::Exists(QueueOf("music") + ".tmp"));
+    EXPECT_FALSE(testkit::Exists(music_ + "/@eaDir/QIRA@.fileindexdb"));
+    EXPECT_TRUE(qira_sim::Registrations().empty());
+    EXPECT_FALSE(qira_sim::SpotlightState());
+}
+
+TEST_F(DeleteTest, ServiceStopFailureIsOnlyLogged) {
+    Seed(R"({"/music/a": {}})");
+    qira_sim::InjectFault("QLIBServiceStop", 0x80);
+    EXPECT_TRUE(IndexMgr::Delete(J(R"(["/music/a"])")));
+    EXPECT_TRUE(testkit::Logged("QLIBServiceStop failed: err=[0x0080 sim/QLIBServiceStop:1]"));
+    EXPECT_EQ(testkit::JournalOps()[1], "QLIBCExec /bin/rm -rf " + QueueOf("music"));  // Spotlight was off
+}
+
+TEST_F(DeleteTest, OneOfTwoFoldersRebuildsTheMonitorQueue) {
+    Seed(R"({"/music/a": {"audio": true}, "/music/b": {}})");
+    ASSERT_TRUE(IndexMgr::Delete(J(R"(["/music/a"])")));
+    EXPECT_EQ(Conf().getMemberNames(), std::vector<std::string>{"/music/b"});
+    EXPECT_EQ(testkit::JournalOps(), std::vector<std::string>{"MonitorQueue::Upsert " + QueueOf("music") + " fileindex 1"});
+    EXPECT_EQ(qira_sim::Registrations()[0]["description"]["config"].size(), 1u);
+    EXPECT_EQ(Messages(), std::vector<Json::Value>{J(R"({"type": "delete_folder_setting", "data": {"folder_path": "/music/a"}})")});
+    const auto queue = Queue("music");
+    ASSERT_EQ(queue.size(), 1u);
+    EXPECT_EQ(queue[0]["event"].asUInt(), 131072u);
+    EXPECT_EQ(queue[0]["path"].asString(), music_ + "/a");
+    EXPECT_EQ(queue[0]["data"],
+              J(R"({"/music/a": {"document": true, "audio": true, "video": true, "photo": true}})"));
+    EXPECT_TRUE(testkit::Exists(music_ + "/@eaDir/QIRA@.fileindexdb/sub"));
+}
+
+TEST_F(DeleteTest, OnlyFolderOfOneShareWhileAnotherKeepsFolders) {
+    Seed(R"({"/music/a": {}, "/photo/a": {}})");
+    ASSERT_TRUE(IndexMgr::Delete(J(R"(["/music/a", "/music/a"])")));
+    EXPECT_EQ(Messages().size(), 2u);
+    const auto ops = testkit::JournalOps();
+    ASSERT_EQ(ops.size(), 4u);  // the event was queued, then the share's queue files removed
+    EXPECT_EQ(ops[3], "MonitorQueue::Delete " + QueueOf("music") + " fileindex 1");
+    EXPECT_EQ(qira_sim::ServiceState("fileindexd"), "running");
+    EXPECT_FALSE(testkit::Exists(music_ + "/@eaDir/QIRA@.fileindexdb"));
+}
+
+TEST_F(DeleteTest, BadRequestsChangeNothing) {
+    Seed(R"({"/music/a": {}})");
+    const std::string before = testkit::ReadFile(FolderConf());
+    const std::pair<const char*, const char*> cases[] = {{R"({"a": 1})", R"({"a":1})"},
+                                                         {R"(["/music/a", {"path": "/music/a"}])", R"({"path":"/music/a"})"},
+                                                         {R"(["/music/a", 5])", "5"}};
+    for (const auto& [request, logged] : cases) {
+        Settle();
+        EXPECT_FALSE(IndexMgr::Delete(J(request))) << request;
+        EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{std::string("Bad param: ") + logged});
+        EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
+        EXPECT_EQ(testkit::ReadFile(FolderConf()), before);
+        EXPECT_TRUE(qira_sim::Journal().empty());
+    }
+}
+
+TEST_F(DeleteTest, AnEmptyPathFailsBeforeSaving) {
+    Seed(R"({"/music/a": {}})");
+    const std::string before = testkit::ReadFile(FolderConf());
+    EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a", ""])")));
+    EXPECT_TRUE(testkit::Logged("GetShareNameByPath failed, path="));
+    EXPECT_EQ(testkit::ReadFile(FolderConf()), before);
+}
+
+TEST_F(DeleteTest, EmptyArrayOnAnEmptyListStopsTheService) {
+    ASSERT_TRUE(IndexMgr::Delete(J("[]")));
+    EXPECT_EQ(testkit::JournalOps(), std::vector<std::string>{"QLIBServiceStop fileindexd 1"});
+    Seed(R"({"/music/a": {}})");
+    ASSERT_TRUE(IndexMgr::Delete(J("[]")));
+    EXPECT_TRUE(qira_sim::Journal().empty());
+}
+
+TEST_F(DeleteTest, FailuresAfterTheSaveAreReportedWithTheirMessages) {
+    Seed(R"({"/music/a": {}, "/music/b": {}})");
+    daemon_.reset();
+    EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a"])")));
+    EXPECT_TRUE(testkit::Logged("SendCammandToDaemon failed"));
+    EXPECT_FALSE(Conf().isMember("/music/a"));
+
+    daemon_ = std::make_unique<testkit::FakeDaemon>(QIRA::FILEINDEX::detail::DaemonSocketPath());
+    Seed(R"({"/music/a": {}, "/music/b": {}})");
+    qira_sim::InjectFault("MonitorQueue::Upsert", 0x90);
+    EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a"])")));
+    EXPECT_TRUE(testkit::Logged("UpsertQIRANotifydCfg failed, share=music"));
+
+    qira_sim::ClearFaults();
+    Seed(R"({"/music/a": {}, "/photo/a": {}})");
+    qira_sim::InjectFault("MonitorQueue::Delete", 0x91);
+    EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a"])")));
+    EXPECT_TRUE(testkit::Logged("DeleteQIRANtifydCfg failed, share=music"));
+
+    qira_sim::ClearFaults();
+    Seed(R"({"/music/a": {}, "/music/b": {}})");
+    unlink(QueueOf("music").c_str());
+    MakeDir(QueueOf("music"));
+    EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a"])")));
+    EXPECT_TRUE(testkit::Logged("AddCustomEvent failed"));
+    EXPECT_TRUE(testkit::Logged("Update failed"));
+}
+
+TEST_F(DeleteTest, CleanupFailureKeepsTheMonitorQueue) {
+    Seed(R"({"/music/a": {}, "/photo/a": {}})");
+    // Lookups of "music" pass for load, delete (twice) and IsShareIndexed's load, then fail.
+    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", 4);
+    EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a"])")));
+    EXPECT_TRUE(testkit::Logged("CleanShareIndexData failed, share=music"));
+    EXPECT_EQ(qira_sim::Registrations().size(), 1u);
+}
+
+}  // namespace
