@@ -36,7 +36,7 @@ protected:
         qira_sim::ClearJournal();
         ClearLog();
         ClearError();
-        daemon_->Drain();
+        if (daemon_) daemon_->Drain();
     }
 
     std::string music_;
