@@ -1,0 +1,72 @@
+// Bringing an upgraded system into the running state.
+#include "fileindex/utils.h"
+#include "index_fixture.h"
+
+using namespace QIRA::FILEINDEX;
+using testkit::J;
+
+namespace {
+
+class MigrationTest : public testkit::IndexFixture {};
+
+TEST_F(MigrationTest, NothingConfiguredStopsTheDaemon) {
+    qira_sim::SetServiceState("fileindexd", "running");
+    ASSERT_TRUE(Updater_lum60_beta2());
+    EXPECT_EQ(testkit::JournalOps(), std::vector<std::string>{"QLIBServiceStop fileindexd 1"});
+    EXPECT_EQ(qira_sim::ServiceState("fileindexd"), "stopped");
+    Settle();
+    qira_sim::InjectFault("QLIBServiceStop", 0xC0);
+    EXPECT_FALSE(Updater_lum60_beta2());
+    EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"QLIBServiceStart failed: err=[0x00C0 sim/QLIBServiceStop:1]"});
+}
+
+TEST_F(MigrationTest, ConfiguredFoldersAreRegisteredOncePerShareAndReindexed) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/b": {}, "/photo/a": {}})");
+    ASSERT_TRUE(Updater_lum60_beta2());
+    EXPECT_EQ(testkit::JournalOps(), (std::vector<std::string>{
+                                         "QLIBServiceStart fileindexd 1",
+                                         "QIRASMBSetSpotlight 1",
+                                         "MonitorQueue::Upsert " + QueueOf("music") + " fileindex 1",
+                                         "MonitorQueue::Upsert " + QueueOf("photo") + " fileindex 1",
+                                     }));
+    EXPECT_EQ(Queue("music").size(), 2u);
+    EXPECT_EQ(Queue("music")[1], J("{\"event\": 65536, \"path\": \"" + music_ + "/b\", \"data\": null}"));
+    EXPECT_EQ(Queue("photo").size(), 1u);
+    EXPECT_TRUE(qira_sim::SpotlightState());
+}
+
+TEST_F(MigrationTest, EachStepFailingEndsTheMigration) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/photo/a": {}})");
+    struct Case {
+        const char* op;
+        const char* arg;
+        std::string message;
+        size_t journalled;
+    };
+    const Case cases[] = {
+        {"QLIBServiceStart", "", "QLIBServiceStart failed: err=[0x00C1 sim/QLIBServiceStart:1]", 1},
+        {"QIRASMBSetSpotlight", "", "QIRASMBSetSpotlight failed: err=[0x00C1 sim/QIRASMBSetSpotlight:1]", 2},
+        {"MonitorQueue::Upsert", "", "UpsertQIRANotifydCfg failed, share=music", 3},
+    };
+    for (const auto& c : cases) {
+        qira_sim::ClearFaults();
+        qira_sim::InjectFault(c.op, 0xC1, c.arg);
+        Settle();
+        EXPECT_FALSE(Updater_lum60_beta2()) << c.op;
+        EXPECT_TRUE(testkit::Logged(c.message)) << c.op;
+        EXPECT_EQ(qira_sim::Journal().size(), c.journalled) << c.op;
+        EXPECT_FALSE(testkit::Exists(QueueOf("music")));
+    }
+    qira_sim::ClearFaults();
+    MakeDir(QueueOf("photo"));
+    Settle();
+    EXPECT_FALSE(Updater_lum60_beta2());
+    EXPECT_TRUE(testkit::Logged("Reindex failed"));
+    testkit::WriteFile(FolderConf(), R"({"": {}})");
+    EXPECT_FALSE(Updater_lum60_beta2());
+    EXPECT_TRUE(testkit::Logged("GetShareNameByPath failed, path="));
+    testkit::WriteFile(FolderConf(), "[]");
+    EXPECT_FALSE(Updater_lum60_beta2());
+}
+
+}  // namespace
