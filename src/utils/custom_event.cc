@@ -1,6 +1,7 @@
 // Appending custom events to a share's event queue; a lost event marks the share for reindex.
 #include <fcntl.h>
 #include <sys/file.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -24,11 +25,24 @@ constexpr int kAppendAttempts = 3;
 
 enum class AppendResult { Written, Contended, Failed };
 
+// A queue the daemon unlinked while we waited for its lock is no longer the queue.
+bool StillLinked(int fd) {
+    struct stat st;
+    return fstat(fd, &st) == 0 && st.st_nlink > 0;
+}
+
 AppendResult AppendLine(const std::string& queuePath, const std::string& line) {
-    for (int attempt = 0; attempt < kAppendAttempts; ++attempt) {
+    int attempt = 0;
+    int reopened = 0;
+    while (attempt < kAppendAttempts) {
         const int fd = detail::OpenNoFollow(queuePath, O_WRONLY | O_CREAT | O_APPEND, 0644);
         if (fd < 0) return AppendResult::Failed;
         if (flock(fd, LOCK_EX | LOCK_NB) == 0) {
+            if (!StillLinked(fd) && ++reopened <= kAppendAttempts) {
+                flock(fd, LOCK_UN);
+                close(fd);
+                continue;
+            }
             const ssize_t wrote = write(fd, line.data(), line.size());
             if (wrote != static_cast<ssize_t>(line.size())) {
                 FILEIDX_DEBUG_LOG("write fail, (%ld, %ld)", static_cast<long>(wrote), static_cast<long>(line.size()));
@@ -44,6 +58,7 @@ AppendResult AppendLine(const std::string& queuePath, const std::string& line) {
         }
         close(fd);
         usleep(static_cast<useconds_t>((rand() % 10) * 1000));
+        ++attempt;
     }
     FILEIDX_DEBUG_LOG("try lock too many times, path=%s, reason=%m", queuePath.c_str());
     return AppendResult::Contended;

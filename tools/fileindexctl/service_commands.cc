@@ -1,0 +1,100 @@
+// service status | pause | resume, and the migration step.
+#include <ctime>
+#include <set>
+
+#include "commands.h"
+#include "fileindex/fileindex.h"
+
+namespace fileindexctl {
+namespace {
+
+using QIRA::FILEINDEX::StatusMgr;
+
+std::string PauseText(long long resumeTime) {
+    if (resumeTime == 0) return "paused until resumed";
+    if (resumeTime > 0 && time(nullptr) < resumeTime) return "paused until " + FormatLocalTime(resumeTime);
+    return "running";
+}
+
+// The shares of the indexed folders, with their flags.
+void ShareFlags(Json::Value& noSpace, Json::Value& needReindex) {
+    std::vector<QIRA::FILEINDEX::Folder> folders;
+    QIRA::FILEINDEX::IndexMgr::List(folders);
+    std::set<std::string> shares;
+    for (const auto& folder : folders) {
+        std::string share;
+        if (QIRA::FILEINDEX::GetShareNameByPath(share, folder.path)) shares.insert(share);
+    }
+    for (const auto& share : shares) {
+        if (StatusMgr::ShareIsNoSpace(share)) noSpace.append(share);
+        if (StatusMgr::ShareIsNeedReindex(share)) needReindex.append(share);
+    }
+}
+
+std::string Join(const Json::Value& items) {
+    std::string text;
+    for (const auto& item : items) text += (text.empty() ? "" : ", ") + item.asString();
+    return text.empty() ? "-" : text;
+}
+
+int Status(Context& ctx) {
+    std::string word;
+    long long resumeTime = -1;
+    if (!StatusMgr::GetStatus(word)) return Fail("service status");
+    if (!StatusMgr::GetPauseInfo(resumeTime)) return Fail("service status");
+    Json::Value out(Json::objectValue);
+    out["status"] = word;
+    out["resume_time"] = static_cast<Json::Int64>(resumeTime);
+    out["pause"] = PauseText(resumeTime);
+    out["no_space"] = Json::Value(Json::arrayValue);
+    out["need_reindex"] = Json::Value(Json::arrayValue);
+    ShareFlags(out["no_space"], out["need_reindex"]);
+    ctx.out.Emit(out, Table{{"status", word},
+                            {"pause", out["pause"].asString()},
+                            {"out of space", Join(out["no_space"])},
+                            {"need reindex", Join(out["need_reindex"])}});
+    return 0;
+}
+
+}  // namespace
+
+void AddServiceCommands(CLI::App& app, Context& ctx) {
+    auto* service = app.add_subcommand("service", "The indexing service");
+    service->require_subcommand(1);
+    service->add_subcommand("status", "Service status word, pause state and share flags")->callback([&ctx] {
+        ctx.status = Status(ctx);
+    });
+
+    auto hours = std::make_shared<int>(0);
+    auto* pause = service->add_subcommand("pause", "Pause indexing");
+    pause->add_option("--hours", *hours, "Hours to pause (0 = until resumed)");
+    pause->callback([&ctx, hours] {
+        if (!StatusMgr::Pause(*hours)) {
+            ctx.status = Fail("service pause");
+            return;
+        }
+        long long resumeTime = -1;
+        StatusMgr::GetPauseInfo(resumeTime);
+        Json::Value out(Json::objectValue);
+        out["resume_time"] = static_cast<Json::Int64>(resumeTime);
+        ctx.out.Emit(out, PauseText(resumeTime));
+    });
+    service->add_subcommand("resume", "Resume indexing")->callback([&ctx] {
+        if (!StatusMgr::Resume()) {
+            ctx.status = Fail("service resume");
+            return;
+        }
+        ctx.out.Emit(Json::Value("running"), "running");
+    });
+
+    app.add_subcommand("migrate", "Bring a system upgraded from the older release into the running state")
+        ->callback([&ctx] {
+            if (!QIRA::FILEINDEX::Updater_lum60_beta2()) {
+                ctx.status = Fail("migrate");
+                return;
+            }
+            ctx.out.Emit(Json::Value(true), "ok");
+        });
+}
+
+}  // namespace fileindexctl

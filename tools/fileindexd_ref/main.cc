@@ -1,0 +1,150 @@
+// fileindexd-ref: a stand-in for the indexing daemon, for development and demonstrations. It
+// listens on the daemon socket, logs every command, keeps the pause state it is told and drains
+// each indexed share's queue while not paused.
+#include <poll.h>
+#include <sys/socket.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <chrono>
+#include <csignal>
+#include <cstdint>
+#include <cstring>
+#include <ctime>
+#include <iostream>
+#include <set>
+
+#include <CLI/CLI.hpp>
+
+#include "fileindex/fileindex.h"
+#include "queue_drain.h"
+
+namespace {
+
+volatile sig_atomic_t g_stop = 0;
+
+void OnTerm(int) { g_stop = 1; }
+
+std::string SocketPath() {
+    const char* root = std::getenv("QIRA_ROOT");
+    std::string prefix = root ? root : "";
+    while (!prefix.empty() && prefix.back() == '/') prefix.pop_back();
+    return prefix + "/var/run/fileindexd.sock";
+}
+
+int Listen(const std::string& path) {
+    sockaddr_un address;
+    std::memset(&address, 0, sizeof address);
+    if (path.size() + 1 > sizeof address.sun_path) return -1;
+    address.sun_family = AF_UNIX;
+    std::memcpy(address.sun_path, path.c_str(), path.size() + 1);
+    unlink(path.c_str());
+    const int fd = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    if (fd < 0 || bind(fd, reinterpret_cast<sockaddr*>(&address), sizeof address) != 0 || listen(fd, 64) != 0) return -1;
+    return fd;
+}
+
+bool ReadExactly(int fd, char* buffer, size_t size) {
+    size_t done = 0;
+    while (done < size) {
+        const ssize_t got = read(fd, buffer + done, size - done);
+        if (got <= 0) return false;
+        done += static_cast<size_t>(got);
+    }
+    return true;
+}
+
+class Daemon {
+public:
+    explicit Daemon(int listener) : listener_(listener) { QIRA::FILEINDEX::StatusMgr::GetPauseInfo(resume_time_); }
+
+    // Commands are answered at once; the queues are drained once per interval.
+    void Serve(int intervalMs) {
+        auto nextDrain = std::chrono::steady_clock::now() + std::chrono::milliseconds(intervalMs);
+        while (!g_stop) {
+            const auto wait = std::chrono::duration_cast<std::chrono::milliseconds>(nextDrain - std::chrono::steady_clock::now());
+            pollfd pfd{listener_, POLLIN, 0};
+            if (poll(&pfd, 1, std::max<int>(0, static_cast<int>(wait.count()))) > 0) Accept();
+            if (std::chrono::steady_clock::now() < nextDrain) continue;
+            if (!Paused()) DrainAll();
+            nextDrain = std::chrono::steady_clock::now() + std::chrono::milliseconds(intervalMs);
+        }
+    }
+
+private:
+    bool Paused() const { return resume_time_ == 0 || time(nullptr) < resume_time_; }
+
+    void Accept() {
+        const int client = accept4(listener_, nullptr, nullptr, SOCK_CLOEXEC);
+        if (client < 0) return;
+        timeval timeout{1, 0};
+        setsockopt(client, SOL_SOCKET, SO_RCVTIMEO, &timeout, sizeof timeout);
+        uint32_t length = 0;
+        std::string text;
+        if (ReadExactly(client, reinterpret_cast<char*>(&length), sizeof length) && length > 0 && length < (1u << 24)) {
+            text.resize(length);
+            if (!ReadExactly(client, &text[0], length)) text.clear();
+        }
+        close(client);
+        Json::Value message;
+        if (text.empty() || text.back() != '\0' || !QIRA::FILEINDEX::fromString(message, text.substr(0, text.size() - 1))) {
+            std::cout << "fileindexd-ref: malformed frame" << std::endl;
+            return;
+        }
+        std::cout << "fileindexd-ref: command " << QIRA::FILEINDEX::toString(message) << std::endl;
+        Apply(message);
+    }
+
+    void Apply(const Json::Value& message) {
+        const std::string type = message["type"].isString() ? message["type"].asString() : "";
+        if (type == "pause" && message["data"]["resume_time"].isInt64()) resume_time_ = message["data"]["resume_time"].asInt64();
+        if (type == "resume") resume_time_ = -1;
+    }
+
+    void DrainAll() {
+        std::vector<QIRA::FILEINDEX::Folder> folders;
+        if (!QIRA::FILEINDEX::IndexMgr::List(folders)) return;
+        std::set<std::string> shares;
+        for (const auto& folder : folders) {
+            std::string share;
+            if (QIRA::FILEINDEX::GetShareNameByPath(share, folder.path)) shares.insert(share);
+        }
+        for (const auto& share : shares) {
+            char queue[4096];
+            if (FILEIDXQueuePathGet(share.c_str(), queue, sizeof queue) < 0) continue;
+            fileindexd_ref::TakeQueue(queue);
+            fileindexd_ref::ProcessTaken(queue);
+        }
+    }
+
+    int listener_;
+    long long resume_time_ = -1;
+};
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    CLI::App app{"Reference stand-in for the indexing daemon (not the production daemon)", "fileindexd-ref"};
+    std::string root;
+    int intervalMs = 200;
+    app.add_option("--root", root, "Root prefix of the appliance (instead of QIRA_ROOT)");
+    app.add_option("--interval", intervalMs, "Milliseconds between passes over the queues")->check(CLI::Range(1, 60000));
+    CLI11_PARSE(app, argc, argv);
+    if (!root.empty()) setenv("QIRA_ROOT", root.c_str(), 1);
+    signal(SIGTERM, OnTerm);
+    signal(SIGINT, OnTerm);
+    signal(SIGPIPE, SIG_IGN);
+    const std::string path = SocketPath();
+    const int listener = Listen(path);
+    if (listener < 0) {
+        std::cerr << "fileindexd-ref: cannot listen on " << path << "\n";
+        return 1;
+    }
+    std::cout << "fileindexd-ref: listening on " << path << std::endl;
+    Daemon(listener).Serve(intervalMs);
+    close(listener);
+    unlink(path.c_str());
+    std::cout << "fileindexd-ref: stopped" << std::endl;
+    return 0;
+}
