@@ -157,7 +157,10 @@ TEST_F(DaemonStandInTest, RecordsAppendedWhileTheDaemonDrainsAreNotLost) {
         for (int i = 0; i < kEvents; ++i) {
             if (!AddCustomEvent(kEventFolderSettingChanged, music_ + "/a/f" + std::to_string(i), J("{}"))) ++failed;
         }
-        const int dropped = static_cast<int>(testkit::LogLines().size()) + failed * 1000;
+        int dropped = failed * 1000;
+        for (const auto& line : testkit::LogLines()) {
+            if (line.message.rfind("try lock too many times", 0) == 0) ++dropped;
+        }
         _exit(write(report[1], &dropped, sizeof dropped) == sizeof dropped ? 0 : 1);
     }
     int dropped = -1;

@@ -22,6 +22,8 @@ namespace FILEINDEX {
 namespace {
 
 constexpr int kAppendAttempts = 3;
+// Bound on reopening a queue that the daemon took away while we waited for its lock.
+constexpr int kMaxReopen = 100;
 
 enum class AppendResult { Written, Contended, Failed };
 
@@ -38,7 +40,7 @@ AppendResult AppendLine(const std::string& queuePath, const std::string& line) {
         const int fd = detail::OpenNoFollow(queuePath, O_WRONLY | O_CREAT | O_APPEND, 0644);
         if (fd < 0) return AppendResult::Failed;
         if (flock(fd, LOCK_EX | LOCK_NB) == 0) {
-            if (!StillLinked(fd) && ++reopened <= kAppendAttempts) {
+            if (!StillLinked(fd) && ++reopened <= kMaxReopen) {
                 flock(fd, LOCK_UN);
                 close(fd);
                 continue;

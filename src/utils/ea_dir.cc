@@ -47,7 +47,7 @@ int OpenNoFollow(const std::string& path, int flags, mode_t mode) {
         return -1;
     }
     struct stat st;
-    if (fstat(fd, &st) != 0 || !S_ISREG(st.st_mode) || st.st_nlink != 1) {
+    if (fstat(fd, &st) != 0 || !S_ISREG(st.st_mode) || st.st_nlink > 1) {
         close(fd);
         errno = ELOOP;
         return -1;

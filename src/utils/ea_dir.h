@@ -10,7 +10,8 @@ namespace FILEINDEX {
 namespace detail {
 
 // Opens `path` (".../<dir>/<leaf>") with the last two components reached without following
-// symbolic links; the leaf must be a regular file with one link. -1 with errno otherwise.
+// symbolic links; the leaf must be a regular file with no other hard link. -1 with errno
+// otherwise.
 int OpenNoFollow(const std::string& path, int flags, mode_t mode = 0);
 
 // mkdir of `path`'s last component inside its parent, the parent reached without following a
