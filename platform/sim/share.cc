@@ -29,7 +29,8 @@ int QIRAShareGet(const char* szName, QIRASHARE** ppShare) {
     using namespace qira_sim::detail;
     const std::string name = szName ? szName : "";
     if (Faulted("QIRAShareGet", name)) return -1;
-    const Json::Value shares = ReadState("shares.json", Json::Value(Json::objectValue));
+    static const Json::Value kNone(Json::objectValue);
+    const Json::Value& shares = ReadState("shares.json", kNone);
     if (!shares.isObject() || !shares.isMember(name) || !shares[name]["path"].isString()) {
         SetError(kErrNoSuchShare, __FILE__, __LINE__);
         return -1;

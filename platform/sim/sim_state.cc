@@ -7,6 +7,7 @@
 
 #include <cstdlib>
 #include <fstream>
+#include <map>
 #include <memory>
 #include <sstream>
 
@@ -63,14 +64,35 @@ int g_error_line = 0;
 
 std::string StatePath(const std::string& name) { return StateDir() + "/" + name; }
 
-Json::Value ReadState(const std::string& name, const Json::Value& fallback) {
-    std::ifstream in(StatePath(name));
-    if (!in) return fallback;
+// State files are read far more often than written: keep the parsed value while the file's
+// identity (inode, size, modification time) stays the same.
+const Json::Value& ReadState(const std::string& name, const Json::Value& fallback) {
+    struct Cached {
+        ino_t inode = 0;
+        off_t size = -1;
+        timespec modified{};
+        Json::Value value;
+    };
+    static std::map<std::string, Cached> cache;
+    const std::string path = StatePath(name);
+    Cached& entry = cache[path];
+    struct stat st;
+    if (stat(path.c_str(), &st) != 0) {
+        entry = Cached{};
+        entry.value = fallback;
+        return entry.value;
+    }
+    if (entry.inode == st.st_ino && entry.size == st.st_size && entry.modified.tv_sec == st.st_mtim.tv_sec &&
+        entry.modified.tv_nsec == st.st_mtim.tv_nsec) {
+        return entry.value;
+    }
+    std::ifstream in(path);
     std::stringstream text;
     text << in.rdbuf();
     Json::Value value;
-    if (!ParseJson(text.str(), value)) return fallback;
-    return value;
+    if (!ParseJson(text.str(), value)) value = fallback;
+    entry = Cached{st.st_ino, st.st_size, st.st_mtim, value};
+    return entry.value;
 }
 
 void WriteState(const std::string& name, const Json::Value& value) {
@@ -86,7 +108,7 @@ void WriteState(const std::string& name, const Json::Value& value) {
 void UpdateState(const std::string& name, const Json::Value& fallback,
                  const std::function<void(Json::Value&)>& change) {
     StateLock lock;
-    Json::Value value = ReadState(name, fallback);
+    Json::Value value = ReadState(name, fallback);  // a copy to change
     change(value);
     WriteState(name, value);
 }
@@ -107,7 +129,8 @@ void AppendJournal(const std::string& op, const Json::Value& args, const Json::V
 }
 
 bool Faulted(const char* op, const std::string& arg) {
-    const Json::Value faults = ReadState("faults.json", Json::Value(Json::objectValue));
+    static const Json::Value kNone(Json::objectValue);
+    const Json::Value& faults = ReadState("faults.json", kNone);
     if (!faults.isObject() || !faults.isMember(op)) return false;
     const Json::Value& fault = faults[op];
     if (!fault.isObject()) return false;
@@ -136,7 +159,8 @@ bool IsUnder(const std::string& path, const std::string& dir) {
 }
 
 bool FindShareOf(const std::string& fullPath, std::string& name, Json::Value& share) {
-    const Json::Value shares = ReadState("shares.json", Json::Value(Json::objectValue));
+    static const Json::Value kNone(Json::objectValue);
+    const Json::Value& shares = ReadState("shares.json", kNone);
     if (!shares.isObject()) return false;
     size_t best = 0;
     for (const auto& key : shares.getMemberNames()) {

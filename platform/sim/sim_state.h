@@ -12,8 +12,9 @@ namespace detail {
 
 std::string StatePath(const std::string& name);
 
-// Reads a state file; a missing or unreadable file reads as `fallback`.
-Json::Value ReadState(const std::string& name, const Json::Value& fallback);
+// Reads a state file; a missing or unreadable file reads as `fallback`. The reference stays
+// valid until the next read of the same file.
+const Json::Value& ReadState(const std::string& name, const Json::Value& fallback);
 
 // Read-modify-write of a state file under the simulation's lock; the file is replaced atomically.
 void UpdateState(const std::string& name, const Json::Value& fallback,
