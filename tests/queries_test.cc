@@ -59,6 +59,9 @@ TEST_F(QueriesTest, ShareNamesAreCaseSensitive) {
     EXPECT_EQ(FILEIDXIsShareIndexed("music"), 0);
     EXPECT_EQ(FILEIDXIsPathIndexed("/Music/a/b"), 1);
     EXPECT_EQ(FILEIDXIsPathIndexed("/music/a/b"), 0);
+    EXPECT_EQ(FILEIDXIsShareIndexed(nullptr), 0);
+    EXPECT_EQ(FILEIDXIsPathIndexed(nullptr), 0);
+    EXPECT_EQ(FILEIDXIsFullPathIndexed(nullptr), 0);
 }
 
 TEST_F(QueriesTest, EmptyShareNamesAreLoggedAndSkipped) {

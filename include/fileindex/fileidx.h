@@ -5,6 +5,7 @@
 extern "C" {
 #endif
 
+/* The three questions answer 0 for a null argument. */
 /* 1 when the share holds an indexed folder; 0 when not or on any failure. */
 int FILEIDXIsShareIndexed(const char* share);
 /* 1 when the share path lies in an indexed folder; 0 when not or on any failure. */

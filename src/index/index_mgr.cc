@@ -82,14 +82,15 @@ bool IndexMgr::IsFullPathIndexed(const std::string& full_path, const std::vector
 }  // namespace FILEINDEX
 }  // namespace QIRA
 
+// A null argument answers 0: nothing may unwind through C linkage.
 extern "C" int FILEIDXIsShareIndexed(const char* share) {
-    return QIRA::FILEINDEX::IndexMgr::IsShareIndexed(std::string(share)) ? 1 : 0;
+    return share != nullptr && QIRA::FILEINDEX::IndexMgr::IsShareIndexed(share) ? 1 : 0;
 }
 
 extern "C" int FILEIDXIsPathIndexed(const char* path) {
-    return QIRA::FILEINDEX::IndexMgr::IsPathIndexed(std::string(path)) ? 1 : 0;
+    return path != nullptr && QIRA::FILEINDEX::IndexMgr::IsPathIndexed(path) ? 1 : 0;
 }
 
 extern "C" int FILEIDXIsFullPathIndexed(const char* full_path) {
-    return QIRA::FILEINDEX::IndexMgr::IsFullPathIndexed(std::string(full_path)) ? 1 : 0;
+    return full_path != nullptr && QIRA::FILEINDEX::IndexMgr::IsFullPathIndexed(full_path) ? 1 : 0;
 }

@@ -1,0 +1,199 @@
+// Links planted in share directories and hostile daemons never steer the library.
+#include <fcntl.h>
+#include <signal.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/un.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <chrono>
+#include <cstring>
+
+#include "fileindex/fileindex.h"
+#include "index_fixture.h"
+
+using namespace QIRA::FILEINDEX;
+using testkit::J;
+
+namespace {
+
+// A file outside the share whose content, mode and modification time must not change.
+class Canary {
+public:
+    explicit Canary(const std::string& path) : path_(path) {
+        testkit::WriteFile(path_, "canary");
+        chmod(path_.c_str(), 0600);
+        stat(path_.c_str(), &before_);
+    }
+    void ExpectUntouched() const {
+        struct stat now;
+        ASSERT_EQ(lstat(path_.c_str(), &now), 0);
+        EXPECT_EQ(testkit::ReadFile(path_), "canary");
+        EXPECT_EQ(now.st_mode, before_.st_mode);
+        EXPECT_EQ(now.st_mtim.tv_sec, before_.st_mtim.tv_sec);
+        EXPECT_EQ(now.st_mtim.tv_nsec, before_.st_mtim.tv_nsec);
+    }
+
+private:
+    std::string path_;
+    struct stat before_;
+};
+
+class PlantedLinkTest : public testkit::IndexFixture {
+protected:
+    void SetUp() override {
+        IndexFixture::SetUp();
+        outside_ = Path("/outside");
+        MakeDir(outside_);
+    }
+    std::string outside_;
+};
+
+TEST_F(PlantedLinkTest, SymlinkedQueueIsRefusedAndTheShareMarked) {
+    Canary canary(outside_ + "/target");
+    MakeDir(music_ + "/@eaDir");
+    ASSERT_EQ(symlink((outside_ + "/target").c_str(), QueueOf("music").c_str()), 0);
+    EXPECT_FALSE(AddCustomEvent(kEventReindex, music_ + "/a", Json::Value()));
+    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
+    canary.ExpectUntouched();
+}
+
+TEST_F(PlantedLinkTest, HardLinkedQueueIsRefused) {
+    const std::string target = music_ + "/user-file";
+    testkit::WriteFile(target, "user data");
+    MakeDir(music_ + "/@eaDir");
+    ASSERT_EQ(link(target.c_str(), QueueOf("music").c_str()), 0);
+    EXPECT_FALSE(AddCustomEvent(kEventReindex, music_ + "/a", Json::Value()));
+    EXPECT_EQ(testkit::ReadFile(target), "user data");
+}
+
+TEST_F(PlantedLinkTest, SymlinkedEaDirIsRefusedForQueueAndDatabase) {
+    Canary canary(outside_ + "/QIRA@file_index_queue");
+    ASSERT_EQ(symlink(outside_.c_str(), (music_ + "/@eaDir").c_str()), 0);
+    EXPECT_FALSE(AddCustomEvent(kEventReindex, music_ + "/a", Json::Value()));
+    char buffer[4096];
+    EXPECT_GT(FILEIDXDBPathGet("music", buffer, sizeof buffer), 0);
+    EXPECT_FALSE(testkit::Exists(outside_ + "/QIRA@.fileindexdb"));
+    EXPECT_TRUE(IndexMgr::CleanShareIndexData("music"));
+    canary.ExpectUntouched();
+}
+
+TEST_F(PlantedLinkTest, SymlinkedCompanionIsNeitherFollowedNorRemovedThrough) {
+    Canary canary(outside_ + "/records");
+    MakeDir(music_ + "/@eaDir");
+    ASSERT_EQ(symlink((outside_ + "/records").c_str(), (QueueOf("music") + ".tmp").c_str()), 0);
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
+    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "finished");
+    EXPECT_TRUE(AddCustomEvent(kEventReindex, music_ + "/a", Json::Value()));
+    EXPECT_TRUE(IndexMgr::CleanShareIndexData("music"));
+    EXPECT_FALSE(testkit::Exists(QueueOf("music") + ".tmp"));
+    canary.ExpectUntouched();
+}
+
+TEST_F(PlantedLinkTest, SymlinkedDatabaseDirectoryIsLeftAlone) {
+    MakeDir(music_ + "/@eaDir");
+    MakeDir(outside_ + "/db");
+    Canary canary(outside_ + "/db/index");
+    ASSERT_EQ(symlink((outside_ + "/db").c_str(), (music_ + "/@eaDir/QIRA@.fileindexdb").c_str()), 0);
+    char buffer[4096];
+    EXPECT_GT(FILEIDXDBPathGet("music", buffer, sizeof buffer), 0);
+    EXPECT_TRUE(IndexMgr::CleanShareIndexData("music"));
+    canary.ExpectUntouched();
+}
+
+class DaemonFaultTest : public testkit::Sandbox {
+protected:
+    // A server in a child process that accepts one connection and then behaves as told.
+    template <typename Behaviour>
+    pid_t Serve(Behaviour behaviour) {
+        const std::string path = detail::DaemonSocketPath();
+        int ready[2];
+        if (pipe(ready) != 0) return -1;
+        const pid_t pid = fork();
+        if (pid == 0) {
+            const int fd = socket(AF_UNIX, SOCK_STREAM, 0);
+            sockaddr_un address{};
+            address.sun_family = AF_UNIX;
+            std::strncpy(address.sun_path, path.c_str(), sizeof address.sun_path - 1);
+            bind(fd, reinterpret_cast<sockaddr*>(&address), sizeof address);
+            listen(fd, 4);
+            if (write(ready[1], "r", 1) != 1) _exit(1);
+            const int client = accept(fd, nullptr, nullptr);
+            behaviour(client);
+            _exit(0);
+        }
+        char c;
+        if (read(ready[0], &c, 1) != 1) return -1;
+        return pid;
+    }
+    Json::Value Big() {
+        Json::Value data(Json::objectValue);
+        data["folder_path"] = std::string(5000, 'x');
+        return data;
+    }
+};
+
+TEST_F(DaemonFaultTest, DaemonThatNeverReadsStillReturnsInBoundedTime) {
+    const pid_t pid = Serve([](int) { pause(); });
+    const auto start = std::chrono::steady_clock::now();
+    EXPECT_TRUE(SendCammandToDaemon("upsert_folder_setting", Big()));  // the socket buffer takes it
+    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(3));
+    kill(pid, SIGKILL);
+    waitpid(pid, nullptr, 0);
+}
+
+TEST_F(DaemonFaultTest, DaemonThatClosesAtOnceFailsWithoutSigpipe) {
+    const pid_t pid = Serve([](int client) {
+        shutdown(client, SHUT_RDWR);
+        close(client);
+    });
+    const auto start = std::chrono::steady_clock::now();
+    // Larger than the socket buffer, so the close is met whenever it happens.
+    Json::Value huge(Json::objectValue);
+    huge["folder_path"] = std::string(1 << 20, 'x');
+    EXPECT_FALSE(SendCammandToDaemon("upsert_folder_setting", huge));
+    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(3));
+    waitpid(pid, nullptr, 0);
+}
+
+TEST_F(DaemonFaultTest, DaemonReadingAByteAtATimeGetsAWholeFrame) {
+    int result[2];
+    ASSERT_EQ(pipe(result), 0);
+    const pid_t pid = Serve([&](int client) {
+        std::string bytes;
+        char c;
+        while (read(client, &c, 1) == 1) bytes.push_back(c);
+        const testkit::Frame frame = testkit::FakeDaemon::Decode(bytes);
+        const char whole = frame.whole && frame.message["data"]["folder_path"].asString().size() == 5000 ? 'y' : 'n';
+        if (write(result[1], &whole, 1) != 1) _exit(1);
+    });
+    EXPECT_TRUE(SendCammandToDaemon("upsert_folder_setting", Big()));
+    char whole = 0;
+    ASSERT_EQ(read(result[0], &whole, 1), 1);
+    EXPECT_EQ(whole, 'y');
+    waitpid(pid, nullptr, 0);
+}
+
+TEST_F(DaemonFaultTest, WrongTypedRequestsAndFilesFailCleanly) {
+    AddShare("music");
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {"name": ["x"], "audio": {"deep": [1]}}})");
+    testkit::WriteFile(StatusConf(), R"({"resume_time": [], "no_space": 5, "need_reindex": "x", "m": {}})");
+    const std::string folders = testkit::ReadFile(FolderConf());
+    const std::string status = testkit::ReadFile(StatusConf());
+    EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": {"a": 1}}])")));
+    EXPECT_FALSE(IndexMgr::Delete(J(R"([{"path": "/music/a"}])")));
+    EXPECT_FALSE(IndexMgr::Reindex(J(R"([["/music/a"]])")));
+    EXPECT_FALSE(StatusMgr::ShareSetNoSpace("music", true));
+    EXPECT_FALSE(StatusMgr::ShareSetNeedReindex("music", false));
+    EXPECT_FALSE(StatusMgr::IsUpdated("m"));
+    long long resume = 7;
+    EXPECT_FALSE(StatusMgr::GetPauseInfo(resume));
+    Json::Value out;
+    EXPECT_TRUE(IndexMgr::List(out, 0, 10, "name", "DESC", J(R"([{"k": 1}])")));
+    EXPECT_EQ(out["folder"][0]["name"].asString(), "");
+    EXPECT_EQ(testkit::ReadFile(FolderConf()), folders);
+    EXPECT_EQ(testkit::ReadFile(StatusConf()), status);
+}
+
+}  // namespace
