@@ -1,0 +1,89 @@
+// Killing a process at random moments while it saves never leaves a file that is not a saved
+// version; leftover temporary files never confuse a later load.
+#include <dirent.h>
+#include <signal.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <random>
+
+#include "fileindex/fileindex.h"
+#include "sandbox.h"
+
+using namespace QIRA::FILEINDEX;
+
+namespace {
+
+class CrashTest : public testkit::Sandbox {
+protected:
+    // The folder.conf text of version v, as Save writes it.
+    static std::string FolderVersion(long v) {
+        return "{\"/music/a\":{\"audio\":false,\"document\":false,\"name\":\"v" + std::to_string(v) +
+               "\",\"path\":\"/music/a\",\"photo\":false,\"video\":false}}\n";
+    }
+    static std::string StatusVersion(long v) { return "{\"resume_time\":" + std::to_string(v) + "}\n"; }
+
+    [[noreturn]] static void SaveForever() {
+        for (long v = 1;; ++v) {
+            Folders folders;
+            Json::Value changed;
+            Json::Value request(Json::objectValue);
+            request["path"] = "/music/a";
+            request["name"] = "v" + std::to_string(v);
+            folders.Upsert(changed, request);
+            folders.Save();
+            Status status;
+            status.Pause(v);
+            status.Save();
+        }
+    }
+
+    static long VersionIn(const std::string& text, const std::string& prefix) {
+        const size_t at = text.find(prefix);
+        return at == std::string::npos ? -1 : std::atol(text.c_str() + at + prefix.size());
+    }
+
+    size_t LeftoverTemporaries() const {
+        size_t count = 0;
+        DIR* dir = opendir(Path("/usr/qira/etc/fileindex").c_str());
+        while (dirent* entry = readdir(dir)) {
+            const std::string name = entry->d_name;
+            if (name != "." && name != ".." && name != "folder.conf" && name != "status.conf") ++count;
+        }
+        closedir(dir);
+        return count;
+    }
+};
+
+TEST_F(CrashTest, EveryFileReadAfterAKillIsASavedVersion) {
+    AddShare("music");
+    std::mt19937 random(12345);
+    constexpr int kKills = 400;
+    for (int round = 0; round < kKills; ++round) {
+        const pid_t saver = fork();
+        if (saver == 0) SaveForever();
+        usleep(std::uniform_int_distribution<useconds_t>(0, 3000)(random));
+        kill(saver, SIGKILL);
+        waitpid(saver, nullptr, 0);
+
+        Folders folders;
+        ASSERT_TRUE(folders.Load()) << "round " << round;
+        Status status;
+        ASSERT_TRUE(status.Load()) << "round " << round;
+        const std::string folderText = testkit::ReadFile(FolderConf());
+        const std::string statusText = testkit::ReadFile(StatusConf());
+        if (!folderText.empty()) {
+            EXPECT_EQ(folderText, FolderVersion(VersionIn(folderText, "\"name\":\"v")));
+        }
+        if (!statusText.empty()) {
+            EXPECT_EQ(statusText, StatusVersion(VersionIn(statusText, "\"resume_time\":")));
+        }
+    }
+    // Temporaries of killed saves are ignored by every load above; they never replace the files.
+    RecordProperty("leftover_temporaries", static_cast<int>(LeftoverTemporaries()));
+    std::vector<Folder> list;
+    ASSERT_TRUE(IndexMgr::List(list));
+    EXPECT_EQ(list.size(), 1u);
+}
+
+}  // namespace
