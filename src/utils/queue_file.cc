@@ -5,6 +5,7 @@
 
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
 #include <memory>
 
 #include <json/reader.h>
@@ -29,6 +30,10 @@ std::unique_ptr<Json::CharReader> NewLineReader() {
     return std::unique_ptr<Json::CharReader>(builder.newCharReader());
 }
 
+const Json::Value* Member(const Json::Value& object, const char* key) {
+    return object.find(key, key + std::strlen(key));
+}
+
 bool ParseRecord(Json::CharReader& reader, const char* begin, const char* end, QueueRecord& record) {
     Json::Value value;
     std::string errors;
@@ -38,8 +43,8 @@ bool ParseRecord(Json::CharReader& reader, const char* begin, const char* end, Q
         return false;
     }
     if (!value.isObject()) return false;
-    const Json::Value* event = value.find("event", "event" + 5);
-    const Json::Value* path = value.find("path", "path" + 4);
+    const Json::Value* event = Member(value, "event");
+    const Json::Value* path = Member(value, "path");
     if (event == nullptr || path == nullptr || !event->isConvertibleTo(Json::uintValue) || !path->isString()) {
         return false;
     }
@@ -47,7 +52,7 @@ bool ParseRecord(Json::CharReader& reader, const char* begin, const char* end, Q
     record.path = path->asString();
     record.path_old.clear();
     if (record.event == kEventRename) {
-        const Json::Value* old = value.find("path_old", "path_old" + 8);
+        const Json::Value* old = Member(value, "path_old");
         if (old != nullptr && old->isString()) record.path_old = old->asString();
     }
     return true;

@@ -1,0 +1,23 @@
+#!/usr/bin/env bash
+# Builds the libFuzzer targets with clang and runs each for a short while (seconds per target as
+# the first argument, default 20) on a scratch copy of its seed corpus.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+seconds=${1:-20}
+scripts/install-deps.sh
+CC=clang CXX=clang++ cmake -S . -B build-fuzz -DCMAKE_BUILD_TYPE=RelWithDebInfo -DFILEINDEX_BUILD_FUZZ=ON \
+  -DFILEINDEX_BUILD_TESTS=OFF >/dev/null
+cmake --build build-fuzz -j "$(nproc)" >/dev/null
+work=$(mktemp -d /tmp/fileindex-fuzz-run-XXXXXX)
+trap 'rm -rf "$work" /tmp/fileindex-fuzz-??????' EXIT
+for target in folder_conf status_conf queue_scan requests; do
+  mkdir -p "$work/$target"
+  cp fuzz/corpus/"$target"/* "$work/$target/"
+  echo "fuzz_$target: ${seconds}s"
+  build-fuzz/fuzz/fuzz_"$target" "$work/$target" -max_total_time="$seconds" -max_len=4096 \
+    -artifact_prefix="$work/$target-" 2>&1 | grep -E "^Done|ERROR|SUMMARY" || true
+  if ls "$work/$target"-crash-* "$work/$target"-leak-* "$work/$target"-timeout-* >/dev/null 2>&1; then
+    echo "fuzz_$target found a failure:" "$work/$target"-*
+    exit 1
+  fi
+done
