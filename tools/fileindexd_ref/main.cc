@@ -67,6 +67,7 @@ public:
             pollfd pfd{listener_, POLLIN, 0};
             if (poll(&pfd, 1, std::max<int>(0, static_cast<int>(wait.count()))) > 0) Accept();
             if (std::chrono::steady_clock::now() < nextDrain) continue;
+            AcceptPending();  // a pause sent before an event was queued is obeyed first
             if (!Paused()) DrainAll();
             nextDrain = std::chrono::steady_clock::now() + std::chrono::milliseconds(intervalMs);
         }
@@ -74,6 +75,11 @@ public:
 
 private:
     bool Paused() const { return resume_time_ == 0 || time(nullptr) < resume_time_; }
+
+    void AcceptPending() {
+        pollfd pfd{listener_, POLLIN, 0};
+        while (poll(&pfd, 1, 0) > 0) Accept();
+    }
 
     void Accept() {
         const int client = accept4(listener_, nullptr, nullptr, SOCK_CLOEXEC);
