@@ -9,6 +9,7 @@
 
 #include "fileindex/folders.h"
 #include "fileindex/status.h"
+#include "child_holding.h"
 #include "log_capture.h"
 #include "sandbox.h"
 
@@ -18,40 +19,6 @@ using testkit::Logged;
 namespace {
 
 class ConfigTest : public testkit::Sandbox {};
-
-// Runs `child` in a forked process that signals readiness through a pipe, then waits for the
-// parent to release it.
-class ChildHolding {
-public:
-    template <typename F>
-    explicit ChildHolding(F child) {
-        int ready[2];
-        if (pipe(ready) != 0 || pipe(release_) != 0) throw std::runtime_error("pipe");
-        pid_ = fork();
-        if (pid_ == 0) {
-            close(ready[0]);
-            const char ok = child() ? 'y' : 'n';
-            if (write(ready[1], &ok, 1) != 1) _exit(2);
-            char go;
-            if (read(release_[0], &go, 1) < 0) _exit(2);
-            _exit(0);
-        }
-        close(ready[1]);
-        if (read(ready[0], &state_, 1) != 1) state_ = '?';
-        close(ready[0]);
-    }
-    ~ChildHolding() {
-        const char go = 'g';
-        if (write(release_[1], &go, 1) != 1) kill(pid_, SIGKILL);
-        waitpid(pid_, nullptr, 0);
-    }
-    bool ChildSucceeded() const { return state_ == 'y'; }
-
-private:
-    pid_t pid_ = -1;
-    int release_[2] = {-1, -1};
-    char state_ = '?';
-};
 
 TEST(ErrorHandlerTest, CodeIsStickyAndTheLaterFailureWins) {
     ErrorHandler::SetError(FILEINDEX_ERR_LOCK);
@@ -107,11 +74,11 @@ TEST_F(ConfigTest, SaveIntoAMissingDirectoryFailsWithErrorSeven) {
 }
 
 TEST_F(ConfigTest, ExclusiveLockFailsWhileAnotherProcessHoldsAShareLock) {
-    ChildHolding reader([] {
+    testkit::ChildHolding reader([] {
         Folders folders;
         return folders.Lock(false);
     });
-    ASSERT_TRUE(reader.ChildSucceeded());
+    ASSERT_TRUE(reader.Took());
     Folders shared;
     EXPECT_TRUE(shared.Lock(false));
     shared.Unlock();

@@ -7,6 +7,7 @@
 
 #include <algorithm>
 
+#include "child_holding.h"
 #include "fileindex/error.h"
 #include "fileindex/status_mgr.h"
 #include "fileindex/utils.h"
@@ -68,27 +69,13 @@ TEST_F(CustomEventTest, OnlyReindexRecordsSuppressAndTheTmpCompanionCounts) {
 TEST_F(CustomEventTest, ContendedQueueGivesUpAfterThreeAttemptsAndReportsSuccess) {
     MakeDir(dir_ + "/@eaDir");
     testkit::WriteFile(QueueOf("s"), "");
-    int ready[2];
-    int release[2];
-    ASSERT_EQ(pipe(ready), 0);
-    ASSERT_EQ(pipe(release), 0);
-    const pid_t child = fork();
-    if (child == 0) {
-        const int fd = open(QueueOf("s").c_str(), O_RDWR);
-        const char ok = flock(fd, LOCK_EX) == 0 ? 'y' : 'n';
-        if (write(ready[1], &ok, 1) != 1) _exit(1);
-        char go;
-        if (read(release[0], &go, 1) < 0) _exit(1);
-        _exit(0);
-    }
-    char ok = 0;
-    ASSERT_EQ(read(ready[0], &ok, 1), 1);
+    testkit::ChildHolding holder([this] { return flock(open(QueueOf("s").c_str(), O_RDWR), LOCK_EX) == 0; });
+    ASSERT_TRUE(holder.Took());
     LOG_LEVEL = 7;
     EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/a", J("{}")));
     LOG_LEVEL = 3;
     EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/a", J("{}")));
-    if (write(release[1], "g", 1) != 1) ADD_FAILURE();
-    waitpid(child, nullptr, 0);
+    holder.Release();
     EXPECT_EQ(testkit::ReadFile(QueueOf("s")), "");
     EXPECT_FALSE(testkit::Exists(StatusConf()));
     ASSERT_EQ(testkit::LogLines().size(), 1u);  // the debug-only line, once

@@ -4,6 +4,7 @@
 
 #include <ctime>
 
+#include "child_holding.h"
 #include "daemon_channel.h"
 #include "fake_daemon.h"
 #include "fileindex/status.h"
@@ -184,22 +185,11 @@ TEST_F(StatusTest, ReviveClearsOnlyTheNoSpaceFlagAndSendsTheCommand) {
 TEST_F(StatusTest, WritersFailWithErrorNineWhileAnotherProcessHoldsTheLock) {
     testkit::WriteFile(StatusConf(), R"({"resume_time": -1})");
     testkit::FakeDaemon daemon(detail::DaemonSocketPath());
-    int ready[2];
-    int release[2];
-    ASSERT_EQ(pipe(ready), 0);
-    ASSERT_EQ(pipe(release), 0);
-    const pid_t child = fork();
-    if (child == 0) {
-        Status holder;
-        const char ok = holder.Lock(true) ? 'y' : 'n';
-        if (write(ready[1], &ok, 1) != 1) _exit(1);
-        char go;
-        if (read(release[0], &go, 1) < 0) _exit(1);
-        _exit(0);
-    }
-    char ok = 0;
-    ASSERT_EQ(read(ready[0], &ok, 1), 1);
-    ASSERT_EQ(ok, 'y');
+    testkit::ChildHolding holder([] {
+        Status status;
+        return status.Lock(true);
+    });
+    ASSERT_TRUE(holder.Took());
     EXPECT_FALSE(StatusMgr::Pause(0));
     EXPECT_FALSE(StatusMgr::Resume());
     EXPECT_FALSE(StatusMgr::ShareSetNoSpace("s", true));
@@ -210,8 +200,7 @@ TEST_F(StatusTest, WritersFailWithErrorNineWhileAnotherProcessHoldsTheLock) {
     long long resume = 0;
     EXPECT_TRUE(StatusMgr::GetPauseInfo(resume));  // readers take no lock
     EXPECT_EQ(resume, -1);
-    if (write(release[1], "g", 1) != 1) ADD_FAILURE();
-    waitpid(child, nullptr, 0);
+    holder.Release();
     EXPECT_EQ(testkit::ReadFile(StatusConf()), R"({"resume_time": -1})");
     EXPECT_TRUE(daemon.Drain().empty());
     EXPECT_TRUE(StatusMgr::Resume());
