@@ -9,6 +9,7 @@
 
 #include "fileindex/folders.h"
 #include "fileindex/status.h"
+#include "qira/qlib_core.h"
 #include "child_holding.h"
 #include "log_capture.h"
 #include "sandbox.h"
@@ -129,6 +130,18 @@ TEST_F(ConfigTest, LockRefusesASymbolicLinkOrANonRegularLockFile) {
     EXPECT_FALSE(status.Lock(true));
     status.Unlock();
     EXPECT_EQ(testkit::ReadFile(canary), "keep");
+}
+
+TEST_F(ConfigTest, ProgramsRunWhileALockIsHeldDoNotInheritIt) {
+    Folders folders;
+    ASSERT_TRUE(folders.Lock(true));
+    const std::string listing = Path("/fds");
+    const std::string script = "ls -l /proc/self/fd > " + listing;
+    ASSERT_EQ(QLIBCExec("/bin/sh", "-c", script.c_str(), nullptr, nullptr), 0);
+    folders.Unlock();
+    const std::string fds = testkit::ReadFile(listing);
+    EXPECT_NE(fds.find("fds"), std::string::npos);
+    EXPECT_EQ(fds.find("fileidx_cfg_folder.lock"), std::string::npos) << fds;
 }
 
 TEST_F(ConfigTest, UnlockWithoutLockDoesNothing) {

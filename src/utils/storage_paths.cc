@@ -44,9 +44,8 @@ int StoragePathGet(const char* szName, char* szOut, int cbOutLen, const char* ou
         return -1;
     }
     const std::unique_ptr<QIRASHARE, void (*)(QIRASHARE*)> share(raw, QIRAShareFree);
-    char eaDir[4096];
-    const bool eaDirFits = snprintf(eaDir, sizeof eaDir, "%s/%s", share->szPath, kEaDir) < static_cast<int>(sizeof eaDir);
-    if (!eaDirFits || QIRAEAMKDir(0, eaDir) < 0) FILEIDX_LOG("QIRAEAMKDir failed, path=%s, code=%d", eaDir, QLIBCErrGet());
+    const std::string eaDir = std::string(share->szPath) + "/" + kEaDir;
+    if (QIRAEAMKDir(0, eaDir.c_str()) < 0) FILEIDX_LOG("QIRAEAMKDir failed, path=%s, code=%d", eaDir.c_str(), QLIBCErrGet());
     const int length = snprintf(szOut, static_cast<size_t>(cbOutLen), "%s/%s/%s", share->szPath, kEaDir, leaf);
     const bool truncated = length >= cbOutLen;
     if (makeLeafDir && !truncated && detail::MkdirNoFollow(szOut, 0777) != 0 && errno != EEXIST) {
