@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <filesystem>
 #include <cstdlib>
 #include <fstream>
 #include <sstream>
@@ -20,15 +21,9 @@ using detail::StatePath;
 using detail::UpdateState;
 
 bool MakeDirs(const std::string& path) {
-    std::string partial;
-    std::stringstream parts(path);
-    std::string part;
-    while (std::getline(parts, part, '/')) {
-        if (part.empty()) continue;
-        partial += "/" + part;
-        if (mkdir(partial.c_str(), 0755) != 0 && errno != EEXIST) return false;
-    }
-    return true;
+    std::error_code error;
+    std::filesystem::create_directories(path, error);
+    return !error;
 }
 
 const char kNotifier[] = R"SH(#!/bin/sh

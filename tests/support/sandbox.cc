@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <cstdlib>
+#include <filesystem>
 #include <fstream>
 #include <sstream>
 
@@ -49,14 +50,8 @@ std::string Sandbox::QueueOf(const std::string& share) const {
 }
 
 void Sandbox::MakeDir(const std::string& path) const {
-    std::string partial;
-    std::stringstream parts(path);
-    std::string part;
-    while (std::getline(parts, part, '/')) {
-        if (part.empty()) continue;
-        partial += "/" + part;
-        mkdir(partial.c_str(), 0755);
-    }
+    std::error_code error;
+    std::filesystem::create_directories(path, error);
 }
 
 std::string ReadFile(const std::string& path) {

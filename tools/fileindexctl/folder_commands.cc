@@ -110,6 +110,21 @@ void AddUpsertCommand(CLI::App& folder, Context& ctx, const char* verb, const ch
     });
 }
 
+// A command that hands its share paths to one operation as a JSON array.
+void AddPathsCommand(CLI::App& parent, Context& ctx, const char* verb, const char* help, const char* operation,
+                     bool (*action)(const Json::Value&)) {
+    auto paths = std::make_shared<std::vector<std::string>>();
+    auto* cmd = parent.add_subcommand(verb, help);
+    cmd->add_option("paths", *paths, "Share paths")->required();
+    cmd->callback([&ctx, paths, operation, action] {
+        if (!action(StringArray(*paths))) {
+            ctx.status = Fail(operation);
+            return;
+        }
+        ctx.out.Emit(StringArray(*paths), "ok");
+    });
+}
+
 }  // namespace
 
 void AddFolderCommands(CLI::App& app, Context& ctx) {
@@ -148,16 +163,7 @@ void AddFolderCommands(CLI::App& app, Context& ctx) {
     AddUpsertCommand(*folder, ctx, "add", "Index folders (adds or updates)");
     AddUpsertCommand(*folder, ctx, "set", "Change folder settings (adds or updates)");
 
-    auto paths = std::make_shared<std::vector<std::string>>();
-    auto* del = folder->add_subcommand("delete", "Stop indexing folders");
-    del->add_option("paths", *paths, "Share paths")->required();
-    del->callback([&ctx, paths] {
-        if (!IndexMgr::Delete(StringArray(*paths))) {
-            ctx.status = Fail("folder delete");
-            return;
-        }
-        ctx.out.Emit(StringArray(*paths), "ok");
-    });
+    AddPathsCommand(*folder, ctx, "delete", "Stop indexing folders", "folder delete", &IndexMgr::Delete);
 
     auto* status = folder->add_subcommand("status", "Indexing status word of one folder");
     status->add_option("path", *path, "Share path")->required();
@@ -166,16 +172,7 @@ void AddFolderCommands(CLI::App& app, Context& ctx) {
         ctx.out.Emit(Json::Value(word), word);
     });
 
-    auto reindexPaths = std::make_shared<std::vector<std::string>>();
-    auto* reindex = app.add_subcommand("reindex", "Index paths again from scratch");
-    reindex->add_option("paths", *reindexPaths, "Share paths")->required();
-    reindex->callback([&ctx, reindexPaths] {
-        if (!IndexMgr::Reindex(StringArray(*reindexPaths))) {
-            ctx.status = Fail("reindex");
-            return;
-        }
-        ctx.out.Emit(StringArray(*reindexPaths), "ok");
-    });
+    AddPathsCommand(app, ctx, "reindex", "Index paths again from scratch", "reindex", &IndexMgr::Reindex);
 }
 
 }  // namespace fileindexctl
