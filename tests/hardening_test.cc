@@ -11,6 +11,7 @@
 #include <cstring>
 
 #include "fileindex/fileindex.h"
+#include "canary.h"
 #include "index_fixture.h"
 
 using namespace QIRA::FILEINDEX;
@@ -18,27 +19,7 @@ using testkit::J;
 
 namespace {
 
-// A file outside the share whose content, mode and modification time must not change.
-class Canary {
-public:
-    explicit Canary(const std::string& path) : path_(path) {
-        testkit::WriteFile(path_, "canary");
-        chmod(path_.c_str(), 0600);
-        stat(path_.c_str(), &before_);
-    }
-    void ExpectUntouched() const {
-        struct stat now;
-        ASSERT_EQ(lstat(path_.c_str(), &now), 0);
-        EXPECT_EQ(testkit::ReadFile(path_), "canary");
-        EXPECT_EQ(now.st_mode, before_.st_mode);
-        EXPECT_EQ(now.st_mtim.tv_sec, before_.st_mtim.tv_sec);
-        EXPECT_EQ(now.st_mtim.tv_nsec, before_.st_mtim.tv_nsec);
-    }
-
-private:
-    std::string path_;
-    struct stat before_;
-};
+using testkit::Canary;
 
 class PlantedLinkTest : public testkit::IndexFixture {
 protected:

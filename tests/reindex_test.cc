@@ -1,4 +1,6 @@
 // Reindex: validation first, revival of out-of-space shares, events in request order.
+#include <climits>
+
 #include "fileindex/index_mgr.h"
 #include "fileindex/status_mgr.h"
 #include "index_fixture.h"
@@ -44,8 +46,17 @@ TEST_F(ReindexTest, ValidationFailsBeforeAnyRevivalOrEvent) {
     EXPECT_FALSE(IndexMgr::Reindex(J(R"(["/music/a", "/empty/x"])")));  // share without folders: silent
     EXPECT_TRUE(testkit::LogLines().empty());
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NONE);
-    EXPECT_FALSE(IndexMgr::Reindex(J(R"([""])")));
-    EXPECT_TRUE(testkit::Logged("Failed to get share name from path: "));
+    std::string tooLong = "/music";  // fits as a share path, not once the volume is put in front
+    while (tooLong.size() + 201 < PATH_MAX) tooLong += "/" + std::string(200, 'x');
+    tooLong += "/" + std::string(PATH_MAX - 2 - tooLong.size(), 'x');
+    for (const std::string& path : std::vector<std::string>{"", "/music/../photo", "/music/a/", "/music//a", "/music/./a",
+                                                            "/music/a\\u0000b", tooLong}) {
+        SCOPED_TRACE(path.substr(0, 40));
+        testkit::ClearLog();
+        EXPECT_FALSE(IndexMgr::Reindex(J("[\"" + path + "\"]")));
+        EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"Malformed jsArrPath: \"" + path + "\""});
+        EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
+    }
     EXPECT_EQ(testkit::ReadFile(StatusConf()), status);
     EXPECT_FALSE(testkit::Exists(QueueOf("music")));
     EXPECT_TRUE(Messages().empty());

@@ -1,10 +1,13 @@
 // The command-line tool's contract and the reference daemon stand-in working with the library.
-#include <sys/file.h>
 #include <fcntl.h>
+#include <poll.h>
+#include <sys/file.h>
+#include <sys/inotify.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include "fileindex/fileindex.h"
+#include "child_holding.h"
 #include "index_fixture.h"
 #include "process.h"
 
@@ -60,15 +63,50 @@ TEST_F(ToolTest, QuestionsAnswerByExitStatus) {
 TEST_F(ToolTest, FailuresNameTheErrorCodeOnOneStderrLine) {
     Folders holder;
     ASSERT_TRUE(holder.Lock(true));
-    auto result = Ctl({"folder", "delete", "/music/a"});
+    auto result = Ctl({"--lock-wait", "0", "folder", "delete", "/music/a"});
     holder.Unlock();
     EXPECT_EQ(result.status, 1);
     EXPECT_EQ(result.out, "");
     EXPECT_EQ(result.err, "fileindexctl: folder delete failed: FILEINDEX_ERR_LOCK (9): the configuration lock is held "
                           "by another process; try again\n");
-    result = Ctl({"service", "pause", "--hours", "-3"});
-    EXPECT_EQ(result.status, 1);
-    EXPECT_EQ(result.err.rfind("fileindexctl: service pause failed: FILEINDEX_ERR_BAD_PARAM (1)", 0), 0u);
+}
+
+TEST_F(ToolTest, ArgumentsTheLibraryWouldReadOtherwiseAreRefused) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/photo/a": {}})");
+    const std::string conf = testkit::ReadFile(FolderConf());
+    const std::vector<std::pair<std::vector<std::string>, std::string>> cases = {
+        {{"share", "remove", ""}, "a share name cannot be empty (the library would take it for every share)"},
+        {{"share", "rename", "music", ""}, "a share name cannot be empty"},
+        {{"share", "need-reindex", "", "on"}, "a share name cannot be empty"},
+        {{"service", "pause", "--hours", "600000"}, "a pause of 600000 hours would end after 2038-01-19 03:14:07 UTC"},
+        {{"service", "pause", "--hours", "-3"}, "hours must be a whole number, 0 or more"},
+    };
+    for (const auto& [args, message] : cases) {
+        SCOPED_TRACE(args[0] + " " + args[1]);
+        const auto result = Ctl(args);
+        EXPECT_EQ(result.status, 2);
+        EXPECT_EQ(result.out, "");
+        EXPECT_NE(result.err.find(message), std::string::npos) << result.err;
+    }
+    EXPECT_EQ(testkit::ReadFile(FolderConf()), conf);
+    EXPECT_FALSE(testkit::Exists(StatusConf()));
+}
+
+TEST_F(ToolTest, HeldLockIsRetriedUntilItIsReleased) {
+    testkit::ChildHolding holder([] { return Folders().Lock(true); });
+    ASSERT_TRUE(holder.Took());
+    const int watch = inotify_init1(IN_CLOEXEC);
+    ASSERT_GE(inotify_add_watch(watch, Path("/tmp/fileidx_cfg_folder.lock").c_str(), IN_CLOSE_WRITE), 0);
+    const pid_t tool = testkit::Start({FILEINDEXCTL, "--lock-wait", "60", "folder", "add", "/music/a"}, Path("/ctl.log"));
+    // A failed attempt closes the lock file: the tool has met the held lock, so release it.
+    pollfd ready{watch, POLLIN, 0};
+    ASSERT_EQ(poll(&ready, 1, 20000), 1);
+    holder.Release();
+    int status = -1;
+    ASSERT_EQ(waitpid(tool, &status, 0), tool);
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0) << testkit::ReadFile(Path("/ctl.log"));
+    EXPECT_TRUE(Conf().isMember("/music/a"));
+    close(watch);
 }
 
 TEST_F(ToolTest, UsageErrorsExitTwoWithTheUsage) {

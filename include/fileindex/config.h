@@ -25,7 +25,9 @@ public:
     // Replaces the file atomically and gives it mode 0644; a failed write sets error 7.
     bool SaveJson();
     // Three non-blocking attempts 0-9 ms apart; error 9 when the lock stays held. The lock file
-    // is opened without following a symbolic link and must be a regular file.
+    // is opened without following a symbolic link and must be a regular file. Unlike the
+    // original design, which kept them open, the descriptor of each failed attempt is closed, so
+    // contention leaks nothing.
     bool Lock(bool exclusive);
     void Unlock();
 

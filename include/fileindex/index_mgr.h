@@ -47,8 +47,10 @@ public:
     static bool ShareRename(const std::string& oldName, const std::string& newName);
     static bool SharePause(const std::string& share);
     static bool ShareResume(const std::string& share);
-    // Removes the share's queue files and index database; skipped when "@eaDir" is not a real
-    // directory.
+    // Removes the share's queue files and index database through a handle on the share's own
+    // "@eaDir", opened without following a link; nothing outside that directory can be touched.
+    // Unlike the original design, which ran "/bin/rm -rf" on each path, no path is resolved again
+    // and no program is run. A database tree deeper than 64 levels is removed only to that depth.
     static bool CleanShareIndexData(const std::string& share);
 
     // --- Monitor queues of qiranotifyd ---

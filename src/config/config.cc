@@ -30,6 +30,11 @@ int OpenLockFile(const std::string& path) {
     return fd;
 }
 
+void CloseFailedAttempt(int& fd) {
+    close(fd);
+    fd = -1;
+}
+
 }  // namespace
 
 Config::Config() : body(Json::objectValue), lock_fd(-1) {}
@@ -58,11 +63,12 @@ bool Config::SaveJson() {
 
 bool Config::Lock(bool exclusive) {
     for (int attempt = 0; attempt < kLockAttempts; ++attempt) {
-        // Descriptors of earlier attempts stay open: each attempt opens the lock file anew.
         lock_fd = OpenLockFile(GetLockPath());
         if (lock_fd < 0) break;
         if (flock(lock_fd, (exclusive ? LOCK_EX : LOCK_SH) | LOCK_NB) == 0) return true;
-        if (errno != EINTR && errno != EWOULDBLOCK) break;
+        const int reason = errno;
+        CloseFailedAttempt(lock_fd);
+        if (reason != EINTR && reason != EWOULDBLOCK) break;
         usleep(static_cast<useconds_t>((rand() % 10) * 1000));
     }
     FILEIDX_LOG("Failed to lock folder");

@@ -5,6 +5,7 @@
 #include "fileindex/json.h"
 #include "fileindex/utils.h"
 #include "log.h"
+#include "path_rules.h"
 #include "root.h"
 
 namespace QIRA {
@@ -83,7 +84,8 @@ bool Folders::Upsert(Json::Value& changed, const Json::Value& request) {
     List(before);
     std::string path;
     std::string fullPath;
-    if (!RetrieveStringFromJsonObj(path, "path", request) || !GetFullPath(fullPath, path)) {
+    if (!RetrieveStringFromJsonObj(path, "path", request) || !detail::IsCanonicalSharePath(path) ||
+        !GetFullPath(fullPath, path) || !detail::FitsPathMax(fullPath.size())) {
         FILEIDX_LOG("Bad param: %s", toString(request).c_str());
         ErrorHandler::SetError(FILEINDEX_ERR_BAD_PARAM);
         return false;

@@ -6,15 +6,16 @@
 #include "fileindex/json.h"
 #include "fileindex/utils.h"
 #include "index_support.h"
+#include "path_rules.h"
 
 namespace QIRA {
 namespace FILEINDEX {
 namespace {
 
-// Every element must be a string; checked before anything changes.
+// Every element must be a string without a NUL byte; checked before anything changes.
 bool AllStrings(const Json::Value& paths) {
     for (const auto& element : paths) {
-        if (!element.isString()) {
+        if (!element.isString() || element.asString().find('\0') != std::string::npos) {
             FILEIDX_LOG("Bad param: %s", toString(element).c_str());
             ErrorHandler::SetError(FILEINDEX_ERR_BAD_PARAM);
             return false;

@@ -5,6 +5,7 @@
 #include "fileindex/folders.h"
 #include "fileindex/utils.h"
 #include "index_support.h"
+#include "path_rules.h"
 
 namespace QIRA {
 namespace FILEINDEX {
@@ -21,6 +22,7 @@ bool IndexMgr::List(Json::Value& out, unsigned long offset, unsigned long limit,
 }
 
 bool IndexMgr::Get(Json::Value& out, const std::string& path) {
+    if (!detail::NulFree(path)) return false;
     Folders folders;
     detail::UnlockOnExit unlock(folders);
     return folders.Lock(true) && folders.Load() && folders.Get(out, path);
@@ -28,7 +30,7 @@ bool IndexMgr::Get(Json::Value& out, const std::string& path) {
 
 bool IndexMgr::IsShareIndexed(const std::string& share) {
     std::vector<Folder> list;
-    if (!List(list)) return false;
+    if (!detail::NulFree(share) || !List(list)) return false;
     for (const auto& folder : list) {
         std::string name;
         if (!GetShareNameByPath(name, folder.path)) {
@@ -42,17 +44,17 @@ bool IndexMgr::IsShareIndexed(const std::string& share) {
 
 bool IndexMgr::IsPathIndexed(const std::string& path) {
     std::vector<Folder> list;
-    return List(list) && IsPathIndexed(path, list);
+    return detail::NulFree(path) && List(list) && IsPathIndexed(path, list);
 }
 
 bool IndexMgr::IsPathContainIndexed(const std::string& path) {
     std::vector<Folder> list;
-    return List(list) && IsPathContainIndexed(path, list);
+    return detail::NulFree(path) && List(list) && IsPathContainIndexed(path, list);
 }
 
 bool IndexMgr::IsFullPathIndexed(const std::string& full_path) {
     std::vector<Folder> list;
-    return List(list) && IsFullPathIndexed(full_path, list);
+    return detail::NulFree(full_path) && List(list) && IsFullPathIndexed(full_path, list);
 }
 
 bool IndexMgr::IsPathIndexed(const std::string& path, const std::vector<Folder>& list) {

@@ -6,6 +6,7 @@
 #include "fileindex/status_mgr.h"
 #include "fileindex/utils.h"
 #include "index_support.h"
+#include "path_rules.h"
 
 namespace QIRA {
 namespace FILEINDEX {
@@ -17,16 +18,21 @@ bool Malformed(const Json::Value& value) {
     return false;
 }
 
-// Nothing changes unless every element is a path in an indexed share.
+// A full path that does not fit the system's path length is malformed; one that does not resolve
+// is left to the event pass, which reports it.
+bool FullPathTooLong(const std::string& share, const std::string& path) {
+    std::string fullPath;
+    return detail::ShareFullPath(share, path, fullPath) && !detail::FitsPathMax(fullPath.size());
+}
+
+// Nothing changes unless every element is a canonical share path in an indexed share.
 bool Validate(const Json::Value& paths, std::set<std::string>& noSpaceShares) {
     for (const auto& element : paths) {
-        if (!element.isString()) return Malformed(element);
+        if (!element.isString() || !detail::IsCanonicalSharePath(element.asString())) return Malformed(element);
         std::string share;
-        if (!GetShareNameByPath(share, element.asString())) {
-            FILEIDX_LOG("Failed to get share name from path: %s", element.asString().c_str());
-            return false;
-        }
+        GetShareNameByPath(share, element.asString());  // cannot fail on a canonical path
         if (!IndexMgr::IsShareIndexed(share)) return false;
+        if (FullPathTooLong(share, element.asString())) return Malformed(element);
         if (StatusMgr::ShareIsNoSpace(share)) noSpaceShares.insert(share);
     }
     return true;

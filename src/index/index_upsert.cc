@@ -6,6 +6,7 @@
 #include "fileindex/json.h"
 #include "fileindex/utils.h"
 #include "index_support.h"
+#include "path_rules.h"
 #include "qira/qlib_service.h"
 
 namespace QIRA {
@@ -102,6 +103,7 @@ bool IndexMgr::Set(const Json::Value& folders) { return Upsert(folders); }
 bool IndexMgr::Add(const Json::Value& folders) { return Upsert(folders); }
 
 bool IndexMgr::Update(const std::string& path, const Json::Value& changes) {
+    if (!detail::NulFree(path)) return false;
     std::string fullPath;
     if (!GetFullPath(fullPath, path)) {
         FILEIDX_LOG("GetFullPath failed, path=%s", path.c_str());

@@ -3,7 +3,9 @@
 #include "fileindex/folders.h"
 #include "fileindex/index_mgr.h"
 #include "fileindex/utils.h"
+#include "ea_dir.h"
 #include "index_support.h"
+#include "path_rules.h"
 #include "queue_file.h"
 
 namespace QIRA {
@@ -20,21 +22,13 @@ bool LockAndListShare(Folders& folders, const std::string& share, std::vector<Fo
     return folders.Lock(true) && folders.Load() && folders.List(list, share);
 }
 
-// "@eaDir" must be a real directory before anything inside it is removed.
-bool HasRealEaDir(const std::string& storagePath) {
-    const size_t slash = storagePath.rfind('/');
-    return slash != std::string::npos && IsDirExist(storagePath.substr(0, slash));
-}
-
-void RemoveTree(const std::string& path) { QLIBCExec("/bin/rm", "-rf", path.c_str(), nullptr, nullptr); }
-
 }  // namespace
 
 bool IndexMgr::ShareRemove(const std::string& share) {
     Folders folders;
     detail::UnlockOnExit unlock(folders);
     std::vector<Folder> list;
-    if (!LockAndListShare(folders, share, list)) return false;
+    if (!detail::NulFree(share) || !LockAndListShare(folders, share, list)) return false;
     for (const auto& folder : list) {
         Json::Value report;
         if (!folders.Delete(report, folder.path)) return false;
@@ -48,7 +42,9 @@ bool IndexMgr::ShareRename(const std::string& oldName, const std::string& newNam
     Folders folders;
     detail::UnlockOnExit unlock(folders);
     std::vector<Folder> list;
-    if (!LockAndListShare(folders, oldName, list)) return false;
+    if (!detail::NulFree(oldName) || !detail::NulFree(newName) || !LockAndListShare(folders, oldName, list)) {
+        return false;
+    }
     for (auto& folder : list) {
         Json::Value report;
         if (!folders.Delete(report, folder.path)) return false;
@@ -59,6 +55,7 @@ bool IndexMgr::ShareRename(const std::string& oldName, const std::string& newNam
 }
 
 bool IndexMgr::SharePause(const std::string& share) {
+    if (!detail::NulFree(share)) return false;
     if (!SendCammandToDaemon("delete_share_worker", ShareData(share))) return false;
     if (!DeleteQIRANotifydCfg(share)) {
         FILEIDX_LOG("DeleteQIRANotifydCfg failed, share=%s", share.c_str());
@@ -68,6 +65,7 @@ bool IndexMgr::SharePause(const std::string& share) {
 }
 
 bool IndexMgr::ShareResume(const std::string& share) {
+    if (!detail::NulFree(share)) return false;
     if (!UpsertQIRANotifydCfg(share)) {
         FILEIDX_LOG("UpsertQIRANotifydCfg failed, share=%s", share.c_str());
         return false;
@@ -78,17 +76,14 @@ bool IndexMgr::ShareResume(const std::string& share) {
 bool IndexMgr::CleanShareIndexData(const std::string& share) {
     std::string queuePath;
     if (!detail::ShareQueuePath(share, queuePath)) return false;
-    const bool removable = HasRealEaDir(queuePath);
-    if (removable) {
-        RemoveTree(queuePath);
-        RemoveTree(queuePath + ".tmp");
-    }
+    detail::RemoveInEaDir(queuePath);
+    detail::RemoveInEaDir(queuePath + ".tmp");
     char dbPath[4096] = {0};
     if (FILEIDXDBPathGet(share.c_str(), dbPath, sizeof dbPath) < 0) {
         FILEIDX_LOG("FILEIDXDBPathGet failed, share=%s", share.c_str());
         return false;
     }
-    if (removable && HasRealEaDir(dbPath)) RemoveTree(dbPath);
+    detail::RemoveInEaDir(dbPath);
     return true;
 }
 

@@ -8,6 +8,7 @@
 #include "fileindex/status.h"
 #include "fileindex/utils.h"
 #include "log.h"
+#include "path_rules.h"
 
 namespace QIRA {
 namespace FILEINDEX {
@@ -15,9 +16,9 @@ namespace {
 
 using Change = std::function<bool(Status&)>;
 
-bool Read(const std::function<bool(Status&)>& question) {
+bool Read(const std::string& name, const std::function<bool(Status&)>& question) {
     Status status;
-    return status.Load() && question(status);
+    return detail::NulFree(name) && status.Load() && question(status);
 }
 
 // The daemon command (when `type` is not empty) is sent while the status lock is held.
@@ -47,31 +48,32 @@ long long ResumeTimeAfter(int hours) {
 }  // namespace
 
 bool StatusMgr::GetPauseInfo(long long& resumeTime) {
-    return Read([&](Status& s) { return s.GetPauseInfo(resumeTime); });
+    Status status;
+    return status.Load() && status.GetPauseInfo(resumeTime);
 }
 
 bool StatusMgr::ShareIsNoSpace(const std::string& share) {
-    return Read([&](Status& s) { return s.ShareIsNoSpace(share); });
+    return Read(share, [&](Status& s) { return s.ShareIsNoSpace(share); });
 }
 
 bool StatusMgr::ShareIsNeedReindex(const std::string& share) {
-    return Read([&](Status& s) { return s.ShareIsNeedReindex(share); });
+    return Read(share, [&](Status& s) { return s.ShareIsNeedReindex(share); });
 }
 
 bool StatusMgr::IsUpdated(const std::string& name) {
-    return Read([&](Status& s) { return s.IsUpdated(name); });
+    return Read(name, [&](Status& s) { return s.IsUpdated(name); });
 }
 
 bool StatusMgr::SetUpdated(const std::string& name) {
-    return Write([&](Status& s) { return s.SetUpdated(name); });
+    return detail::NulFree(name) && Write([&](Status& s) { return s.SetUpdated(name); });
 }
 
 bool StatusMgr::ShareSetNoSpace(const std::string& share, bool noSpace) {
-    return Write([&](Status& s) { return s.ShareSetNoSpace(share, noSpace); });
+    return detail::NulFree(share) && Write([&](Status& s) { return s.ShareSetNoSpace(share, noSpace); });
 }
 
 bool StatusMgr::ShareSetNeedReindex(const std::string& share, bool needReindex) {
-    return Write([&](Status& s) { return s.ShareSetNeedReindex(share, needReindex); });
+    return detail::NulFree(share) && Write([&](Status& s) { return s.ShareSetNeedReindex(share, needReindex); });
 }
 
 bool StatusMgr::Pause(const int& hours) {
@@ -90,7 +92,8 @@ bool StatusMgr::Resume() {
 }
 
 bool StatusMgr::ShareRevive(const std::string& share) {
-    return Write([&](Status& s) { return s.ShareSetNoSpace(share, false); }, "revive_share_worker", ShareData(share));
+    return detail::NulFree(share) &&
+           Write([&](Status& s) { return s.ShareSetNoSpace(share, false); }, "revive_share_worker", ShareData(share));
 }
 
 }  // namespace FILEINDEX

@@ -14,6 +14,7 @@
 #include "fileindex/status_mgr.h"
 #include "fileindex/utils.h"
 #include "log.h"
+#include "path_rules.h"
 #include "qira/qira_share.h"
 #include "queue_file.h"
 
@@ -33,6 +34,17 @@ bool StillLinked(int fd) {
     return fstat(fd, &st) == 0 && st.st_nlink > 0;
 }
 
+// A short write (disk full) is cut off again while the lock is held, so the next record does
+// not join a partial line.
+void WriteWholeLineOrNothing(int fd, const std::string& line) {
+    struct stat before;
+    const bool sized = fstat(fd, &before) == 0;
+    const ssize_t wrote = write(fd, line.data(), line.size());
+    if (wrote == static_cast<ssize_t>(line.size())) return;
+    FILEIDX_DEBUG_LOG("write fail, (%ld, %ld)", static_cast<long>(wrote), static_cast<long>(line.size()));
+    if (sized && wrote > 0) ftruncate(fd, before.st_size);
+}
+
 AppendResult AppendLine(const std::string& queuePath, const std::string& line) {
     int attempt = 0;
     int reopened = 0;
@@ -45,10 +57,7 @@ AppendResult AppendLine(const std::string& queuePath, const std::string& line) {
                 close(fd);
                 continue;
             }
-            const ssize_t wrote = write(fd, line.data(), line.size());
-            if (wrote != static_cast<ssize_t>(line.size())) {
-                FILEIDX_DEBUG_LOG("write fail, (%ld, %ld)", static_cast<long>(wrote), static_cast<long>(line.size()));
-            }
+            WriteWholeLineOrNothing(fd, line);
             flock(fd, LOCK_UN);
             close(fd);
             return AppendResult::Written;
@@ -76,6 +85,7 @@ bool MarkShareForReindex(const std::string& shareName) {
 }  // namespace
 
 bool AddCustomEvent(const int& event, const std::string& path, const Json::Value& data) {
+    if (!detail::NulFree(path)) return false;
     std::vector<char> shareName(QIRA_SHARE_NAME_LEN, '\0');
     std::vector<char> inside(QIRA_SHARE_PATH_LEN, '\0');
     if (QIRAShareNamePathGet(path.c_str(), shareName.data(), static_cast<int>(shareName.size()), inside.data(),

@@ -31,9 +31,11 @@ int ConnectToDaemon() {
     if (fd < 0) return -1;
     address.sun_family = AF_UNIX;
     std::memcpy(address.sun_path, path.c_str(), path.size() + 1);
+    // Set before connecting: Linux bounds a unix stream connect by the send time-out, so a daemon
+    // that listens but never accepts cannot hold the caller (and its lock) forever.
     const timeval timeout{1, 0};
-    if (connect(fd, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0 ||
-        setsockopt(fd, SOL_SOCKET, SO_SNDTIMEO, &timeout, sizeof timeout) != 0) {
+    if (setsockopt(fd, SOL_SOCKET, SO_SNDTIMEO, &timeout, sizeof timeout) != 0 ||
+        connect(fd, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
         close(fd);
         return -1;
     }

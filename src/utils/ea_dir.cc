@@ -1,15 +1,20 @@
 #include "ea_dir.h"
 
+#include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstring>
 
 namespace QIRA {
 namespace FILEINDEX {
 namespace detail {
 namespace {
+
+// Deeper levels of a planted tree are left in place rather than holding a descriptor each.
+constexpr int kMaxRemoveDepth = 64;
 
 std::string Parent(const std::string& path) {
     const size_t slash = path.rfind('/');
@@ -34,12 +39,46 @@ int OpenParentNoFollow(const std::string& path) {
     return fd;
 }
 
+void RemoveEntries(int dirFd, int depth);
+
+// Removes `name` inside `dirFd` and, when it is a directory, what lies below it. A link is
+// removed itself, never followed.
+void RemoveTreeAt(int dirFd, const char* name, int depth) {
+    if (unlinkat(dirFd, name, 0) == 0 || errno != EISDIR) return;
+    if (depth < kMaxRemoveDepth) {
+        const int fd = openat(dirFd, name, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC);
+        if (fd >= 0) RemoveEntries(fd, depth + 1);
+    }
+    unlinkat(dirFd, name, AT_REMOVEDIR);
+}
+
+// Takes ownership of `fd`.
+void RemoveEntries(int fd, int depth) {
+    DIR* dir = fdopendir(fd);
+    if (dir == nullptr) {
+        close(fd);
+        return;
+    }
+    while (const dirent* entry = readdir(dir)) {
+        if (std::strcmp(entry->d_name, ".") == 0 || std::strcmp(entry->d_name, "..") == 0) continue;
+        RemoveTreeAt(dirfd(dir), entry->d_name, depth);
+    }
+    closedir(dir);
+}
+
 }  // namespace
+
+void RemoveInEaDir(const std::string& path) {
+    const int dir = OpenParentNoFollow(path);
+    if (dir < 0) return;
+    RemoveTreeAt(dir, Leaf(path).c_str(), 0);
+    close(dir);
+}
 
 int OpenNoFollow(const std::string& path, int flags, mode_t mode) {
     const int dir = OpenParentNoFollow(path);
     if (dir < 0) return -1;
-    const int fd = openat(dir, Leaf(path).c_str(), flags | O_NOFOLLOW | O_CLOEXEC, mode);
+    const int fd = openat(dir, Leaf(path).c_str(), flags | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC, mode);
     const int saved = errno;
     close(dir);
     if (fd < 0) {

@@ -6,6 +6,7 @@
 
 #include "fileindex/utils.h"
 #include "log.h"
+#include "path_rules.h"
 #include "qira/qira_fs.h"
 #include "qira/qira_quota.h"
 #include "qira/qira_share.h"
@@ -69,6 +70,7 @@ bool IsSystemPreservedFileName(const std::string& name) {
 }
 
 bool IsSkipIndex(const std::string& fullPath) {
+    if (!detail::NulFree(fullPath)) return true;
     const int type = QIRAGetFSType(fullPath.c_str(), 0);
     const size_t slash = fullPath.rfind('/');
     if (slash == std::string::npos) return true;
@@ -88,6 +90,7 @@ bool CanShareBeIndexed(_tag_QIRASHARE* share) {
 }
 
 bool CanPathBeIndexed(const std::string& path) {
+    if (!detail::NulFree(path)) return false;
     std::string fullPath;
     if (!GetFullPath(fullPath, path)) {
         FILEIDX_LOG("GetFullPath failed, path=%s", path.c_str());
@@ -98,6 +101,7 @@ bool CanPathBeIndexed(const std::string& path) {
 }
 
 bool CanFullPathBeIndexed(const std::string& fullPath) {
+    if (!detail::NulFree(fullPath)) return false;
     if (InRecycleBin(fullPath) || InSnapshot(fullPath)) return false;
     const int type = QIRAGetFSType(fullPath.c_str(), 0);
     if (type == -1 || IsUnindexableFsType(type)) return false;
@@ -126,6 +130,7 @@ bool CanFullPathBeIndexed(const std::string& fullPath) {
 }
 
 bool IsShareSpaceEnough(const std::string& shareName) {
+    if (!detail::NulFree(shareName)) return false;
     QIRASHARE* raw = nullptr;
     if (QIRAShareGet(shareName.c_str(), &raw) < 0) {
         FILEIDX_LOG("QIRAShareGet failed, share=%s", shareName.c_str());

@@ -10,10 +10,12 @@
 
 #include <json/reader.h>
 
+#include "ea_dir.h"
 #include "fileindex/fileidx.h"
 #include "fileindex/json.h"
 #include "fileindex/utils.h"
 #include "log.h"
+#include "path_rules.h"
 
 namespace QIRA {
 namespace FILEINDEX {
@@ -62,7 +64,7 @@ bool ParseRecord(Json::CharReader& reader, const char* begin, const char* end, Q
 
 bool ScanQueue(const std::string& queueFile, const std::function<void(const QueueRecord&)>& onRecord,
                const std::function<void(const std::string&)>& onMalformed) {
-    const int fd = open(queueFile.c_str(), O_RDONLY | O_NOFOLLOW | O_CLOEXEC);
+    const int fd = OpenNoFollow(queueFile, O_RDONLY);
     if (fd < 0) return false;
     FILE* file = fdopen(fd, "r");
     if (file == nullptr) {
@@ -102,6 +104,7 @@ bool IsReindexQueued(const std::string& path, const std::string& queueFile) {
 }
 
 bool ShareQueuePath(const std::string& share, std::string& queuePath) {
+    if (!NulFree(share)) return false;
     char buffer[4096] = {0};
     if (FILEIDXQueuePathGet(share.c_str(), buffer, sizeof buffer) < 0) {
         FILEIDX_LOG("FILEIDXQueuePathGet failed, share=%s", share.c_str());

@@ -18,7 +18,8 @@ constexpr unsigned kEventRename = 256;
 
 // Calls onRecord for every well-formed line (a JSON object with an "event" convertible to an
 // unsigned integer and a string "path") and onMalformed for every other line. False, with
-// errno set, when the file cannot be opened; a symbolic link is not followed.
+// errno set, when the file cannot be opened as a regular file (links are not followed, a FIFO
+// is refused without blocking).
 bool ScanQueue(const std::string& queueFile, const std::function<void(const QueueRecord&)>& onRecord,
                const std::function<void(const std::string&)>& onMalformed);
 

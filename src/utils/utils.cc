@@ -7,6 +7,7 @@
 
 #include "fileindex/error.h"
 #include "log.h"
+#include "path_rules.h"
 #include "qira/qira_share.h"
 
 namespace QIRA {
@@ -19,17 +20,11 @@ bool GetShareNameByPath(std::string& shareName, const std::string& path) {
     return true;
 }
 
-bool GetFullPath(std::string& fullPath, const std::string& path) {
-    std::string shareName;
-    if (!GetShareNameByPath(shareName, path)) {
-        FILEIDX_LOG("GetShareNameByPath failed, path=%s", path.c_str());
-        return false;
-    }
+namespace detail {
+
+bool ShareFullPath(const std::string& shareName, const std::string& path, std::string& fullPath) {
     QIRASHARE* share = nullptr;
-    if (QIRAShareGet(shareName.c_str(), &share) < 0) {
-        ErrorHandler::SetError(FILEINDEX_ERR_PATH);
-        return false;
-    }
+    if (QIRAShareGet(shareName.c_str(), &share) < 0) return false;
     const std::string sharePath = share->szPath;
     QIRAShareFree(share);
     const size_t lastSlash = sharePath.rfind('/');
@@ -37,7 +32,24 @@ bool GetFullPath(std::string& fullPath, const std::string& path) {
     return true;
 }
 
+}  // namespace detail
+
+bool GetFullPath(std::string& fullPath, const std::string& path) {
+    if (!detail::NulFree(path)) return false;
+    std::string shareName;
+    if (!GetShareNameByPath(shareName, path)) {
+        FILEIDX_LOG("GetShareNameByPath failed, path=%s", path.c_str());
+        return false;
+    }
+    if (!detail::ShareFullPath(shareName, path, fullPath)) {
+        ErrorHandler::SetError(FILEINDEX_ERR_PATH);
+        return false;
+    }
+    return true;
+}
+
 bool GetShareNamePathByFullPath(std::string& shareName, std::string& sharePath, const std::string& fullPath) {
+    if (!detail::NulFree(fullPath)) return false;
     std::vector<char> name(QIRA_SHARE_NAME_LEN, '\0');
     std::vector<char> inside(QIRA_SHARE_PATH_LEN, '\0');
     if (QIRAShareNamePathGet(fullPath.c_str(), name.data(), static_cast<int>(name.size()), inside.data(),

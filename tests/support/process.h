@@ -22,13 +22,31 @@ pid_t Start(const std::vector<std::string>& argv, const std::string& logFile);
 // SIGTERM and wait; returns the exit status (-1 when it did not exit normally).
 int Stop(pid_t pid);
 
+// Runs `call` in a forked child that SIGALRM ends after `seconds`: 1 when it returned true,
+// 0 when false, -1 when it did not return in time.
+template <typename F>
+int RunBounded(unsigned seconds, F call);
+
 // Polls `done` every 2 ms, at most `attempts` times.
 template <typename F>
 bool WaitFor(F done, int attempts = 2500);
 
 }  // namespace testkit
 
+#include <sys/wait.h>
 #include <unistd.h>
+
+template <typename F>
+int testkit::RunBounded(unsigned seconds, F call) {
+    const pid_t pid = fork();
+    if (pid == 0) {
+        alarm(seconds);
+        _exit(call() ? 1 : 0);
+    }
+    int status = 0;
+    if (pid < 0 || waitpid(pid, &status, 0) != pid || !WIFEXITED(status)) return -1;
+    return WEXITSTATUS(status);
+}
 
 template <typename F>
 bool testkit::WaitFor(F done, int attempts) {

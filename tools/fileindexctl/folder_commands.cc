@@ -102,7 +102,7 @@ void AddUpsertCommand(CLI::App& folder, Context& ctx, const char* verb, const ch
         } else {
             request = BuildRequest(*settings, *cmd);
         }
-        if (!IndexMgr::Upsert(request)) {
+        if (!ctx.Attempt([&] { return IndexMgr::Upsert(request); })) {
             ctx.status = Fail(std::string("folder ") + verb);
             return;
         }
@@ -117,7 +117,7 @@ void AddPathsCommand(CLI::App& parent, Context& ctx, const char* verb, const cha
     auto* cmd = parent.add_subcommand(verb, help);
     cmd->add_option("paths", *paths, "Share paths")->required();
     cmd->callback([&ctx, paths, operation, action] {
-        if (!action(StringArray(*paths))) {
+        if (!ctx.Attempt([&] { return action(StringArray(*paths)); })) {
             ctx.status = Fail(operation);
             return;
         }
@@ -151,7 +151,7 @@ void AddFolderCommands(CLI::App& app, Context& ctx) {
     get->add_option("path", *path, "Share path")->required();
     get->callback([&ctx, path] {
         Json::Value out;
-        if (!IndexMgr::Get(out, *path)) {
+        if (!ctx.Attempt([&] { return IndexMgr::Get(out, *path); })) {
             ctx.status = Fail("folder get");
             return;
         }

@@ -12,6 +12,8 @@ int main(int argc, char** argv) {
     std::string root;
     app.add_option("--root", root, "Root prefix of the appliance (instead of QIRA_ROOT)");
     app.add_flag("--json", ctx.out.json, "Machine-readable output");
+    app.add_option("--lock-wait", ctx.lockWait, "Seconds to retry a held configuration lock (0 = fail at once)")
+        ->check(CLI::NonNegativeNumber);
     app.parse_complete_callback([&root] {
         if (!root.empty()) setenv("QIRA_ROOT", root.c_str(), 1);
     });

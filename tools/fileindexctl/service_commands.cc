@@ -67,9 +67,9 @@ void AddServiceCommands(CLI::App& app, Context& ctx) {
 
     auto hours = std::make_shared<int>(0);
     auto* pause = service->add_subcommand("pause", "Pause indexing");
-    pause->add_option("--hours", *hours, "Hours to pause (0 = until resumed)");
+    pause->add_option("--hours", *hours, "Hours to pause (0 = until resumed)")->check(PauseHours);
     pause->callback([&ctx, hours] {
-        if (!StatusMgr::Pause(*hours)) {
+        if (!ctx.Attempt([&] { return StatusMgr::Pause(*hours); })) {
             ctx.status = Fail("service pause");
             return;
         }
@@ -80,7 +80,7 @@ void AddServiceCommands(CLI::App& app, Context& ctx) {
         ctx.out.Emit(out, PauseText(resumeTime));
     });
     service->add_subcommand("resume", "Resume indexing")->callback([&ctx] {
-        if (!StatusMgr::Resume()) {
+        if (!ctx.Attempt([] { return StatusMgr::Resume(); })) {
             ctx.status = Fail("service resume");
             return;
         }
@@ -89,7 +89,7 @@ void AddServiceCommands(CLI::App& app, Context& ctx) {
 
     app.add_subcommand("migrate", "Bring a system upgraded from the older release into the running state")
         ->callback([&ctx] {
-            if (!QIRA::FILEINDEX::Updater_lum60_beta2()) {
+            if (!ctx.Attempt([] { return QIRA::FILEINDEX::Updater_lum60_beta2(); })) {
                 ctx.status = Fail("migrate");
                 return;
             }

@@ -11,9 +11,9 @@ using QIRA::FILEINDEX::StatusMgr;
 void AddShareAction(CLI::App& share, Context& ctx, const char* verb, const char* help, bool (*action)(const std::string&)) {
     auto name = std::make_shared<std::string>();
     auto* cmd = share.add_subcommand(verb, help);
-    cmd->add_option("share", *name, "Share name")->required();
+    cmd->add_option("share", *name, "Share name")->required()->check(ShareName);
     cmd->callback([&ctx, name, verb, action] {
-        if (!action(*name)) {
+        if (!ctx.Attempt([&] { return action(*name); })) {
             ctx.status = Fail(std::string("share ") + verb);
             return;
         }
@@ -26,10 +26,10 @@ void AddFlagCommand(CLI::App& share, Context& ctx, const char* verb, const char*
     auto name = std::make_shared<std::string>();
     auto state = std::make_shared<std::string>();
     auto* cmd = share.add_subcommand(verb, help);
-    cmd->add_option("share", *name, "Share name")->required();
+    cmd->add_option("share", *name, "Share name")->required()->check(ShareName);
     cmd->add_option("state", *state, "on or off")->required()->check(CLI::IsMember({"on", "off"}));
     cmd->callback([&ctx, name, state, verb, set] {
-        if (!set(*name, *state == "on")) {
+        if (!ctx.Attempt([&] { return set(*name, *state == "on"); })) {
             ctx.status = Fail(std::string("share ") + verb);
             return;
         }
@@ -67,10 +67,10 @@ void AddShareCommands(CLI::App& app, Context& ctx) {
     auto oldName = std::make_shared<std::string>();
     auto newName = std::make_shared<std::string>();
     auto* rename = share->add_subcommand("rename", "The share was renamed: move its folders");
-    rename->add_option("old", *oldName, "Old share name")->required();
-    rename->add_option("new", *newName, "New share name")->required();
+    rename->add_option("old", *oldName, "Old share name")->required()->check(ShareName);
+    rename->add_option("new", *newName, "New share name")->required()->check(ShareName);
     rename->callback([&ctx, oldName, newName] {
-        if (!IndexMgr::ShareRename(*oldName, *newName)) {
+        if (!ctx.Attempt([&] { return IndexMgr::ShareRename(*oldName, *newName); })) {
             ctx.status = Fail("share rename");
             return;
         }
@@ -79,7 +79,7 @@ void AddShareCommands(CLI::App& app, Context& ctx) {
 
     auto name = std::make_shared<std::string>();
     auto* paths = share->add_subcommand("paths", "The share's index database and event queue paths");
-    paths->add_option("share", *name, "Share name")->required();
+    paths->add_option("share", *name, "Share name")->required()->check(ShareName);
     paths->callback([&ctx, name] { ctx.status = Paths(ctx, *name); });
 }
 

@@ -1,0 +1,205 @@
+// What a share's user can plant in the share or put in a request never makes the library hang,
+// leak descriptors, or act outside the share.
+#include <dirent.h>
+#include <fcntl.h>
+#include <signal.h>
+#include <stdio.h>
+#include <sys/resource.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/un.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <climits>
+#include <cstring>
+#include <functional>
+
+#include "canary.h"
+#include "child_holding.h"
+#include "fileindex/fileindex.h"
+#include "index_fixture.h"
+#include "process.h"
+#include "queue_file.h"
+
+using namespace QIRA::FILEINDEX;
+using testkit::J;
+
+namespace {
+
+class ShareUserTest : public testkit::IndexFixture {
+protected:
+    void SetUp() override {
+        IndexFixture::SetUp();
+        ASSERT_TRUE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}, {"path": "/music/b"}])")));
+        MakeDir(music_ + "/@eaDir/QIRA@.fileindexdb");
+        Settle();
+        conf_ = testkit::ReadFile(FolderConf());
+        registrations_ = qira_sim::Registrations();
+    }
+    // folder.conf, the monitor registrations, the share's index data and the daemon unchanged.
+    void ExpectNothingChanged() {
+        EXPECT_EQ(testkit::ReadFile(FolderConf()), conf_);
+        EXPECT_EQ(qira_sim::Registrations(), registrations_);
+        EXPECT_TRUE(testkit::Exists(QueueOf("music")));
+        EXPECT_TRUE(testkit::Exists(music_ + "/@eaDir/QIRA@.fileindexdb"));
+        EXPECT_TRUE(Messages().empty());
+    }
+    static int OpenDescriptors() {
+        int count = 0;
+        DIR* dir = opendir("/proc/self/fd");
+        while (readdir(dir) != nullptr) ++count;
+        closedir(dir);
+        return count;
+    }
+
+    std::string conf_;
+    Json::Value registrations_;
+};
+
+TEST_F(ShareUserTest, NulBytesAreRefusedBeforeAnythingReachesThePlatform) {
+    const std::string share("music\0x", 7);
+    const std::string path = "/" + share + "/y";
+    const std::string fullPath = music_ + std::string("\0x", 2);
+    Json::Value out;
+    std::string text;
+    const std::vector<std::pair<const char*, std::function<bool()>>> calls = {
+        {"Upsert", [&] { return IndexMgr::Upsert(J(R"([{"path": "/music\u0000x/y"}])")); }},
+        {"Delete", [&] { return IndexMgr::Delete(J(R"(["/music\u0000x/y"])")); }},
+        {"Reindex", [&] { return IndexMgr::Reindex(J(R"(["/music\u0000x/y"])")); }},
+        {"Get", [&] { return IndexMgr::Get(out, path); }},
+        {"Update", [&] { return IndexMgr::Update(path, J("{}")); }},
+        {"IsShareIndexed", [&] { return IndexMgr::IsShareIndexed(share); }},
+        {"IsPathIndexed", [&] { return IndexMgr::IsPathIndexed(path); }},
+        {"IsPathContainIndexed", [&] { return IndexMgr::IsPathContainIndexed(path); }},
+        {"IsFullPathIndexed", [&] { return IndexMgr::IsFullPathIndexed(fullPath); }},
+        {"ShareRemove", [&] { return IndexMgr::ShareRemove(share); }},
+        {"ShareRename", [&] { return IndexMgr::ShareRename("music", share); }},
+        {"SharePause", [&] { return IndexMgr::SharePause(share); }},
+        {"ShareResume", [&] { return IndexMgr::ShareResume(share); }},
+        {"CleanShareIndexData", [&] { return IndexMgr::CleanShareIndexData(share); }},
+        {"UpsertQIRANotifydCfg", [&] { return IndexMgr::UpsertQIRANotifydCfg(share); }},
+        {"DeleteQIRANotifydCfg", [&] { return IndexMgr::DeleteQIRANotifydCfg(share); }},
+        {"ShareRevive", [&] { return StatusMgr::ShareRevive(share); }},
+        {"ShareSetNoSpace", [&] { return StatusMgr::ShareSetNoSpace(share, true); }},
+        {"ShareSetNeedReindex", [&] { return StatusMgr::ShareSetNeedReindex(share, true); }},
+        {"ShareIsNoSpace", [&] { return StatusMgr::ShareIsNoSpace(share); }},
+        {"CanPathBeIndexed", [&] { return CanPathBeIndexed(path); }},
+        {"CanFullPathBeIndexed", [&] { return CanFullPathBeIndexed(fullPath); }},
+        {"IsShareSpaceEnough", [&] { return IsShareSpaceEnough(share); }},
+        {"AddCustomEvent", [&] { return AddCustomEvent(kEventReindex, fullPath, Json::Value()); }},
+        {"GetFullPath", [&] { return GetFullPath(text, path); }},
+    };
+    for (const auto& [name, call] : calls) {
+        SCOPED_TRACE(name);
+        Settle();
+        EXPECT_FALSE(call());
+        EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
+        ASSERT_FALSE(testkit::LogMessages().empty());
+        EXPECT_NE(testkit::LogMessages()[0].find("\\u0000"), std::string::npos) << testkit::LogMessages()[0];
+        EXPECT_TRUE(qira_sim::Journal().empty());
+    }
+    EXPECT_FALSE(StatusMgr::ShareIsNeedReindex("music"));
+    ExpectNothingChanged();
+}
+
+TEST_F(ShareUserTest, UpsertPathsMustBeCanonicalSharePaths) {
+    std::string tooLong = "/music";  // fits as a share path, not once the volume is put in front
+    while (tooLong.size() + 201 < PATH_MAX) tooLong += "/" + std::string(200, 'x');
+    tooLong += "/" + std::string(PATH_MAX - 2 - tooLong.size(), 'x');
+    for (const std::string& path : {std::string("/music/../../etc"), std::string("/music/a/"), std::string("/music//a"),
+                                    std::string("/music/./a"), std::string("/"), std::string(""), std::string("music/a"),
+                                    "/music/" + std::string(NAME_MAX + 1, 'x'), tooLong, std::string(5000, '/')}) {
+        SCOPED_TRACE(path.substr(0, 40));
+        Settle();
+        Json::Value element(Json::objectValue);
+        element["path"] = path;
+        Json::Value request(Json::arrayValue);
+        request.append(element);
+        EXPECT_FALSE(IndexMgr::Upsert(request));
+        EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
+        EXPECT_EQ(testkit::LogMessages(),
+                  (std::vector<std::string>{"Bad param: " + toString(element), "Upsert failed, folder=" + toString(element)}));
+    }
+    ExpectNothingChanged();
+}
+
+TEST_F(ShareUserTest, FifoQueueBlocksNeitherWritersNorReaders) {
+    ASSERT_EQ(unlink(QueueOf("music").c_str()), 0);
+    ASSERT_EQ(mkfifo(QueueOf("music").c_str(), 0644), 0);
+    EXPECT_EQ(testkit::RunBounded(5, [] { return IndexMgr::Upsert(J(R"([{"path": "/music/c"}])")); }), 0);
+    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));  // the event could not be queued
+    EXPECT_EQ(testkit::RunBounded(5, [] { return IndexMgr::Reindex(J(R"(["/music/a"])")); }), 0);
+    const auto scan = [this] {
+        return detail::ScanQueue(QueueOf("music"), [](const detail::QueueRecord&) {}, [](const std::string&) {});
+    };
+    EXPECT_EQ(testkit::RunBounded(5, scan), 0);
+}
+
+TEST_F(ShareUserTest, EaDirSwappedForALinkDuringCleanUpNeverReachesAnotherDirectory) {
+    const std::string other = Path("/other");
+    MakeDir(other + "/QIRA@.fileindexdb/sub");
+    testkit::Canary queue(other + "/QIRA@file_index_queue");
+    testkit::Canary index(other + "/QIRA@.fileindexdb/sub/index");
+    const std::string eaDir = music_ + "/@eaDir";
+    const std::string swap = music_ + "/swap";
+    ASSERT_EQ(symlink(other.c_str(), swap.c_str()), 0);
+    const pid_t swapper = fork();
+    if (swapper == 0) {
+        alarm(30);
+        while (true) renameat2(AT_FDCWD, eaDir.c_str(), AT_FDCWD, swap.c_str(), RENAME_EXCHANGE);
+    }
+    for (int i = 0; i < 300; ++i) IndexMgr::CleanShareIndexData("music");
+    kill(swapper, SIGKILL);
+    waitpid(swapper, nullptr, 0);
+    queue.ExpectUntouched();
+    index.ExpectUntouched();
+}
+
+TEST_F(ShareUserTest, ContendedLocksLeakNoDescriptor) {
+    testkit::ChildHolding folders([] { return Folders().Lock(true); });
+    testkit::ChildHolding status([] { return Status().Lock(true); });
+    ASSERT_TRUE(folders.Took() && status.Took());
+    const int before = OpenDescriptors();
+    for (int i = 0; i < 100; ++i) {
+        EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/c"}])")));
+        EXPECT_FALSE(StatusMgr::Resume());
+    }
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
+    EXPECT_EQ(OpenDescriptors(), before);
+}
+
+TEST_F(ShareUserTest, DaemonThatListensButNeverAcceptsFailsTheCallWithinTwoSeconds) {
+    daemon_.reset();
+    const int listener = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    std::strncpy(address.sun_path, detail::DaemonSocketPath().c_str(), sizeof address.sun_path - 1);
+    ASSERT_EQ(bind(listener, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
+    ASSERT_EQ(listen(listener, 0), 0);
+    const int pending = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);  // fills the backlog
+    ASSERT_EQ(connect(pending, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
+    EXPECT_EQ(testkit::RunBounded(2, [] { return SendCammandToDaemon("resume", J("{}")); }), 0);
+    EXPECT_EQ(testkit::RunBounded(2, [] { return StatusMgr::Pause(0); }), 0);
+    close(pending);
+    close(listener);
+}
+
+TEST_F(ShareUserTest, ShortWriteIsCutBackSoTheNextRecordStaysWhole) {
+    // A long record first, so that the size limit below stays above every other file written.
+    ASSERT_TRUE(AddCustomEvent(kEventFolderSettingChanged, music_ + "/a", Json::Value(std::string(1 << 20, 'x'))));
+    const std::string before = testkit::ReadFile(QueueOf("music"));
+    const int wrote = testkit::RunBounded(5, [&] {
+        signal(SIGXFSZ, SIG_IGN);
+        const rlimit limit{before.size() + 10, RLIM_INFINITY};
+        return setrlimit(RLIMIT_FSIZE, &limit) == 0 && AddCustomEvent(kEventReindex, music_ + "/c", Json::Value());
+    });
+    EXPECT_EQ(wrote, 1);  // a short write is not reported as a failure
+    EXPECT_EQ(testkit::ReadFile(QueueOf("music")), before);
+    ASSERT_TRUE(AddCustomEvent(kEventReindex, music_ + "/c", Json::Value()));
+    const auto records = Queue("music");
+    ASSERT_FALSE(records.empty());
+    EXPECT_EQ(records.back(), J("{\"event\": 65536, \"path\": \"" + music_ + "/c\", \"data\": null}"));
+}
+
+}  // namespace
