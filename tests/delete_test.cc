@@ -138,8 +138,9 @@ TEST_F(DeleteTest, FailuresAfterTheSaveAreReportedWithTheirMessages) {
 
 TEST_F(DeleteTest, CleanupFailureKeepsTheMonitorQueue) {
     Seed(R"({"/music/a": {}, "/photo/a": {}})");
-    // Lookups of "music" pass for load, delete (twice) and IsShareIndexed's load, then fail.
-    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", 4);
+    // Look-ups of "music" pass for the load, the delete, the event (its path, its full path and
+    // its queue), then fail: every step before the clean-up needs the same share, so it is counted.
+    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", 5);
     EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a"])")));
     EXPECT_TRUE(testkit::Logged("CleanShareIndexData failed, share=music"));
     EXPECT_EQ(qira_sim::Registrations().size(), 1u);

@@ -131,7 +131,7 @@ TEST_F(ShareUserTest, FifoQueueBlocksNeitherWritersNorReaders) {
     EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));  // the event could not be queued
     EXPECT_EQ(testkit::RunBounded(5, [] { return IndexMgr::Reindex(J(R"(["/music/a"])")); }), 0);
     const auto scan = [this] {
-        return detail::ScanQueue(QueueOf("music"), [](const detail::QueueRecord&) {}, [](const std::string&) {});
+        return detail::ScanQueue(QueueOf("music"), [](const detail::QueueRecord&) {}, [](const std::string&, off_t) {});
     };
     EXPECT_EQ(testkit::RunBounded(5, scan), 0);
 }

@@ -107,7 +107,7 @@ TEST_F(StatusReportTest, MalformedLinesAreLoggedAndSkipped) {
     std::vector<std::string> expected;
     for (const auto& line : bad) expected.push_back("Malformed command: " + line);
     EXPECT_EQ(testkit::LogMessages(), expected);
-    EXPECT_EQ(testkit::LogLines()[0].source, "status_report.cc");
+    EXPECT_EQ(testkit::LogLines()[0].source, "queue_status.cc");
 }
 
 TEST_F(StatusReportTest, UnknownShareOrQueuePathFailsTheServiceWord) {

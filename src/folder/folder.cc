@@ -5,17 +5,32 @@
 #include "fileindex/json.h"
 #include "fileindex/status_mgr.h"
 #include "fileindex/utils.h"
+#include "folder_fields.h"
 #include "log.h"
 
 namespace QIRA {
 namespace FILEINDEX {
 
+namespace detail {
+
+void MergeFolderFields(Folder& folder, const Json::Value& obj) {
+    RetrieveStringFromJsonObj(folder.name, "name", obj);
+    RetrieveBoolFromJsonObj(folder.document, "document", obj);
+    RetrieveBoolFromJsonObj(folder.audio, "audio", obj);
+    RetrieveBoolFromJsonObj(folder.video, "video", obj);
+    RetrieveBoolFromJsonObj(folder.photo, "photo", obj);
+}
+
+bool Governs(const std::string& folderFullPath, const std::string& fullPath) {
+    const size_t length = folderFullPath.size();
+    return length != 0 && fullPath.size() >= length && fullPath.compare(0, length, folderFullPath) == 0 &&
+           (fullPath.size() == length || fullPath[length] == '/');
+}
+
+}  // namespace detail
+
 bool Folder::Load(const std::string& newPath, const Json::Value& obj) {
-    RetrieveStringFromJsonObj(name, "name", obj);
-    RetrieveBoolFromJsonObj(document, "document", obj);
-    RetrieveBoolFromJsonObj(audio, "audio", obj);
-    RetrieveBoolFromJsonObj(video, "video", obj);
-    RetrieveBoolFromJsonObj(photo, "photo", obj);
+    detail::MergeFolderFields(*this, obj);
     return SetPath(newPath);
 }
 

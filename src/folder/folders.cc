@@ -4,6 +4,8 @@
 #include "fileindex/error.h"
 #include "fileindex/json.h"
 #include "fileindex/utils.h"
+#include "folder_fields.h"
+#include "full_path_resolver.h"
 #include "log.h"
 #include "path_rules.h"
 #include "root.h"
@@ -23,6 +25,19 @@ Json::Value FlagDifference(const Json::Value& a, const Json::Value& b) {
     return diff;
 }
 
+// GetMostSuitableCfg over the map itself, with the same resolutions (and their log lines) of
+// folders whose full path is not known.
+Json::Value MostSuitableCfg(const std::map<std::string, Folder>& folders, const std::string& fullPath) {
+    const Folder* chosen = nullptr;
+    for (const auto& entry : folders) {
+        const Folder& folder = entry.second;
+        const bool governs = folder.full_path.empty() ? detail::Governs(folder.GetFullPath(), fullPath)
+                                                      : detail::Governs(folder.full_path, fullPath);
+        if (governs) chosen = &folder;
+    }
+    return chosen ? chosen->asJson() : Json::Value(Json::objectValue);
+}
+
 }  // namespace
 
 Folders::~Folders() { folders.clear(); }
@@ -38,12 +53,15 @@ bool Folders::Load() {
         ErrorHandler::SetError(FILEINDEX_ERR_MALFORMED_FOLDERS);
         return false;
     }
+    detail::FullPathResolver resolver;  // each share looked up once
     for (auto it = body.begin(); it != body.end(); ++it) {
         const std::string key = it.name();
         if (folders.count(key) != 0) continue;
         Folder folder;
-        folder.Load(key, *it);
-        folders.emplace(key, folder);
+        detail::MergeFolderFields(folder, *it);
+        folder.path = key;
+        resolver.Resolve(key, folder.full_path);
+        folders.emplace(key, std::move(folder));
     }
     return true;
 }
@@ -80,8 +98,6 @@ bool Folders::List(std::vector<Folder>& out, const std::string& share) {
 }
 
 bool Folders::Upsert(Json::Value& changed, const Json::Value& request) {
-    std::vector<Folder> before;
-    List(before);
     std::string path;
     std::string fullPath;
     if (!RetrieveStringFromJsonObj(path, "path", request) || !detail::IsCanonicalSharePath(path) ||
@@ -91,37 +107,36 @@ bool Folders::Upsert(Json::Value& changed, const Json::Value& request) {
         return false;
     }
     const auto existing = folders.find(path);
-    Json::Value newCfg;
+    Folder upserted;
     if (existing != folders.end()) {
-        Folder updated = existing->second;
-        updated.Load(path, request);
-        existing->second = updated;
-        newCfg = updated.asJson();
+        upserted = existing->second;
+        upserted.Load(path, request);
     } else {
-        Folder created;
-        created.Reload(path, request);
-        folders.emplace(path, created);
-        if (folders.size() > MAX_FOLDER_COUNT) {
+        upserted.Reload(path, request);
+        if (folders.size() >= MAX_FOLDER_COUNT) {
+            folders.emplace(path, upserted);  // kept in memory; the caller must not save
             FILEIDX_LOG("Exceed max folder size");
             ErrorHandler::SetError(FILEINDEX_ERR_EXCEED_MAX_FOLDER);
             return false;
         }
-        newCfg = created.asJson();
     }
-    changed = FlagDifference(GetMostSuitableCfg(before, fullPath), newCfg);
+    const Json::Value oldCfg = MostSuitableCfg(folders, fullPath);  // the list before the change
+    changed = FlagDifference(oldCfg, upserted.asJson());
+    folders[path] = std::move(upserted);
     return true;
 }
 
 bool Folders::Delete(Json::Value& changed, const std::string& path) {
-    std::vector<Folder> before;
-    if (!List(before)) return false;
-    folders.erase(path);
-    std::vector<Folder> after;
-    if (!List(after)) return false;
+    const auto found = folders.find(path);
     std::string fullPath;
-    if (!GetFullPath(fullPath, path)) return true;
+    if (!GetFullPath(fullPath, path)) {
+        if (found != folders.end()) folders.erase(found);
+        return true;
+    }
+    const Json::Value before = MostSuitableCfg(folders, fullPath);
+    if (found != folders.end()) folders.erase(found);
     changed = Json::Value(Json::objectValue);
-    changed[path] = FlagDifference(GetMostSuitableCfg(before, fullPath), GetMostSuitableCfg(after, fullPath));
+    changed[path] = FlagDifference(before, MostSuitableCfg(folders, fullPath));
     return true;
 }
 

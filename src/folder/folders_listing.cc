@@ -3,6 +3,7 @@
 #include <functional>
 
 #include "fileindex/folders.h"
+#include "queue_status.h"
 #include "qira/qlib_core.h"
 
 namespace QIRA {
@@ -44,13 +45,15 @@ bool Folders::List(Json::Value& out, unsigned long offset, unsigned long limit, 
     // The page never reaches past the end: an offset beyond the list gives an empty page.
     const unsigned long available = offset < all.size() ? all.size() - offset : 0;
     const unsigned long count = std::min(limit, available);
+    // DESC is deliberately the first `count` records reversed: the offset only shortens the page.
+    const bool descending = sort_direction == "DESC";
+    const auto first = all.begin() + static_cast<long>(descending || count == 0 ? 0 : offset);
+    std::vector<Folder> onPage(first, first + static_cast<long>(count));
+    if (descending) std::reverse(onPage.begin(), onPage.end());
+    // The statuses of the page come from one reading of each queue file.
+    const detail::FolderStatusBatch batch(onPage);
     Json::Value page(Json::arrayValue);
-    if (sort_direction == "DESC") {
-        // Deliberately the first `count` records reversed: the offset only shortens the page.
-        for (unsigned long i = count; i > 0; --i) page.append(all[i - 1].asJson(additional));
-    } else {
-        for (unsigned long i = offset; i < offset + count; ++i) page.append(all[i].asJson(additional));
-    }
+    for (const auto& folder : onPage) page.append(folder.asJson(additional));
     out["folder"] = page;
     return true;
 }

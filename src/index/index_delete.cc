@@ -50,8 +50,9 @@ bool NotifyDaemonOfDeletes(const Json::Value& paths, const Json::Value& deleted)
             return false;
         }
     }
+    detail::PendingReindex pending(detail::ResolvableFullPaths(deleted.getMemberNames()));
     for (auto it = deleted.begin(); it != deleted.end(); ++it) {
-        if (!IndexMgr::Update(it.name(), *it)) {
+        if (!detail::QueueSettingChange(it.name(), *it, pending)) {
             FILEIDX_LOG("Update failed");
             return false;
         }
@@ -61,10 +62,10 @@ bool NotifyDaemonOfDeletes(const Json::Value& paths, const Json::Value& deleted)
 
 // Rebuild the monitor queue of a share that keeps folders; otherwise wipe its index data and
 // then unregister it.
-bool ReconcileShares(const std::set<std::string>& shares) {
+bool ReconcileShares(Folders& saved, const std::set<std::string>& shares) {
     for (const auto& share : shares) {
-        if (IndexMgr::IsShareIndexed(share)) {
-            if (!IndexMgr::UpsertQIRANotifydCfg(share)) {
+        if (detail::HoldsShare(saved, share)) {
+            if (!detail::RegisterShareMonitor(saved, share)) {
                 FILEIDX_LOG("UpsertQIRANotifydCfg failed, share=%s", share.c_str());
                 return false;
             }
@@ -103,7 +104,7 @@ bool IndexMgr::Delete(const Json::Value& paths) {
     } else if (!NotifyDaemonOfDeletes(paths, deleted)) {
         return false;
     }
-    return ReconcileShares(shares);
+    return ReconcileShares(config, shares);
 }
 
 }  // namespace FILEINDEX

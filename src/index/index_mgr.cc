@@ -29,8 +29,13 @@ bool IndexMgr::Get(Json::Value& out, const std::string& path) {
 }
 
 bool IndexMgr::IsShareIndexed(const std::string& share) {
+    Folders folders;
+    return detail::NulFree(share) && folders.Load() && detail::HoldsShare(folders, share);
+}
+
+bool detail::HoldsShare(Folders& folders, const std::string& share) {
     std::vector<Folder> list;
-    if (!detail::NulFree(share) || !List(list)) return false;
+    folders.List(list);
     for (const auto& folder : list) {
         std::string name;
         if (!GetShareNameByPath(name, folder.path)) {

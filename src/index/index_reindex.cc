@@ -5,6 +5,7 @@
 #include "fileindex/json.h"
 #include "fileindex/status_mgr.h"
 #include "fileindex/utils.h"
+#include "custom_event.h"
 #include "index_support.h"
 #include "path_rules.h"
 
@@ -39,6 +40,9 @@ bool Validate(const Json::Value& paths, std::set<std::string>& noSpaceShares) {
 }
 
 bool QueueReindexEvents(const Json::Value& paths) {
+    std::vector<std::string> sharePaths;
+    for (const auto& element : paths) sharePaths.push_back(element.asString());
+    detail::PendingReindex pending(detail::ResolvableFullPaths(sharePaths));
     for (const auto& element : paths) {
         const std::string path = element.asString();
         std::string fullPath;
@@ -47,7 +51,7 @@ bool QueueReindexEvents(const Json::Value& paths) {
             ErrorHandler::SetError(FILEINDEX_ERR_PATH);
             return false;
         }
-        if (!AddCustomEvent(kEventReindex, fullPath, Json::Value())) {
+        if (!detail::AddCustomEvent(kEventReindex, fullPath, Json::Value(), pending)) {
             FILEIDX_LOG("AddCustomEvent failed, path=%s", path.c_str());
             return false;
         }

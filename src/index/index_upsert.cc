@@ -34,9 +34,9 @@ bool ApplyUpserts(Folders& folders, const Json::Value& request, Json::Value& ups
     return true;
 }
 
-bool RegisterShares(const std::set<std::string>& shares) {
+bool RegisterShares(Folders& saved, const std::set<std::string>& shares) {
     for (const auto& share : shares) {
-        if (!IndexMgr::UpsertQIRANotifydCfg(share)) {
+        if (!detail::RegisterShareMonitor(saved, share)) {
             FILEIDX_LOG("UpsertQIRANtifydCfg failed, share=%s", share.c_str());
             return false;
         }
@@ -68,8 +68,9 @@ bool SendUpsertCommands(const Json::Value& request) {
 
 // One event per distinct path, in ascending path order.
 bool QueueChangeEvents(const Json::Value& upserted) {
+    detail::PendingReindex pending(detail::ResolvableFullPaths(upserted.getMemberNames()));
     for (auto it = upserted.begin(); it != upserted.end(); ++it) {
-        if (!IndexMgr::Update(it.name(), *it)) return false;
+        if (!detail::QueueSettingChange(it.name(), *it, pending)) return false;
     }
     return true;
 }
@@ -89,7 +90,7 @@ bool IndexMgr::Upsert(const Json::Value& folders) {
     Json::Value upserted(Json::objectValue);
     std::set<std::string> shares;
     if (!ApplyUpserts(config, folders, upserted, shares) || !config.Save()) return false;
-    if (!RegisterShares(shares)) return false;
+    if (!RegisterShares(config, shares)) return false;
     if (QLIBServiceStart("fileindexd", 1) < 0) {
         FILEIDX_LOG_PLATFORM("QLIBServiceStart");
         return false;
@@ -104,17 +105,8 @@ bool IndexMgr::Add(const Json::Value& folders) { return Upsert(folders); }
 
 bool IndexMgr::Update(const std::string& path, const Json::Value& changes) {
     if (!detail::NulFree(path)) return false;
-    std::string fullPath;
-    if (!GetFullPath(fullPath, path)) {
-        FILEIDX_LOG("GetFullPath failed, path=%s", path.c_str());
-        ErrorHandler::SetError(FILEINDEX_ERR_PATH);
-        return false;
-    }
-    if (!AddCustomEvent(kEventFolderSettingChanged, fullPath, changes)) {
-        FILEIDX_LOG("AddCustomEvent failed");
-        return false;
-    }
-    return true;
+    detail::PendingReindex pending({});
+    return detail::QueueSettingChange(path, changes, pending);
 }
 
 }  // namespace FILEINDEX

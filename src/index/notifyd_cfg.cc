@@ -55,8 +55,14 @@ bool IndexMgr::UpsertQIRANotifydCfg(const std::string& share) {
     std::string queuePath;
     if (!detail::ShareQueuePath(share, queuePath)) return false;
     Folders folders;
+    return folders.Load() && detail::RegisterShareMonitor(folders, share, queuePath);
+}
+
+namespace detail {
+
+bool RegisterShareMonitor(Folders& folders, const std::string& share, const std::string& queuePath) {
     std::vector<Folder> list;
-    if (!folders.Load() || !folders.List(list, share)) return false;
+    if (!folders.List(list, share)) return false;
     Json::Value description(Json::objectValue);
     if (!BuildMonitorConfig(list, description["config"])) return false;
     description["queue"] = queuePath;
@@ -71,6 +77,8 @@ bool IndexMgr::UpsertQIRANotifydCfg(const std::string& share) {
     }
     return true;
 }
+
+}  // namespace detail
 
 bool IndexMgr::DeleteQIRANotifydCfg(const std::string& share) {
     std::string queuePath;

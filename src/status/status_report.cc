@@ -9,6 +9,7 @@
 #include "fileindex/utils.h"
 #include "log.h"
 #include "queue_file.h"
+#include "queue_status.h"
 
 namespace QIRA {
 namespace FILEINDEX {
@@ -20,10 +21,6 @@ const char kPaused[] = "paused";
 const char kNoSpace[] = "err_no_space";
 
 bool IsHeldBack(long long resumeTime) { return resumeTime == 0 || static_cast<long long>(time(nullptr)) < resumeTime; }
-
-bool IsUnder(const std::string& recordPath, const std::string& folderPrefix) {
-    return StringStartWith(recordPath + "/", folderPrefix);
-}
 
 // Shares of the folders that can be indexed, in ascending order; false when a name is unknown.
 bool IndexableShares(const std::vector<Folder>& folders, std::set<std::string>& shares) {
@@ -39,34 +36,6 @@ bool IndexableShares(const std::vector<Folder>& folders, std::set<std::string>& 
 }
 
 }  // namespace
-
-namespace detail {
-
-bool IsFolderInQueue(const std::string& folderPath, const std::string& queuePath) {
-    if (!IsFileExist(queuePath)) return false;
-    std::string fullPath;
-    if (!GetFullPath(fullPath, folderPath)) {
-        FILEIDX_LOG("Cannot get full path: %s", folderPath.c_str());
-        return false;
-    }
-    const std::string prefix = fullPath + "/";
-    bool found = false;
-    const bool opened = ScanQueue(
-        queuePath,
-        [&](const QueueRecord& record) {
-            if (IsUnder(record.path, prefix) || (record.event == kEventRename && IsUnder(record.path_old, prefix))) {
-                found = true;
-            }
-        },
-        [](const std::string& line) { FILEIDX_LOG("Malformed command: %s", line.c_str()); });
-    if (!opened) {
-        FILEIDX_LOG("Failed to open queue=%s, reason=%m", queuePath.c_str());
-        return false;
-    }
-    return found;
-}
-
-}  // namespace detail
 
 bool StatusMgr::GetStatus(std::string& status) {
     std::vector<Folder> folders;

@@ -8,6 +8,7 @@
 #include <cstdlib>
 #include <vector>
 
+#include "custom_event.h"
 #include "ea_dir.h"
 #include "fileindex/fileidx.h"
 #include "fileindex/json.h"
@@ -84,8 +85,10 @@ bool MarkShareForReindex(const std::string& shareName) {
 
 }  // namespace
 
-bool AddCustomEvent(const int& event, const std::string& path, const Json::Value& data) {
-    if (!detail::NulFree(path)) return false;
+namespace detail {
+
+bool AddCustomEvent(const int& event, const std::string& path, const Json::Value& data, PendingReindex& pending) {
+    if (!NulFree(path)) return false;
     std::vector<char> shareName(QIRA_SHARE_NAME_LEN, '\0');
     std::vector<char> inside(QIRA_SHARE_PATH_LEN, '\0');
     if (QIRAShareNamePathGet(path.c_str(), shareName.data(), static_cast<int>(shareName.size()), inside.data(),
@@ -101,7 +104,7 @@ bool AddCustomEvent(const int& event, const std::string& path, const Json::Value
         return MarkShareForReindex(share);
     }
     const std::string queuePath = queueBuffer;
-    if (detail::IsReindexQueued(path, queuePath) || detail::IsReindexQueued(path, queuePath + ".tmp")) return true;
+    if (pending.IsQueued(path, queuePath) || pending.IsQueued(path, queuePath + ".tmp")) return true;
 
     Json::Value record(Json::objectValue);
     record["event"] = static_cast<Json::UInt>(event);
@@ -115,6 +118,13 @@ bool AddCustomEvent(const int& event, const std::string& path, const Json::Value
             break;
     }
     return MarkShareForReindex(share);
+}
+
+}  // namespace detail
+
+bool AddCustomEvent(const int& event, const std::string& path, const Json::Value& data) {
+    detail::PendingReindex pending({path});
+    return detail::AddCustomEvent(event, path, data, pending);
 }
 
 }  // namespace FILEINDEX

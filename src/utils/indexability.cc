@@ -6,6 +6,7 @@
 
 #include "fileindex/utils.h"
 #include "log.h"
+#include "folder_fields.h"
 #include "path_rules.h"
 #include "qira/qira_fs.h"
 #include "qira/qira_quota.h"
@@ -144,10 +145,8 @@ bool IsShareSpaceEnough(const std::string& shareName) {
 
 Json::Value GetMostSuitableCfg(std::vector<Folder> folders, const std::string& fullPath) {
     const Folder* chosen = nullptr;
-    const std::string probe = fullPath + "/";
     for (const auto& folder : folders) {
-        const std::string folderPath = folder.GetFullPath();
-        if (!folderPath.empty() && StringStartWith(probe, folderPath + "/")) chosen = &folder;
+        if (detail::Governs(folder.GetFullPath(), fullPath)) chosen = &folder;
     }
     return chosen ? chosen->asJson() : Json::Value(Json::objectValue);
 }

@@ -4,47 +4,24 @@
 #include <functional>
 #include <string>
 
+#include "queue_record.h"
+
 namespace QIRA {
 namespace FILEINDEX {
 namespace detail {
 
-struct QueueRecord {
-    unsigned event = 0;
-    std::string path;
-    std::string path_old;  // only for event 256; empty otherwise
-};
-
-constexpr unsigned kEventRename = 256;
-
-// Calls onRecord for every well-formed line (a JSON object with an "event" convertible to an
-// unsigned integer and a string "path") and onMalformed for every other line. False, with
-// errno set, when the file cannot be opened as a regular file (links are not followed, a FIFO
-// is refused without blocking).
-bool ScanQueue(const std::string& queueFile, const std::function<void(const QueueRecord&)>& onRecord,
-               const std::function<void(const std::string&)>& onMalformed);
+// Calls onRecord for every record line and onMalformed (with the line and its offset in the
+// file) for every other line, streaming: memory is bounded by the longest line. False, with errno
+// set, when the file cannot be opened as a regular file (links are not followed, a FIFO is
+// refused without blocking).
+using RecordHandler = std::function<void(const QueueRecord&)>;
+using MalformedHandler = std::function<void(const std::string& line, off_t offset)>;
+bool ScanQueue(const std::string& queueFile, const RecordHandler& onRecord, const MalformedHandler& onMalformed);
+// The same over an open queue file, from its current offset; the descriptor stays the caller's.
+void ScanQueue(int fd, const RecordHandler& onRecord, const MalformedHandler& onMalformed);
 
 // True when `queueFile` holds a reindex record (65536) for exactly `path`.
 bool IsReindexQueued(const std::string& path, const std::string& queueFile);
-
-}  // namespace detail
-}  // namespace FILEINDEX
-}  // namespace QIRA
-
-namespace QIRA {
-namespace FILEINDEX {
-namespace detail {
-
-// True when `queuePath` holds a well-formed record whose path (or, for event 256, old path) is
-// the folder or lies beneath it. Malformed lines are logged and skipped.
-bool IsFolderInQueue(const std::string& folderPath, const std::string& queuePath);
-
-}  // namespace detail
-}  // namespace FILEINDEX
-}  // namespace QIRA
-
-namespace QIRA {
-namespace FILEINDEX {
-namespace detail {
 
 // The share's queue path from FILEIDXQueuePathGet (4096-byte buffer); logs and returns false
 // when it cannot be formed.

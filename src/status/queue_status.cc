@@ -1,0 +1,132 @@
+#include "queue_status.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+
+#include "ea_dir.h"
+#include "fileindex/utils.h"
+#include "log.h"
+#include "path_rules.h"
+#include "queue_file.h"
+
+namespace QIRA {
+namespace FILEINDEX {
+namespace detail {
+namespace {
+
+thread_local FolderStatusBatch* currentBatch = nullptr;
+
+bool IsUnder(const std::string& recordPath, const std::string& folderPrefix) {
+    return StringStartWith(recordPath + "/", folderPrefix);
+}
+
+bool ScanForFolder(const std::string& prefix, const std::string& queuePath) {
+    bool found = false;
+    const bool opened = ScanQueue(
+        queuePath,
+        [&](const QueueRecord& record) {
+            if (IsUnder(record.path, prefix) || (record.event == kEventRename && IsUnder(record.path_old, prefix))) {
+                found = true;
+            }
+        },
+        [](const std::string& line, off_t) { FILEIDX_LOG("Malformed command: %s", line.c_str()); });
+    if (!opened) {
+        FILEIDX_LOG("Failed to open queue=%s, reason=%m", queuePath.c_str());
+        return false;
+    }
+    return found;
+}
+
+}  // namespace
+
+bool IsFolderInQueue(const std::string& folderPath, const std::string& queuePath) {
+    if (!IsFileExist(queuePath)) return false;
+    std::string fullPath;
+    if (!GetFullPath(fullPath, folderPath)) {
+        FILEIDX_LOG("Cannot get full path: %s", folderPath.c_str());
+        return false;
+    }
+    const std::string prefix = fullPath + "/";
+    bool inQueue = false;
+    if (currentBatch != nullptr && currentBatch->Answer(prefix, queuePath, inQueue)) return inQueue;
+    return ScanForFolder(prefix, queuePath);
+}
+
+FolderStatusBatch::FolderStatusBatch(const std::vector<Folder>& folders) : outer_(currentBatch) {
+    for (const auto& folder : folders) {
+        std::string share;
+        std::string fullPath;
+        if (GetShareNameByPath(share, folder.path) && ShareFullPath(share, folder.path, fullPath)) {
+            owned_.push_back(fullPath + "/");
+        }
+    }
+    for (const auto& prefix : owned_) prefixes_.insert(prefix);
+    currentBatch = this;
+}
+
+FolderStatusBatch::~FolderStatusBatch() {
+    currentBatch = outer_;
+    for (auto& entry : readings_) {
+        if (entry.second.fd >= 0) close(entry.second.fd);
+    }
+}
+
+// Every prefix of the batch that the record path lies in: its ancestors, ending in "/".
+void FolderStatusBatch::Match(const std::string& recordPath, QueueReading& reading) const {
+    const std::string probe = recordPath + "/";
+    for (size_t slash = probe.find('/'); slash != std::string::npos; slash = probe.find('/', slash + 1)) {
+        const auto prefix = prefixes_.find(std::string_view(probe.data(), slash + 1));
+        if (prefix != prefixes_.end()) reading.matched.insert(*prefix);
+    }
+}
+
+FolderStatusBatch::QueueReading& FolderStatusBatch::Read(const std::string& queuePath) {
+    struct stat st;
+    const bool present = lstat(queuePath.c_str(), &st) == 0;
+    auto found = readings_.find(queuePath);
+    if (found != readings_.end() && present && found->second.dev == st.st_dev && found->second.ino == st.st_ino) {
+        return found->second;
+    }
+    QueueReading reading;
+    reading.fd = OpenNoFollow(queuePath, O_RDONLY);
+    if (reading.fd < 0) {
+        reading.openErrno = errno;
+    } else if (fstat(reading.fd, &st) == 0) {
+        reading.dev = st.st_dev;
+        reading.ino = st.st_ino;
+        ScanQueue(
+            reading.fd,
+            [&](const QueueRecord& record) {
+                Match(record.path, reading);
+                if (record.event == kEventRename) Match(record.path_old, reading);
+            },
+            [&](const std::string& line, off_t offset) { reading.malformed.emplace_back(offset, line.size()); });
+    }
+    if (found != readings_.end() && found->second.fd >= 0) close(found->second.fd);
+    return readings_[queuePath] = std::move(reading);
+}
+
+bool FolderStatusBatch::Answer(const std::string& prefix, const std::string& queuePath, bool& inQueue) {
+    if (prefixes_.count(prefix) == 0) return false;
+    const QueueReading& reading = Read(queuePath);
+    if (reading.fd < 0) {
+        errno = reading.openErrno;
+        FILEIDX_LOG("Failed to open queue=%s, reason=%m", queuePath.c_str());
+        inQueue = false;
+        return true;
+    }
+    for (const auto& [offset, length] : reading.malformed) {
+        std::string line(length, '\0');
+        if (pread(reading.fd, &line[0], length, offset) != static_cast<ssize_t>(length)) line.clear();
+        FILEIDX_LOG("Malformed command: %s", line.c_str());
+    }
+    inQueue = reading.matched.count(prefix) != 0;
+    return true;
+}
+
+}  // namespace detail
+}  // namespace FILEINDEX
+}  // namespace QIRA
