@@ -4,13 +4,13 @@
 set -euo pipefail
 cd "$(dirname "$0")/.."
 seconds=${1:-20}
-scripts/install-deps.sh
+scripts/install-deps.sh clang
 CC=clang CXX=clang++ cmake -S . -B build-fuzz -DCMAKE_BUILD_TYPE=RelWithDebInfo -DFILEINDEX_BUILD_FUZZ=ON \
   -DFILEINDEX_BUILD_TESTS=OFF >/dev/null
 cmake --build build-fuzz -j "$(nproc)" >/dev/null
 work=$(mktemp -d /tmp/fileindex-fuzz-run-XXXXXX)
 trap 'rm -rf "$work" /tmp/fileindex-fuzz-??????' EXIT
-for target in folder_conf status_conf queue_scan requests; do
+for target in folder_conf status_conf queue_scan requests queue_line folder_conf_reading; do
   mkdir -p "$work/$target"
   cp fuzz/corpus/"$target"/* "$work/$target/"
   echo "fuzz_$target: ${seconds}s"

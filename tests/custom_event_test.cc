@@ -12,6 +12,7 @@
 #include "fileindex/status_mgr.h"
 #include "fileindex/utils.h"
 #include "log_capture.h"
+#include "pending_reindex.h"
 #include "qira_sim/appliance.h"
 #include "sandbox.h"
 
@@ -107,6 +108,34 @@ TEST_F(CustomEventTest, FailedMarkingIsLoggedToo) {
     mkdir(Path("/tmp/fileidx_cfg_status.lock").c_str(), 0755);
     EXPECT_FALSE(AddCustomEvent(kEventReindex, dir_ + "/x", Json::Value()));
     EXPECT_TRUE(testkit::Logged("ShareSetNeedReindex failed, share=s"));
+}
+
+// One operation keeps what it read of a queue and reads on only as far as the file grew; a file
+// rewritten in place or replaced is read again.
+TEST_F(CustomEventTest, PendingReindexFollowsTheQueueAsItChanges) {
+    const std::string queue = QueueOf("s");
+    const std::string a = dir_ + "/a";
+    const auto reindexOf = [](const std::string& path) { return "{\"event\":65536,\"path\":\"" + path + "\"}\n"; };
+    MakeDir(dir_ + "/@eaDir");
+    testkit::WriteFile(queue, reindexOf(dir_ + "/other"));
+    detail::PendingReindex pending({a});
+    EXPECT_FALSE(pending.IsQueued(a, queue));
+    const int fd = open(queue.c_str(), O_WRONLY | O_APPEND);
+    ASSERT_EQ(write(fd, reindexOf(a).data(), reindexOf(a).size()), static_cast<ssize_t>(reindexOf(a).size()));
+    close(fd);
+    EXPECT_TRUE(pending.IsQueued(a, queue));  // appended by another writer
+    std::string same = reindexOf(dir_ + "/other") + reindexOf(dir_ + "/b");
+    same.resize(testkit::ReadFile(queue).size(), ' ');
+    const int inPlace = open(queue.c_str(), O_WRONLY);
+    ASSERT_EQ(pwrite(inPlace, same.data(), same.size(), 0), static_cast<ssize_t>(same.size()));
+    close(inPlace);
+    EXPECT_FALSE(pending.IsQueued(a, queue));  // rewritten in place at the same size
+    unlink(queue.c_str());
+    testkit::WriteFile(queue, "\n" + reindexOf(a));
+    EXPECT_TRUE(pending.IsQueued(a, queue));  // a new file
+    testkit::WriteFile(queue + ".x", reindexOf(dir_ + "/c"));
+    rename((queue + ".x").c_str(), queue.c_str());
+    EXPECT_TRUE(pending.IsQueued(dir_ + "/c", queue));  // a path not announced is read for too
 }
 
 }  // namespace

@@ -1,6 +1,8 @@
 // The sorted, paged listing with additional facts.
 #include "fileindex/folders.h"
 #include "fileindex/index_mgr.h"
+#include "fileindex/status_mgr.h"
+#include "fileindex/utils.h"
 #include "index_fixture.h"
 
 using namespace QIRA::FILEINDEX;
@@ -112,6 +114,30 @@ TEST_F(ListingTest, LoadFailureIsReported) {
     Json::Value out = "untouched";
     EXPECT_FALSE(IndexMgr::List(out, 0, 5, "", "", J("[]")));
     EXPECT_EQ(out.asString(), "untouched");
+}
+
+TEST_F(ListingTest, OneReadingPerQueueGivesTheWordsAndLogLinesOfAReadingPerFolder) {
+    const auto record = [this](const std::string& inside) {
+        return "{\"event\":131072,\"path\":\"" + music_ + inside + "\"}\n";
+    };
+    MakeDir(music_ + "/@eaDir");
+    testkit::WriteFile(QueueOf("music"), "junk 1\n" + record("/f1/x") + "[2]\n" + record("/f3") + "{\"event\":-1}\n");
+    testkit::WriteFile(QueueOf("music") + ".tmp", "tmp junk\n" + record("/f5/y"));
+    const Json::Value out = List(0, 10, "path", "ASC", J(R"(["status", "is_valid"])"));
+    const std::vector<std::string> batched = testkit::LogMessages();
+    std::vector<std::string> separately;
+    for (const auto& folder : out["folder"]) {
+        SCOPED_TRACE(folder["path"].asString());
+        testkit::ClearLog();
+        EXPECT_EQ(folder["additional"]["status"].asString(), StatusMgr::GetFolderStatus(folder["path"].asString()));
+        CanPathBeIndexed(folder["path"].asString());
+        const auto lines = testkit::LogMessages();
+        separately.insert(separately.end(), lines.begin(), lines.end());
+    }
+    EXPECT_EQ(batched, separately);
+    EXPECT_EQ(out["folder"][1]["additional"]["status"].asString(), "processing");
+    EXPECT_EQ(out["folder"][5]["additional"]["status"].asString(), "processing");
+    EXPECT_EQ(out["folder"][2]["additional"]["status"].asString(), "finished");
 }
 
 }  // namespace

@@ -67,32 +67,36 @@ std::string StatePath(const std::string& name) { return StateDir() + "/" + name;
 // State files are read far more often than written: keep the parsed value while the file's
 // identity (inode, size, modification time) stays the same.
 const Json::Value& ReadState(const std::string& name, const Json::Value& fallback) {
-    struct Cached {
-        ino_t inode = 0;
-        off_t size = -1;
-        timespec modified{};
-        Json::Value value;
-    };
-    static std::map<std::string, Cached> cache;
+    static std::map<std::string, CachedState> cache;
+    return ReadCachedState(cache, name, fallback).value;
+}
+
+const CachedState& ReadCachedState(std::map<std::string, CachedState>& cache, const std::string& name,
+                                   const Json::Value& fallback) {
+    using Cached = CachedState;
+    static unsigned long long versions = 0;
     const std::string path = StatePath(name);
     Cached& entry = cache[path];
     struct stat st;
     if (stat(path.c_str(), &st) != 0) {
-        entry = Cached{};
-        entry.value = fallback;
-        return entry.value;
+        if (entry.size != -1 || entry.version == 0) {
+            entry = Cached{};
+            entry.value = fallback;
+            entry.version = ++versions;
+        }
+        return entry;
     }
     if (entry.inode == st.st_ino && entry.size == st.st_size && entry.modified.tv_sec == st.st_mtim.tv_sec &&
         entry.modified.tv_nsec == st.st_mtim.tv_nsec) {
-        return entry.value;
+        return entry;
     }
     std::ifstream in(path);
     std::stringstream text;
     text << in.rdbuf();
     Json::Value value;
     if (!ParseJson(text.str(), value)) value = fallback;
-    entry = Cached{st.st_ino, st.st_size, st.st_mtim, value};
-    return entry.value;
+    entry = Cached{st.st_ino, st.st_size, st.st_mtim, value, ++versions};
+    return entry;
 }
 
 void WriteState(const std::string& name, const Json::Value& value) {
@@ -158,21 +162,40 @@ bool IsUnder(const std::string& path, const std::string& dir) {
     return probe.compare(0, prefix.size(), prefix) == 0;
 }
 
-bool FindShareOf(const std::string& fullPath, std::string& name, Json::Value& share) {
+// The share table indexed by directory, rebuilt when shares.json changes.
+const std::map<std::string, std::string>& SharesByDirectory() {
+    static std::map<std::string, CachedState> cache;
+    static unsigned long long builtFrom = 0;
+    static std::map<std::string, std::string> byDirectory;
     static const Json::Value kNone(Json::objectValue);
-    const Json::Value& shares = ReadState("shares.json", kNone);
-    if (!shares.isObject()) return false;
-    size_t best = 0;
-    for (const auto& key : shares.getMemberNames()) {
-        const Json::Value& candidate = shares[key];
-        if (!candidate.isObject() || !candidate["path"].isString()) continue;
-        const std::string dir = candidate["path"].asString();
-        if (!IsUnder(fullPath, dir) || dir.size() < best) continue;
-        best = dir.size();
-        name = key;
-        share = candidate;
+    const CachedState& state = ReadCachedState(cache, "shares.json", kNone);
+    if (state.version != builtFrom) {
+        byDirectory.clear();
+        if (state.value.isObject()) {
+            for (auto it = state.value.begin(); it != state.value.end(); ++it) {
+                if (it->isObject() && (*it)["path"].isString() && !(*it)["path"].asString().empty()) {
+                    byDirectory[(*it)["path"].asString()] = it.name();  // the last name of a directory wins
+                }
+            }
+        }
+        builtFrom = state.version;
     }
-    return best > 0;
+    return byDirectory;
+}
+
+bool FindShareOf(const std::string& fullPath, std::string& name, Json::Value& share) {
+    const auto& byDirectory = SharesByDirectory();
+    // The longest directory first: fullPath itself, then each prefix ending before a "/".
+    for (size_t end = fullPath.size();; end = fullPath.rfind('/', end - 1)) {
+        const auto found = byDirectory.find(fullPath.substr(0, end));
+        if (found != byDirectory.end()) {
+            static const Json::Value kNone(Json::objectValue);
+            name = found->second;
+            share = ReadState("shares.json", kNone)[name];
+            return true;
+        }
+        if (end == 0 || end == std::string::npos) return false;
+    }
 }
 
 }  // namespace detail

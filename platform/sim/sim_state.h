@@ -2,7 +2,11 @@
 // platform error of this process.
 #pragma once
 
+#include <sys/types.h>
+
+#include <ctime>
 #include <functional>
+#include <map>
 #include <string>
 
 #include <json/value.h>
@@ -15,6 +19,17 @@ std::string StatePath(const std::string& name);
 // Reads a state file; a missing or unreadable file reads as `fallback`. The reference stays
 // valid until the next read of the same file.
 const Json::Value& ReadState(const std::string& name, const Json::Value& fallback);
+
+// A parsed state file with the identity it was read at; `version` changes whenever it is read anew.
+struct CachedState {
+    ino_t inode = 0;
+    off_t size = -1;
+    timespec modified{};
+    Json::Value value;
+    unsigned long long version = 0;
+};
+const CachedState& ReadCachedState(std::map<std::string, CachedState>& cache, const std::string& name,
+                                   const Json::Value& fallback);
 
 // Read-modify-write of a state file under the simulation's lock; the file is replaced atomically.
 void UpdateState(const std::string& name, const Json::Value& fallback,

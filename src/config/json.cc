@@ -11,6 +11,8 @@
 #include <json/reader.h>
 #include <json/writer.h>
 
+#include "strict_json.h"
+
 namespace QIRA {
 namespace FILEINDEX {
 namespace {
@@ -45,24 +47,34 @@ const Json::StreamWriterBuilder& CompactWriter() {
     return builder;
 }
 
-// jsoncpp skips comments inside objects and arrays even when comments are not allowed; in strict
-// JSON a '/' can only stand inside a string.
-bool HasSlashOutsideStrings(const std::string& text) {
-    bool inString = false;
+struct Outline {
+    bool slashOutsideStrings = false;
+    bool stringOpen = false;
+    long depth = 0;  // openers minus closers outside strings
+};
+
+// What a strict reading can tell without parsing: strings end at an unescaped quote, as in jsoncpp.
+Outline OutlineOf(const char* begin, const char* end) {
+    Outline outline;
     bool escaped = false;
-    for (const char c : text) {
+    for (const char* p = begin; p < end; ++p) {
+        const char c = *p;
         if (escaped) {
             escaped = false;
-        } else if (inString) {
+        } else if (outline.stringOpen) {
             escaped = c == '\\';
-            inString = c != '"';
+            outline.stringOpen = c != '"';
         } else if (c == '"') {
-            inString = true;
+            outline.stringOpen = true;
+        } else if (c == '{' || c == '[') {
+            ++outline.depth;
+        } else if (c == '}' || c == ']') {
+            --outline.depth;
         } else if (c == '/') {
-            return true;
+            outline.slashOutsideStrings = true;  // jsoncpp would skip it as a comment inside containers
         }
     }
-    return false;
+    return outline;
 }
 
 bool ReadWholeFile(const std::string& path, std::string& text) {
@@ -88,18 +100,32 @@ bool WriteAll(int fd, const std::string& text) {
 
 }  // namespace
 
-bool fromString(Json::Value& out, const std::string& text) {
-    if (HasSlashOutsideStrings(text)) return false;
-    std::unique_ptr<Json::CharReader> reader(StrictReader().newCharReader());
+namespace detail {
+
+StrictJsonReader::StrictJsonReader() : reader_(StrictReader().newCharReader()) {}
+
+bool StrictReadingRefuses(const char* begin, const char* end) {
+    const Outline outline = OutlineOf(begin, end);
+    return outline.slashOutsideStrings || outline.stringOpen || outline.depth != 0;
+}
+
+bool StrictJsonReader::Parse(const char* begin, const char* end, Json::Value& out) {
+    if (OutlineOf(begin, end).slashOutsideStrings) return false;
     Json::Value parsed;
     std::string errors;
     try {
-        if (!reader->parse(text.data(), text.data() + text.size(), &parsed, &errors)) return false;
+        if (!reader_->parse(begin, end, &parsed, &errors)) return false;
     } catch (const std::exception&) {
         return false;  // nesting limit exceeded
     }
     out.swap(parsed);
     return true;
+}
+
+}  // namespace detail
+
+bool fromString(Json::Value& out, const std::string& text) {
+    return detail::StrictJsonReader().Parse(text.data(), text.data() + text.size(), out);
 }
 
 bool fromFile(Json::Value& out, const std::string& path) {

@@ -23,8 +23,9 @@ void MergeFolderFields(Folder& folder, const Json::Value& obj) {
 
 bool Governs(const std::string& folderFullPath, const std::string& fullPath) {
     const size_t length = folderFullPath.size();
-    return length != 0 && fullPath.size() >= length && fullPath.compare(0, length, folderFullPath) == 0 &&
-           (fullPath.size() == length || fullPath[length] == '/');
+    // The boundary and the last byte first: siblings that share a long prefix fail at once.
+    return length != 0 && fullPath.size() >= length && (fullPath.size() == length || fullPath[length] == '/') &&
+           fullPath[length - 1] == folderFullPath[length - 1] && fullPath.compare(0, length, folderFullPath) == 0;
 }
 
 }  // namespace detail

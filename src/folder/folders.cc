@@ -1,9 +1,13 @@
 // folder.conf: load, save, lookups, upsert and delete of the folder map.
 #include "fileindex/folders.h"
 
+#include <fcntl.h>
+#include <unistd.h>
+
 #include "fileindex/error.h"
 #include "fileindex/json.h"
 #include "fileindex/utils.h"
+#include "folder_conf_reader.h"
 #include "folder_fields.h"
 #include "full_path_resolver.h"
 #include "log.h"
@@ -38,6 +42,28 @@ Json::Value MostSuitableCfg(const std::map<std::string, Folder>& folders, const 
     return chosen ? chosen->asJson() : Json::Value(Json::objectValue);
 }
 
+// Adds the folders read from the file, keeping those already in the map, each full path resolved
+// with one look-up per share.
+void AddLoaded(std::map<std::string, Folder>& folders, std::map<std::string, Folder>& read) {
+    detail::FullPathResolver resolver;
+    for (auto& [key, folder] : read) {
+        if (folders.count(key) != 0) continue;
+        folder.path = key;
+        resolver.Resolve(key, folder.full_path);
+        folders.emplace(key, std::move(folder));
+    }
+}
+
+bool ReadWhole(const std::string& path, std::string& text) {
+    const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    if (fd < 0) return false;
+    char buffer[65536];
+    ssize_t got;
+    while ((got = read(fd, buffer, sizeof buffer)) > 0) text.append(buffer, static_cast<size_t>(got));
+    close(fd);
+    return got == 0;
+}
+
 }  // namespace
 
 Folders::~Folders() { folders.clear(); }
@@ -47,22 +73,24 @@ std::string Folders::GetLockPath() const { return detail::RootPath("/tmp/fileidx
 std::string Folders::GetPath() const { return detail::RootPath("/usr/qira/etc/fileindex/folder.conf"); }
 
 bool Folders::Load() {
+    std::string text;
+    std::map<std::string, Folder> read;
+    if (IsFileExist(GetPath()) && ReadWhole(GetPath(), text) && detail::ReadFolderConfFast(text, read)) {
+        AddLoaded(folders, read);
+        return true;
+    }
     if (!LoadJson()) return false;
     if (!body.isObject()) {
         FILEIDX_LOG("Malformed folders: %s", toString(body).c_str());
         ErrorHandler::SetError(FILEINDEX_ERR_MALFORMED_FOLDERS);
         return false;
     }
-    detail::FullPathResolver resolver;  // each share looked up once
     for (auto it = body.begin(); it != body.end(); ++it) {
-        const std::string key = it.name();
-        if (folders.count(key) != 0) continue;
         Folder folder;
         detail::MergeFolderFields(folder, *it);
-        folder.path = key;
-        resolver.Resolve(key, folder.full_path);
-        folders.emplace(key, std::move(folder));
+        read.emplace(it.name(), std::move(folder));
     }
+    AddLoaded(folders, read);
     return true;
 }
 

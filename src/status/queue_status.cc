@@ -19,8 +19,11 @@ namespace {
 
 thread_local FolderStatusBatch* currentBatch = nullptr;
 
+// recordPath + "/" starts with folderPrefix (which ends in "/"), without building the string.
 bool IsUnder(const std::string& recordPath, const std::string& folderPrefix) {
-    return StringStartWith(recordPath + "/", folderPrefix);
+    const size_t n = folderPrefix.size();
+    if (recordPath.size() >= n) return recordPath.compare(0, n, folderPrefix) == 0;
+    return recordPath.size() + 1 == n && folderPrefix.compare(0, n - 1, recordPath) == 0;
 }
 
 bool ScanForFolder(const std::string& prefix, const std::string& queuePath) {

@@ -8,6 +8,7 @@
 
 #include "fileindex/json.h"
 #include "line_reader.h"
+#include "strict_json.h"
 
 namespace QIRA {
 namespace FILEINDEX {
@@ -92,11 +93,10 @@ Verdict ReadFast(simdjson::dom::parser& parser, const char* begin, const char* e
     return Verdict::Record;
 }
 
-}  // namespace
-
-bool ReadQueueRecordStrict(const char* begin, const char* end, QueueRecord& record) {
+// The strict reading with a caller's reader.
+bool ReadStrict(StrictJsonReader& reader, const char* begin, const char* end, QueueRecord& record) {
     Json::Value value;
-    if (!fromString(value, std::string(begin, end)) || !value.isObject()) return false;
+    if (!reader.Parse(begin, end, value) || !value.isObject()) return false;
     const Json::Value* event = Member(value, "event");
     const Json::Value* path = Member(value, "path");
     if (event == nullptr || path == nullptr || !event->isConvertibleTo(Json::uintValue) || !path->isString()) {
@@ -112,11 +112,19 @@ bool ReadQueueRecordStrict(const char* begin, const char* end, QueueRecord& reco
     return true;
 }
 
+}  // namespace
+
+bool ReadQueueRecordStrict(const char* begin, const char* end, QueueRecord& record) {
+    StrictJsonReader reader;
+    return ReadStrict(reader, begin, end, record);
+}
+
 struct QueueRecordReader::Parser {
     simdjson::dom::parser parser;
 };
 
-QueueRecordReader::QueueRecordReader() : parser_(std::make_unique<Parser>()) {
+QueueRecordReader::QueueRecordReader()
+    : parser_(std::make_unique<Parser>()), strict_(std::make_unique<StrictJsonReader>()) {
     // Capacity grows with the longest line; the depth stays below jsoncpp's limit.
     if (parser_->parser.allocate(4096, kFastDepthLimit) != simdjson::SUCCESS) parser_.reset();
 }
@@ -125,7 +133,7 @@ QueueRecordReader::~QueueRecordReader() = default;
 
 bool QueueRecordReader::Read(const char* begin, const char* end, QueueRecord& record) {
     const Verdict verdict = parser_ ? ReadFast(parser_->parser, begin, end, record) : Verdict::Unsure;
-    if (verdict == Verdict::Unsure) return ReadQueueRecordStrict(begin, end, record);
+    if (verdict == Verdict::Unsure) return !StrictReadingRefuses(begin, end) && ReadStrict(*strict_, begin, end, record);
     return verdict == Verdict::Record;
 }
 

@@ -29,6 +29,8 @@ constexpr unsigned kEventRename = 256;
 // and numbers from 0 to 4294967295, fractions cut) and a string "path". False for any other line.
 bool ReadQueueRecordStrict(const char* begin, const char* end, QueueRecord& record);
 
+class StrictJsonReader;
+
 class QueueRecordReader {
 public:
     QueueRecordReader();
@@ -42,6 +44,7 @@ public:
 private:
     struct Parser;
     std::unique_ptr<Parser> parser_;
+    std::unique_ptr<StrictJsonReader> strict_;
 };
 
 }  // namespace detail

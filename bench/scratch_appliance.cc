@@ -1,0 +1,174 @@
+#include "scratch_appliance.h"
+
+#include <fcntl.h>
+#include <ftw.h>
+#include <poll.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdarg>
+#include <cstdio>
+#include <chrono>
+#include <cstdlib>
+#include <cstring>
+#include <fstream>
+
+#include "fileindex/json.h"
+#include "qira_sim/appliance.h"
+
+namespace bench {
+
+double Scale() {
+    const char* text = std::getenv("FILEINDEX_BENCH_SCALE");
+    const double scale = text ? std::atof(text) : 1.0;
+    return scale > 0 ? scale : 1.0;
+}
+
+size_t Scaled(size_t count) { return std::max<size_t>(1, static_cast<size_t>(static_cast<double>(count) * Scale())); }
+
+ScratchAppliance::ScratchAppliance() {
+    char tmpl[] = "/tmp/fileindex-bench-XXXXXX";
+    root_ = mkdtemp(tmpl);
+    setenv("QIRA_ROOT", root_.c_str(), 1);
+    qira_sim::InitAppliance(root_);
+    mkdir((root_ + "/volume1").c_str(), 0755);
+    listener_ = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    std::strncpy(address.sun_path, (root_ + "/var/run/fileindexd.sock").c_str(), sizeof address.sun_path - 1);
+    bind(listener_, reinterpret_cast<sockaddr*>(&address), sizeof address);
+    listen(listener_, 64);
+    daemon_ = std::thread([this] { ServeDaemon(); });
+}
+
+ScratchAppliance::~ScratchAppliance() {
+    stopping_ = true;
+    daemon_.join();
+    close(listener_);
+    nftw(root_.c_str(), [](const char* p, const struct stat*, int, FTW*) { return remove(p); }, 16,
+         FTW_DEPTH | FTW_PHYS);
+}
+
+void ScratchAppliance::ServeDaemon() {
+    char buffer[65536];
+    while (!stopping_) {
+        pollfd ready{listener_, POLLIN, 0};
+        if (poll(&ready, 1, 20) <= 0) continue;
+        const int client = accept4(listener_, nullptr, nullptr, SOCK_CLOEXEC);
+        if (client < 0) continue;
+        while (read(client, buffer, sizeof buffer) > 0) {
+        }
+        close(client);
+    }
+}
+
+std::string ScratchAppliance::AddShare(const std::string& name) {
+    const std::string dir = root_ + "/volume1/" + name;
+    mkdir(dir.c_str(), 0755);
+    mkdir((dir + "/@eaDir").c_str(), 0755);
+    mkdir((dir + "/busy").c_str(), 0755);
+    qira_sim::PutShare(name, dir);
+    return dir;
+}
+
+std::string ScratchAppliance::FolderConf() const { return root_ + "/usr/qira/etc/fileindex/folder.conf"; }
+
+void ScratchAppliance::WriteFolderConf(const std::vector<std::string>& paths) {
+    Json::Value conf(Json::objectValue);
+    for (const auto& path : paths) {
+        mkdir((root_ + "/volume1" + path).c_str(), 0755);
+        Json::Value folder(Json::objectValue);
+        folder["path"] = path;
+        folder["name"] = path.substr(path.rfind('/') + 1);
+        folder["document"] = folder["photo"] = true;
+        folder["audio"] = folder["video"] = false;
+        conf[path] = folder;
+    }
+    QIRA::FILEINDEX::toFile(conf, FolderConf());
+}
+
+std::string ScratchAppliance::QueueOf(const std::string& share) const {
+    return root_ + "/volume1/" + share + "/@eaDir/QIRA@file_index_queue";
+}
+
+size_t ScratchAppliance::WriteQueue(const std::string& share, size_t bytes, size_t malformedEvery) {
+    std::ofstream out(QueueOf(share), std::ios::trunc);
+    const std::string dir = root_ + "/volume1/" + share + "/busy/file";
+    size_t written = 0;
+    for (size_t i = 0; written < bytes; ++i) {
+        std::string line;
+        if (malformedEvery != 0 && i % malformedEvery == malformedEvery - 1) {
+            line = "{\"event\":131072,\"path\":\"" + dir + std::to_string(i) + "\"\n";  // cut short
+        } else {
+            line = "{\"data\":{\"audio\":true,\"document\":false},\"event\":131072,\"path\":\"" + dir +
+                   std::to_string(i) + "\"}\n";
+        }
+        out << line;
+        written += line.size();
+    }
+    return written;
+}
+
+double MedianSeconds(int runs, const std::function<void()>& reset, const std::function<void()>& run) {
+    std::vector<double> times;
+    for (int i = 0; i < runs; ++i) {
+        reset();
+        const auto start = std::chrono::steady_clock::now();
+        run();
+        times.push_back(std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count());
+    }
+    std::sort(times.begin(), times.end());
+    return times[times.size() / 2];
+}
+
+void RunAgainstBaseline(benchmark::State& state, double baselineSeconds, const std::function<void()>& reset,
+                        const std::function<void()>& run) {
+    std::vector<double> times;
+    for (auto _ : state) {
+        state.PauseTiming();
+        reset();
+        state.ResumeTiming();
+        const auto start = std::chrono::steady_clock::now();
+        run();
+        const double seconds = std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
+        state.SetIterationTime(seconds);
+        times.push_back(seconds);
+    }
+    std::sort(times.begin(), times.end());
+    const double median = times[times.size() / 2];
+    state.counters["median_ms"] = median * 1e3;
+    state.counters["baseline_ms"] = baselineSeconds * 1e3;
+    state.counters["ratio"] = median / baselineSeconds;
+}
+
+size_t CountLinesPlain(const std::vector<std::string>& files) {
+    static char buffer[1 << 20];
+    size_t lines = 0;
+    for (const auto& file : files) {
+        const int fd = open(file.c_str(), O_RDONLY | O_CLOEXEC);
+        ssize_t got;
+        while ((got = read(fd, buffer, sizeof buffer)) > 0) {
+            for (const char* p = buffer; (p = static_cast<const char*>(std::memchr(p, '\n', buffer + got - p))) != nullptr; ++p) {
+                ++lines;
+            }
+        }
+        close(fd);
+    }
+    return lines;
+}
+
+}  // namespace bench
+
+// The library's log lines are formatted and dropped here: a benchmark measures the library, not
+// the host's system log (which, with no syslog daemon, costs a failed connect per line).
+extern "C" void syslog(int, const char* format, ...) {
+    char buffer[8192];
+    va_list args;
+    va_start(args, format);
+    vsnprintf(buffer, sizeof buffer, format, args);
+    va_end(args);
+    benchmark::DoNotOptimize(buffer);
+}

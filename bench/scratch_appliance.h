@@ -1,0 +1,57 @@
+// A simulated appliance in a scratch directory for one benchmark, with a daemon stand-in that
+// accepts and discards every command, and helpers that time a benchmark against its baseline.
+#pragma once
+
+#include <atomic>
+#include <functional>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include <benchmark/benchmark.h>
+
+namespace bench {
+
+// Data sizes are multiplied by FILEINDEX_BENCH_SCALE (default 1); CI runs with a small scale.
+double Scale();
+size_t Scaled(size_t count);
+
+class ScratchAppliance {
+public:
+    ScratchAppliance();
+    ~ScratchAppliance();
+    ScratchAppliance(const ScratchAppliance&) = delete;
+    ScratchAppliance& operator=(const ScratchAppliance&) = delete;
+
+    // Creates <root>/volume1/<name> with its "@eaDir" and registers the share.
+    std::string AddShare(const std::string& name);
+    // Creates the directories and writes folder.conf holding these share paths.
+    void WriteFolderConf(const std::vector<std::string>& paths);
+    std::string QueueOf(const std::string& share) const;
+    // Fills the share's queue with about `bytes` of change records under the share's directory
+    // "busy" (every `malformedEvery`-th line malformed when not 0); returns the file size.
+    size_t WriteQueue(const std::string& share, size_t bytes, size_t malformedEvery = 0);
+    std::string FolderConf() const;
+    const std::string& root() const { return root_; }
+
+private:
+    void ServeDaemon();
+
+    std::string root_;
+    int listener_ = -1;
+    std::atomic<bool> stopping_{false};
+    std::thread daemon_;
+};
+
+// Median wall time of `runs` runs of `run`, each after an untimed `reset`.
+double MedianSeconds(int runs, const std::function<void()>& reset, const std::function<void()>& run);
+
+// Runs the benchmark loop with manual timing (reset untimed) and reports the median time per
+// iteration, the baseline's and their ratio.
+void RunAgainstBaseline(benchmark::State& state, double baselineSeconds, const std::function<void()>& reset,
+                        const std::function<void()>& run);
+
+// One read()+memchr pass over the files, counting lines: the floor for reading them.
+size_t CountLinesPlain(const std::vector<std::string>& files);
+
+}  // namespace bench

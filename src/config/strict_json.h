@@ -1,0 +1,30 @@
+// The strict reading of JSON text, with a jsoncpp reader that a caller reading many texts keeps.
+#pragma once
+
+#include <memory>
+
+#include <json/reader.h>
+#include <json/value.h>
+
+namespace QIRA {
+namespace FILEINDEX {
+namespace detail {
+
+// True when the strict reading surely refuses the text, seen without parsing it: a "/" outside
+// strings, a string left open, or brackets that do not balance.
+bool StrictReadingRefuses(const char* begin, const char* end);
+
+class StrictJsonReader {
+public:
+    StrictJsonReader();
+    // No comments, no trailing commas, nothing but white space after the value, at most
+    // kJsonNestingLimit levels; false on any error, `out` then unchanged.
+    bool Parse(const char* begin, const char* end, Json::Value& out);
+
+private:
+    std::unique_ptr<Json::CharReader> reader_;
+};
+
+}  // namespace detail
+}  // namespace FILEINDEX
+}  // namespace QIRA

@@ -1,0 +1,74 @@
+// The fast readings of queue lines and folder.conf give the strict readings' answers on every
+// input of the fuzz targets' seed corpora (escapes, duplicate keys, number edges, deep nesting,
+// invalid UTF-8, byte order marks, comments, trailing garbage).
+#include <dirent.h>
+
+#include <map>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "folder_conf_reader.h"
+#include "line_reader.h"
+#include "queue_record.h"
+#include "sandbox.h"
+
+using namespace QIRA::FILEINDEX;
+
+namespace {
+
+std::vector<std::string> Corpus(const std::string& name) {
+    const std::string dir = std::string(FUZZ_CORPUS_DIR) + "/" + name;
+    std::vector<std::string> files;
+    DIR* listing = opendir(dir.c_str());
+    if (listing == nullptr) return files;
+    while (const dirent* entry = readdir(listing)) {
+        if (entry->d_name[0] != '.') files.push_back(dir + "/" + entry->d_name);
+    }
+    closedir(listing);
+    return files;
+}
+
+TEST(ReaderSamenessTest, QueueLinesReadTheSameBothWays) {
+    detail::QueueRecordReader reader;
+    const auto files = Corpus("queue_line");
+    ASSERT_GE(files.size(), 60u);
+    int records = 0;
+    for (const auto& file : files) {
+        SCOPED_TRACE(file);
+        std::string line = testkit::ReadFile(file);
+        const size_t size = line.size();
+        line.resize(size + detail::LineReader::kPadding);
+        detail::QueueRecord fast, strict;
+        const bool fastRead = reader.Read(line.data(), line.data() + size, fast);
+        ASSERT_EQ(fastRead, detail::ReadQueueRecordStrict(line.data(), line.data() + size, strict));
+        if (fastRead) {
+            EXPECT_EQ(fast, strict);
+            ++records;
+        }
+    }
+    EXPECT_GE(records, 15);  // both verdicts are exercised
+}
+
+TEST(ReaderSamenessTest, FolderConfReadsTheSameBothWays) {
+    const auto files = Corpus("folder_conf_reading");
+    ASSERT_GE(files.size(), 20u);
+    int fastReads = 0;
+    for (const auto& file : files) {
+        SCOPED_TRACE(file);
+        const std::string text = testkit::ReadFile(file);
+        std::map<std::string, Folder> fast, strict;
+        if (!detail::ReadFolderConfFast(text, fast)) continue;
+        ++fastReads;
+        ASSERT_TRUE(detail::ReadFolderConfStrict(text, strict));
+        ASSERT_EQ(fast.size(), strict.size());
+        for (auto a = fast.begin(), b = strict.begin(); a != fast.end(); ++a, ++b) {
+            EXPECT_EQ(a->first, b->first);
+            EXPECT_EQ(a->second.asJson(), b->second.asJson());
+        }
+    }
+    EXPECT_GE(fastReads, 8);
+}
+
+}  // namespace
