@@ -11,6 +11,8 @@
 #include "index_fixture.h"
 #include "process.h"
 
+#include <sstream>
+
 using namespace QIRA::FILEINDEX;
 using testkit::J;
 
@@ -29,15 +31,16 @@ TEST_F(ToolTest, FoldersRoundTripThroughJsonOutput) {
     ASSERT_EQ(result.status, 0) << result.err;
     EXPECT_EQ(result.out, "ok\n");
     EXPECT_EQ(result.err, "");
-    result = Ctl({"--json", "folder", "list", "--additional", "status,is_valid", "--sort", "name", "--desc"});
+    // Global options are taken after the command as well.
+    result = Ctl({"folder", "list", "--additional", "status,is_valid", "--sort", "name", "--desc", "--json"});
     ASSERT_EQ(result.status, 0);
-    const auto listing = testkit::ParseJson(result.out);
+    const auto listing = testkit::ParseJson(result.out)["result"];
     EXPECT_EQ(listing["total"].asInt(), 2);
     EXPECT_EQ(listing["folder"][0], J(R"({"path": "/music/b", "name": "Songs", "document": false, "audio": true,
                                          "video": false, "photo": false,
                                          "additional": {"status": "processing", "is_valid": true}})"));
     result = Ctl({"--json", "folder", "get", "/music/a"});
-    EXPECT_EQ(testkit::ParseJson(result.out)["name"].asString(), "Songs");
+    EXPECT_EQ(testkit::ParseJson(result.out)["result"]["name"].asString(), "Songs");
 }
 
 TEST_F(ToolTest, RequestsComeFromStandardInput) {
@@ -46,29 +49,99 @@ TEST_F(ToolTest, RequestsComeFromStandardInput) {
     EXPECT_TRUE(Conf()["/photo/a"]["photo"].asBool());
 }
 
+// 0 yes, 1 no, 2 when the answer could not be worked out.
 TEST_F(ToolTest, QuestionsAnswerByExitStatus) {
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
-    EXPECT_EQ(Ctl({"is", "path-indexed", "/music/a/x"}).status, 0);
-    EXPECT_EQ(Ctl({"is", "path-indexed", "/music/b"}).status, 1);
-    EXPECT_EQ(Ctl({"is", "share-indexed", "music"}).status, 0);
-    EXPECT_EQ(Ctl({"is", "contains-indexed", "/music"}).status, 0);
-    EXPECT_EQ(Ctl({"is", "full-path-indexed", music_ + "/a"}).status, 0);
-    EXPECT_EQ(Ctl({"is", "indexable", "/music/a"}).status, 0);
-    EXPECT_EQ(Ctl({"is", "indexable", "/music/none"}).status, 1);
-    EXPECT_EQ(Ctl({"is", "skipped", music_ + "/.DS_Store"}).status, 0);
-    EXPECT_EQ(Ctl({"is", "roomy", "music"}).status, 0);
-    EXPECT_EQ(Ctl({"--json", "is", "share-indexed", "photo"}).out, "false\n");
+    const std::vector<std::pair<std::vector<std::string>, int>> cases = {
+        {{"is", "path-indexed", "/music/a/x"}, 0},     {{"is", "path-indexed", "/music/b"}, 1},
+        {{"is", "share-indexed", "music"}, 0},         {{"is", "share-indexed", "photo"}, 1},
+        {{"is", "contains-indexed", "/music"}, 0},     {{"is", "full-path-indexed", music_ + "/a"}, 0},
+        {{"is", "indexable", "/music/a"}, 0},          {{"is", "indexable", "/music/none"}, 1},
+        {{"is", "indexable", "/nosuch/a"}, 2},         {{"is", "skipped", music_ + "/.DS_Store"}, 0},
+        {{"is", "roomy", "music"}, 0},                 {{"is", "roomy", "nosuch"}, 2},
+    };
+    for (const auto& [args, status] : cases) {
+        SCOPED_TRACE(args[1] + " " + args[2]);
+        EXPECT_EQ(Ctl(args).status, status);
+    }
+    testkit::WriteFile(FolderConf(), "{broken");
+    const auto result = Ctl({"is", "path-indexed", "/music/a"});
+    EXPECT_EQ(result.status, 2);
+    EXPECT_EQ(result.err.rfind("fileindexctl: is path-indexed failed: FILEINDEX_ERR_LOAD_JSON (6)", 0), 0u) << result.err;
 }
 
-TEST_F(ToolTest, FailuresNameTheErrorCodeOnOneStderrLine) {
+std::vector<std::string> Lines(const std::string& text) {
+    std::vector<std::string> lines;
+    std::istringstream in(text);
+    for (std::string line; std::getline(in, line);) lines.push_back(line);
+    return lines;
+}
+
+// The error code of the operation, the library's log lines and what was saved before the failure.
+TEST_F(ToolTest, FailuresTellTheirCauseOnStderr) {
     Folders holder;
     ASSERT_TRUE(holder.Lock(true));
     auto result = Ctl({"--lock-wait", "0", "folder", "delete", "/music/a"});
     holder.Unlock();
     EXPECT_EQ(result.status, 1);
     EXPECT_EQ(result.out, "");
-    EXPECT_EQ(result.err, "fileindexctl: folder delete failed: FILEINDEX_ERR_LOCK (9): the configuration lock is held "
-                          "by another process; try again\n");
+    auto lines = Lines(result.err);
+    ASSERT_EQ(lines.size(), 2u) << result.err;
+    EXPECT_EQ(lines[0], "fileindexctl: folder delete failed: FILEINDEX_ERR_LOCK (9): the configuration lock is held "
+                        "by another process; try again");
+    EXPECT_EQ(lines[1].rfind("fileindexctl: log: config.cc:", 0), 0u);
+    EXPECT_NE(lines[1].find(" Failed to lock folder"), std::string::npos);
+
+    qira_sim::InjectFault("QLIBServiceStart", 0x1234);
+    result = Ctl({"folder", "add", "/music/a"});
+    lines = Lines(result.err);
+    ASSERT_EQ(lines.size(), 3u) << result.err;
+    EXPECT_EQ(lines[0], "fileindexctl: folder add failed: FILEINDEX_ERR_NONE (0): the library set no error code; the "
+                        "cause is in its log");
+    EXPECT_NE(lines[1].find("QLIBServiceStart failed: err=[0x1234 sim/QLIBServiceStart:1]"), std::string::npos);
+    EXPECT_EQ(lines[2], "fileindexctl: " + FolderConf() +
+                            " was already saved with the change; the steps after it did not all succeed");
+    EXPECT_EQ(Lines(Ctl({"-q", "folder", "add", "/music/a"}).err).size(), 2u);  // no log lines
+
+    qira_sim::ClearFaults();
+    daemon_.reset();
+    result = Ctl({"service", "pause"});
+    EXPECT_NE(result.err.find("SendCammandToDaemon failed"), std::string::npos) << result.err;
+    EXPECT_NE(result.err.find(StatusConf() + " was already saved"), std::string::npos);
+    result = Ctl({"share", "paths", "nosuch"});
+    EXPECT_NE(result.err.find("QIRAShareGet failed, name=nosuch"), std::string::npos) << result.err;
+}
+
+// With --json every command family prints one object of the same shape, success or failure.
+TEST_F(ToolTest, JsonHasOneShapeForSuccessAndFailure) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
+    const std::vector<std::pair<std::vector<std::string>, bool>> cases = {
+        {{"folder", "list"}, true},          {{"folder", "get", "/music/none"}, false},
+        {{"folder", "add", "/music/b"}, true}, {{"reindex", "/photo/a"}, false},
+        {{"service", "status"}, true},       {{"service", "pause", "--hours", "2"}, true},
+        {{"share", "need-reindex", "music", "off"}, true}, {{"share", "paths", "nosuch"}, false},
+        {{"is", "share-indexed", "music"}, true}, {{"migrate"}, true},
+    };
+    const std::vector<std::string> members = {"error", "log", "message", "ok", "result", "saved"};
+    for (auto [args, ok] : cases) {
+        SCOPED_TRACE(args[0] + (args.size() > 1 ? " " + args[1] : ""));
+        args.push_back("--json");
+        const auto result = Ctl(args);
+        EXPECT_EQ(result.status == 0, ok);
+        const Json::Value out = testkit::ParseJson(result.out);
+        EXPECT_EQ(out.getMemberNames(), members);
+        EXPECT_EQ(out["ok"].asBool(), ok);
+        EXPECT_EQ(out["message"].asString().empty(), ok);
+        EXPECT_EQ(out["error"]["number"].asInt() == 0, ok || args[0] == "share" || args[0] == "reindex");
+    }
+    const Json::Value pause = testkit::ParseJson(Ctl({"--json", "service", "status"}).out)["result"]["pause"];
+    EXPECT_TRUE(pause["paused"].asBool());
+    const time_t end = static_cast<time_t>(pause["resume_time"].asInt64());
+    char utc[32];
+    strftime(utc, sizeof utc, "%Y-%m-%dT%H:%M:%SZ", gmtime(&end));
+    EXPECT_EQ(pause["resume_time_utc"].asString(), utc);
+    EXPECT_EQ(testkit::ParseJson(Ctl({"--json", "is", "share-indexed", "photo"}).out)["result"],
+              J(R"({"answer": false})"));
 }
 
 TEST_F(ToolTest, ArgumentsTheLibraryWouldReadOtherwiseAreRefused) {
@@ -109,13 +182,26 @@ TEST_F(ToolTest, HeldLockIsRetriedUntilItIsReleased) {
     close(watch);
 }
 
-TEST_F(ToolTest, UsageErrorsExitTwoWithTheUsage) {
-    for (const auto& args : std::vector<std::vector<std::string>>{{}, {"folder"}, {"folder", "get"}, {"nonsense"},
-                                                                   {"share", "no-space", "music", "maybe"}}) {
-        const auto result = Ctl(args);
+// All three tools: usage errors exit 2 with the usage on stderr, --version exits 0.
+TEST_F(ToolTest, UsageErrorsExitTwoAndEveryToolTellsItsVersion) {
+    const std::vector<std::vector<std::string>> usageErrors = {
+        {FILEINDEXCTL}, {FILEINDEXCTL, "folder"}, {FILEINDEXCTL, "folder", "get"}, {FILEINDEXCTL, "nonsense"},
+        {FILEINDEXCTL, "share", "no-space", "music", "maybe"}, {FILEINDEXCTL, "folder", "list", "--sort", "size"},
+        {FILEINDEXCTL, "folder", "list", "--additional", "status,bogus"}, {FILEINDEXCTL, "--root", Path("/none"), "folder", "list"},
+        {QIRA_SIM, "share", "add"}, {QIRA_SIM, "bogus"}, {FILEINDEXD_REF, "--interval", "0"}};
+    for (const auto& args : usageErrors) {
+        SCOPED_TRACE(args.back());
+        const auto result = testkit::Run(args);
         EXPECT_EQ(result.status, 2);
         EXPECT_EQ(result.out, "");
         EXPECT_NE(result.err.find("Usage:"), std::string::npos);
+    }
+    EXPECT_NE(testkit::Run({FILEINDEXCTL, "--root", Path("/none"), "folder", "list"}).err.find("no such directory: " + Path("/none")),
+              std::string::npos);
+    for (const char* tool : {FILEINDEXCTL, QIRA_SIM, FILEINDEXD_REF}) {
+        const auto result = testkit::Run({tool, "--version"});
+        EXPECT_EQ(result.status, 0);
+        EXPECT_NE(result.out.find(" 1."), std::string::npos) << result.out;
     }
 }
 
@@ -128,14 +214,26 @@ TEST_F(ToolTest, RootOptionStandsInForTheEnvironment) {
     EXPECT_NE(result.out.find(QueueOf("music")), std::string::npos);
 }
 
+TEST_F(ToolTest, BashCompletionOffersTheSubcommands) {
+    const auto complete = [](const std::string& words, int index) {
+        return testkit::Run({"/bin/bash", "-c", "source " + std::string(COMPLETION) + "; COMP_WORDS=(" + words +
+                                                    "); COMP_CWORD=" + std::to_string(index) +
+                                                    "; _fileindexctl; echo ${COMPREPLY[*]}"}).out;
+    };
+    EXPECT_EQ(complete("fileindexctl sh", 1), "share\n");
+    EXPECT_EQ(complete("fileindexctl share re", 2), "remove rename resume revive\n");
+    EXPECT_EQ(complete("fileindexctl is ro", 2), "roomy\n");
+}
+
 TEST_F(ToolTest, ServiceStatusShowsPauseAndFlags) {
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
     testkit::WriteFile(StatusConf(), R"({"resume_time": 0, "no_space": {"music": true}})");
     const auto result = Ctl({"--json", "service", "status"});
     ASSERT_EQ(result.status, 0) << result.err;
-    EXPECT_EQ(testkit::ParseJson(result.out),
-              J(R"({"status": "finished", "resume_time": 0, "pause": "paused until resumed",
+    EXPECT_EQ(testkit::ParseJson(result.out)["result"],
+              J(R"({"status": "finished", "pause": {"paused": true, "resume_time": 0, "resume_time_utc": null},
                     "no_space": ["music"], "need_reindex": []})"));
+    EXPECT_NE(Ctl({"service", "status"}).out.find("paused until resumed"), std::string::npos);
 }
 
 class DaemonStandInTest : public testkit::IndexFixture {

@@ -1,6 +1,8 @@
 // Abstract base of the locked JSON configuration files.
 #pragma once
 
+#include "fileindex/export.h"
+
 #include <string>
 
 #include <json/value.h>
@@ -8,7 +10,7 @@
 namespace QIRA {
 namespace FILEINDEX {
 
-class Config {
+class FILEINDEX_EXPORT Config {
 public:
     Config();
     virtual ~Config();

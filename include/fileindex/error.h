@@ -1,6 +1,8 @@
 // Process-wide error code and log level of libfileindex.
 #pragma once
 
+#include "fileindex/export.h"
+
 #include <cstdint>
 
 namespace QIRA {
@@ -19,11 +21,11 @@ enum _tag_fileindex_err_ : int32_t {
 };
 
 // 7 turns on the debug-only log lines; a host may assign it.
-extern int LOG_LEVEL;
+extern FILEINDEX_EXPORT int LOG_LEVEL;
 
 // The cause of the last failure. Sticky: success never resets it; not synchronised between
 // threads.
-class ErrorHandler {
+class FILEINDEX_EXPORT ErrorHandler {
 public:
     ErrorHandler() = delete;
     static void SetError(_tag_fileindex_err_ code);

@@ -1,6 +1,8 @@
 // One indexed folder: share path, display name and the four media-type switches.
 #pragma once
 
+#include "fileindex/export.h"
+
 #include <string>
 
 #include <json/value.h>
@@ -8,7 +10,7 @@
 namespace QIRA {
 namespace FILEINDEX {
 
-class Folder {
+class FILEINDEX_EXPORT Folder {
 public:
     std::string full_path;  // cached; empty when the share could not be resolved
     std::string path;       // share path, the key in folder.conf

@@ -1,6 +1,8 @@
 // folder.conf: the list of indexed folders, keyed by share path.
 #pragma once
 
+#include "fileindex/export.h"
+
 #include <map>
 #include <string>
 #include <vector>
@@ -15,7 +17,7 @@ namespace FILEINDEX {
 
 constexpr size_t MAX_FOLDER_COUNT = 1000;
 
-class Folders : public Config {
+class FILEINDEX_EXPORT Folders : public Config {
 public:
     ~Folders() override;
 

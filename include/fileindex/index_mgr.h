@@ -2,6 +2,8 @@
 // notification daemon's monitor queues.
 #pragma once
 
+#include "fileindex/export.h"
+
 #include <string>
 #include <vector>
 
@@ -12,7 +14,7 @@
 namespace QIRA {
 namespace FILEINDEX {
 
-class IndexMgr {
+class FILEINDEX_EXPORT IndexMgr {
 public:
     IndexMgr() = delete;
 

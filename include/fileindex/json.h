@@ -5,6 +5,8 @@
 // top-level value is accepted. None of these functions throws.
 #pragma once
 
+#include "fileindex/export.h"
+
 #include <string>
 
 #include <json/value.h>
@@ -15,14 +17,14 @@ namespace FILEINDEX {
 constexpr unsigned kJsonNestingLimit = 256;
 
 // Parses a whole file into `out`; false when it cannot be read or is not valid JSON.
-bool fromFile(Json::Value& out, const std::string& path);
+FILEINDEX_EXPORT bool fromFile(Json::Value& out, const std::string& path);
 // Replaces the file atomically: a temporary file in the same directory is written, flushed to
 // disk and renamed over `path`. Readers see the old or the new document, never a part.
-bool toFile(const Json::Value& value, const std::string& path);
+FILEINDEX_EXPORT bool toFile(const Json::Value& value, const std::string& path);
 // Parses `text` into `out`; false on any error.
-bool fromString(Json::Value& out, const std::string& text);
+FILEINDEX_EXPORT bool fromString(Json::Value& out, const std::string& text);
 // Serialises `value` as one line of compact JSON (UTF-8 kept as it is).
-std::string toString(const Json::Value& value);
+FILEINDEX_EXPORT std::string toString(const Json::Value& value);
 
 }  // namespace FILEINDEX
 }  // namespace QIRA

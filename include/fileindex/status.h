@@ -1,6 +1,8 @@
 // status.conf: pause state, per-share out-of-space and need-reindex flags, updated markers.
 #pragma once
 
+#include "fileindex/export.h"
+
 #include <string>
 
 #include "fileindex/config.h"
@@ -13,7 +15,7 @@ namespace FILEINDEX {
 // repaired: setting or clearing a flag in it fails (returns false) and changes nothing. When the
 // whole file is not a JSON object, every setter fails, the flag questions answer false and
 // GetPauseInfo fails with "json exception".
-class Status : public Config {
+class FILEINDEX_EXPORT Status : public Config {
 public:
     ~Status() override;
 

@@ -1,12 +1,14 @@
 // Pause and resume, share flags and status words, each call on a fresh image of status.conf.
 #pragma once
 
+#include "fileindex/export.h"
+
 #include <string>
 
 namespace QIRA {
 namespace FILEINDEX {
 
-class StatusMgr {
+class FILEINDEX_EXPORT StatusMgr {
 public:
     StatusMgr() = delete;
 

@@ -1,10 +1,13 @@
-// The command groups of fileindexctl.
+// The command groups of fileindexctl and what they share.
 #pragma once
+
+#include <functional>
+#include <optional>
 
 #include <CLI/CLI.hpp>
 
-#include "lock_retry.h"
 #include "output.h"
+#include "saved_files.h"
 #include "validators.h"
 
 namespace fileindexctl {
@@ -14,7 +17,14 @@ struct Context {
     int status = 0;
     double lockWait = 5;  // seconds to retry a held configuration lock
 
-    bool Attempt(const std::function<bool()>& operation) const { return RetryWhileLocked(lockWait, operation); }
+    // Runs one library operation: the error code and the log lines are cleared first, so those
+    // left belong to it, and a held configuration lock is retried for lockWait seconds.
+    bool Attempt(const std::function<bool()>& operation);
+    // Tells the failure of the last attempt; returns the exit status.
+    int Fail(const std::string& operation) const;
+
+private:
+    std::optional<SavedFiles> before_;
 };
 
 void AddFolderCommands(CLI::App& app, Context& ctx);

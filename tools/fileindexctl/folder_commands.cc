@@ -23,11 +23,19 @@ Json::Value StringArray(const std::vector<std::string>& items) {
     return array;
 }
 
+Json::Value ResultOf(const Json::Value& request) {
+    Json::Value result(Json::objectValue);
+    result["folders"] = request;
+    return result;
+}
+
 int List(Context& ctx, unsigned long offset, unsigned long limit, const std::string& sortBy, bool descending,
          const std::vector<std::string>& additional) {
     Json::Value out;
-    if (!IndexMgr::List(out, offset, limit, sortBy, descending ? "DESC" : "ASC", StringArray(additional))) {
-        return Fail("folder list");
+    if (!ctx.Attempt([&] {
+            return IndexMgr::List(out, offset, limit, sortBy, descending ? "DESC" : "ASC", StringArray(additional));
+        })) {
+        return ctx.Fail("folder list");
     }
     Table table;
     std::vector<std::string> header = {"PATH", "NAME", "DOCUMENT", "AUDIO", "VIDEO", "PHOTO"};
@@ -103,10 +111,10 @@ void AddUpsertCommand(CLI::App& folder, Context& ctx, const char* verb, const ch
             request = BuildRequest(*settings, *cmd);
         }
         if (!ctx.Attempt([&] { return IndexMgr::Upsert(request); })) {
-            ctx.status = Fail(std::string("folder ") + verb);
+            ctx.status = ctx.Fail(std::string("folder ") + verb);
             return;
         }
-        ctx.out.Emit(request, "ok");
+        ctx.out.Emit(ResultOf(request), "ok");
     });
 }
 
@@ -118,10 +126,12 @@ void AddPathsCommand(CLI::App& parent, Context& ctx, const char* verb, const cha
     cmd->add_option("paths", *paths, "Share paths")->required();
     cmd->callback([&ctx, paths, operation, action] {
         if (!ctx.Attempt([&] { return action(StringArray(*paths)); })) {
-            ctx.status = Fail(operation);
+            ctx.status = ctx.Fail(operation);
             return;
         }
-        ctx.out.Emit(StringArray(*paths), "ok");
+        Json::Value result(Json::objectValue);
+        result["paths"] = StringArray(*paths);
+        ctx.out.Emit(result, "ok");
     });
 }
 
@@ -139,9 +149,12 @@ void AddFolderCommands(CLI::App& app, Context& ctx) {
     auto additional = std::make_shared<std::vector<std::string>>();
     list->add_option("--offset", *offset, "First record of the page");
     list->add_option("--limit", *limit, "Records in the page");
-    list->add_option("--sort", *sortBy, "name, path, document, audio, video or photo");
+    list->add_option("--sort", *sortBy, "Sort key")
+        ->check(CLI::IsMember({"path", "name", "document", "audio", "video", "photo"}));
     list->add_flag("--desc", *descending, "Descending page");
-    list->add_option("--additional", *additional, "Facts to add: status, is_valid")->delimiter(',');
+    list->add_option("--additional", *additional, "Facts to add, comma-separated")
+        ->delimiter(',')
+        ->check(CLI::IsMember({"status", "is_valid"}));
     list->callback([&ctx, offset, limit, sortBy, descending, additional] {
         ctx.status = List(ctx, *offset, *limit, *sortBy, *descending, *additional);
     });
@@ -152,7 +165,7 @@ void AddFolderCommands(CLI::App& app, Context& ctx) {
     get->callback([&ctx, path] {
         Json::Value out;
         if (!ctx.Attempt([&] { return IndexMgr::Get(out, *path); })) {
-            ctx.status = Fail("folder get");
+            ctx.status = ctx.Fail("folder get");
             return;
         }
         ctx.out.Emit(out, Table{{"path", out["path"].asString()}, {"name", out["name"].asString()},
@@ -168,8 +181,15 @@ void AddFolderCommands(CLI::App& app, Context& ctx) {
     auto* status = folder->add_subcommand("status", "Indexing status word of one folder");
     status->add_option("path", *path, "Share path")->required();
     status->callback([&ctx, path] {
-        const std::string word = QIRA::FILEINDEX::StatusMgr::GetFolderStatus(*path);
-        ctx.out.Emit(Json::Value(word), word);
+        std::string word;
+        ctx.Attempt([&] {
+            word = QIRA::FILEINDEX::StatusMgr::GetFolderStatus(*path);
+            return true;
+        });
+        Json::Value result(Json::objectValue);
+        result["path"] = *path;
+        result["status"] = word;
+        ctx.out.Emit(result, word);
     });
 
     AddPathsCommand(app, ctx, "reindex", "Index paths again from scratch", "reindex", &IndexMgr::Reindex);

@@ -1,35 +1,44 @@
 // fileindexctl: the library's operations as a command, for share hooks, upgrade scripts and
 // administrators.
-#include <cstdlib>
-#include <iostream>
+#include <sys/stat.h>
 
+#include <cstdlib>
+
+#include "cli.h"
 #include "commands.h"
+
+namespace {
+
+// The root prefix in force: --root, else QIRA_ROOT; it must be a directory.
+void UseRoot(const std::string& option) {
+    const char* env = std::getenv("QIRA_ROOT");
+    const std::string root = !option.empty() ? option : (env ? env : "");
+    struct stat st;
+    if (!root.empty() && (stat(root.c_str(), &st) != 0 || !S_ISDIR(st.st_mode))) {
+        throw CLI::ValidationError(option.empty() ? "QIRA_ROOT" : "--root", "no such directory: " + root);
+    }
+    if (!option.empty()) setenv("QIRA_ROOT", option.c_str(), 1);
+}
+
+}  // namespace
 
 int main(int argc, char** argv) {
     fileindexctl::Context ctx;
     CLI::App app{"Configure and control the file-indexing service", "fileindexctl"};
     app.require_subcommand(1);
+    app.fallthrough();  // the options below are accepted after the command too
+    app.set_version_flag("--version", "fileindexctl " FILEINDEX_VERSION);
     std::string root;
     app.add_option("--root", root, "Root prefix of the appliance (instead of QIRA_ROOT)");
-    app.add_flag("--json", ctx.out.json, "Machine-readable output");
+    app.add_flag("--json", ctx.out.json, "One JSON object on stdout, for success and failure alike");
+    app.add_flag("-q,--quiet", ctx.out.quiet, "Do not show the library's log lines with a failure");
     app.add_option("--lock-wait", ctx.lockWait, "Seconds to retry a held configuration lock (0 = fail at once)")
         ->check(CLI::NonNegativeNumber);
-    app.parse_complete_callback([&root] {
-        if (!root.empty()) setenv("QIRA_ROOT", root.c_str(), 1);
-    });
+    app.parse_complete_callback([&root] { UseRoot(root); });
     fileindexctl::AddFolderCommands(app, ctx);
     fileindexctl::AddServiceCommands(app, ctx);
     fileindexctl::AddShareCommands(app, ctx);
     fileindexctl::AddQuestionCommands(app, ctx);
-    try {
-        app.parse(argc, argv);
-    } catch (const CLI::CallForHelp& e) {
-        return app.exit(e);
-    } catch (const CLI::CallForAllHelp& e) {
-        return app.exit(e);
-    } catch (const CLI::ParseError& e) {
-        std::cerr << "fileindexctl: " << e.what() << "\n" << app.help();
-        return fileindexctl::kExitUsage;
-    }
+    if (const auto ended = tools::Parse(app, argc, argv)) return *ended;
     return ctx.status;
 }

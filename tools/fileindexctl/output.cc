@@ -4,6 +4,7 @@
 #include <ctime>
 #include <iostream>
 
+#include "captured_log.h"
 #include "fileindex/error.h"
 #include "fileindex/json.h"
 
@@ -21,7 +22,7 @@ ErrorText Describe(_tag_fileindex_err_ code) {
     using namespace QIRA::FILEINDEX;
     switch (code) {
         case FILEINDEX_ERR_NONE:
-            return {"FILEINDEX_ERR_NONE", "no library error recorded (a platform step or the daemon failed; see the system log)"};
+            return {"FILEINDEX_ERR_NONE", "the library set no error code; the cause is in its log"};
         case FILEINDEX_ERR_BAD_PARAM:
             return {"FILEINDEX_ERR_BAD_PARAM", "the request is malformed or names an unknown item"};
         case FILEINDEX_ERR_PATH:
@@ -42,13 +43,30 @@ ErrorText Describe(_tag_fileindex_err_ code) {
     return {"FILEINDEX_ERR_UNKNOWN", "unknown error code"};
 }
 
+Json::Value Strings(const std::vector<std::string>& items) {
+    Json::Value array(Json::arrayValue);
+    for (const auto& item : items) array.append(item);
+    return array;
+}
+
 }  // namespace
 
-void Output::Emit(const Json::Value& machine, const Table& table) const {
-    if (json) {
-        std::cout << QIRA::FILEINDEX::toString(machine) << "\n";
-        return;
-    }
+void Output::EmitEnvelope(bool ok, const Json::Value& result, const std::string& message,
+                          const std::vector<std::string>& saved) const {
+    const auto code = QIRA::FILEINDEX::ErrorHandler::GetError();
+    Json::Value envelope(Json::objectValue);
+    envelope["ok"] = ok;
+    envelope["result"] = result;
+    envelope["error"]["name"] = Describe(code).name;
+    envelope["error"]["number"] = static_cast<int>(code);
+    envelope["message"] = message;
+    envelope["log"] = Strings(CapturedLog());
+    envelope["saved"] = Strings(saved);
+    std::cout << QIRA::FILEINDEX::toString(envelope) << "\n";
+}
+
+void Output::Emit(const Json::Value& result, const Table& table) const {
+    if (json) return EmitEnvelope(true, result, "", {});
     std::vector<size_t> widths;
     for (const auto& row : table) {
         widths.resize(std::max(widths.size(), row.size()), 0);
@@ -64,25 +82,29 @@ void Output::Emit(const Json::Value& machine, const Table& table) const {
     }
 }
 
-void Output::Emit(const Json::Value& machine, const std::string& text) const {
-    if (json) {
-        std::cout << QIRA::FILEINDEX::toString(machine) << "\n";
-    } else {
-        std::cout << text << "\n";
-    }
+void Output::Emit(const Json::Value& result, const std::string& text) const {
+    if (json) return EmitEnvelope(true, result, "", {});
+    std::cout << text << "\n";
 }
 
-int Fail(const std::string& operation) {
+int Output::Fail(const std::string& operation, const std::vector<std::string>& saved) const {
     const auto code = QIRA::FILEINDEX::ErrorHandler::GetError();
     const ErrorText text = Describe(code);
-    std::cerr << "fileindexctl: " << operation << " failed: " << text.name << " (" << static_cast<int>(code)
-              << "): " << text.explanation << "\n";
+    const std::string message = operation + " failed: " + text.name + " (" + std::to_string(static_cast<int>(code)) +
+                                "): " + text.explanation;
+    if (json) {
+        EmitEnvelope(false, Json::Value(), message, saved);
+        return kExitFailure;
+    }
+    std::cerr << "fileindexctl: " << message << "\n";
+    if (!quiet) {
+        for (const auto& line : CapturedLog()) std::cerr << "fileindexctl: log: " << line << "\n";
+    }
+    for (const auto& file : saved) {
+        std::cerr << "fileindexctl: " << file << " was already saved with the change; the steps after it did "
+                     "not all succeed\n";
+    }
     return kExitFailure;
-}
-
-int Answer(const Output& out, bool yes) {
-    out.Emit(Json::Value(yes), yes ? "yes" : "no");
-    return yes ? 0 : 1;
 }
 
 std::string FormatLocalTime(long long epochSeconds) {
@@ -91,6 +113,15 @@ std::string FormatLocalTime(long long epochSeconds) {
     if (localtime_r(&when, &local) == nullptr) return std::to_string(epochSeconds);
     char buffer[64];
     strftime(buffer, sizeof buffer, "%Y-%m-%d %H:%M:%S %Z", &local);
+    return buffer;
+}
+
+std::string FormatUtc(long long epochSeconds) {
+    const time_t when = static_cast<time_t>(epochSeconds);
+    struct tm utc;
+    if (gmtime_r(&when, &utc) == nullptr) return std::to_string(epochSeconds);
+    char buffer[64];
+    strftime(buffer, sizeof buffer, "%Y-%m-%dT%H:%M:%SZ", &utc);
     return buffer;
 }
 

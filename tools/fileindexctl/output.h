@@ -1,4 +1,10 @@
 // How fileindexctl prints results and failures.
+//
+// With --json every command prints one object on stdout, of the same shape for success and
+// failure: {"ok", "result", "error": {"name", "number"}, "message", "log", "saved"}. Without it a
+// result is a table or a line on stdout and a failure is told on stderr: the error code, the
+// library's log lines of the operation (unless -q) and the configuration files it had already
+// saved when it failed.
 #pragma once
 
 #include <string>
@@ -10,25 +16,26 @@ namespace fileindexctl {
 
 using Table = std::vector<std::vector<std::string>>;
 
+constexpr int kExitFailure = 1;
+constexpr int kExitUsage = 2;
+constexpr int kExitUnknown = 2;  // a question whose answer could not be worked out
+
 class Output {
 public:
     bool json = false;
+    bool quiet = false;
 
-    // Prints `machine` as JSON with --json, otherwise the table with aligned columns.
-    void Emit(const Json::Value& machine, const Table& table) const;
-    // Prints `machine` as JSON with --json, otherwise the text.
-    void Emit(const Json::Value& machine, const std::string& text) const;
+    void Emit(const Json::Value& result, const Table& table) const;
+    void Emit(const Json::Value& result, const std::string& text) const;
+    // Tells the failure of `operation`; returns the exit status.
+    int Fail(const std::string& operation, const std::vector<std::string>& saved) const;
+
+private:
+    void EmitEnvelope(bool ok, const Json::Value& result, const std::string& message,
+                      const std::vector<std::string>& saved) const;
 };
 
-// One line on stderr naming the library's error code; returns the failure exit status.
-int Fail(const std::string& operation);
-
-// Exit status of a yes/no question (0 yes, 1 no), printing the answer too.
-int Answer(const Output& out, bool yes);
-
-constexpr int kExitFailure = 1;
-constexpr int kExitUsage = 2;
-
 std::string FormatLocalTime(long long epochSeconds);
+std::string FormatUtc(long long epochSeconds);
 
 }  // namespace fileindexctl

@@ -1,17 +1,37 @@
 // is share-indexed | path-indexed | full-path-indexed | contains-indexed | indexable | skip | room:
 // answered by the exit status (0 yes, 1 no).
 #include "commands.h"
+#include "captured_log.h"
 #include "fileindex/fileindex.h"
 
 namespace fileindexctl {
 namespace {
 
+// A "no" with an error code left (folder.conf unreadable, an unknown share) is no answer; for a
+// question whose only log line is a failed share look-up, a log line is none either.
 void AddQuestion(CLI::App& is, Context& ctx, const char* verb, const char* help, const char* argName,
-                 bool (*question)(const std::string&)) {
+                 bool (*question)(const std::string&), bool logMeansUnknown = false) {
     auto argument = std::make_shared<std::string>();
     auto* cmd = is.add_subcommand(verb, help);
     cmd->add_option(argName, *argument)->required();
-    cmd->callback([&ctx, argument, question] { ctx.status = Answer(ctx.out, question(*argument)); });
+    cmd->callback([&ctx, argument, question, verb, logMeansUnknown] {
+        bool yes = false;
+        ctx.Attempt([&] {
+            yes = question(*argument);
+            return true;
+        });
+        const bool unknown = !yes && (QIRA::FILEINDEX::ErrorHandler::GetError() != QIRA::FILEINDEX::FILEINDEX_ERR_NONE ||
+                                      (logMeansUnknown && !CapturedLog().empty()));
+        if (unknown) {
+            ctx.Fail(std::string("is ") + verb);
+            ctx.status = kExitUnknown;
+            return;
+        }
+        Json::Value result(Json::objectValue);
+        result["answer"] = yes;
+        ctx.out.Emit(result, yes ? "yes" : "no");
+        ctx.status = yes ? 0 : 1;
+    });
 }
 
 bool IsPathIndexed(const std::string& path) { return QIRA::FILEINDEX::IndexMgr::IsPathIndexed(path); }
@@ -22,7 +42,8 @@ bool IsFullPathIndexed(const std::string& path) { return QIRA::FILEINDEX::IndexM
 
 void AddQuestionCommands(CLI::App& app, Context& ctx) {
     using namespace QIRA::FILEINDEX;
-    auto* is = app.add_subcommand("is", "Questions for scripts: exit status 0 = yes, 1 = no");
+    auto* is = app.add_subcommand("is", "Questions for scripts: exit status 0 = yes, 1 = no, 2 = no answer "
+                                        "(folder.conf unreadable, unknown share)");
     is->require_subcommand(1);
     AddQuestion(*is, ctx, "share-indexed", "Does the share hold an indexed folder?", "share", &IndexMgr::IsShareIndexed);
     AddQuestion(*is, ctx, "path-indexed", "Is the share path in an indexed folder?", "path", &IsPathIndexed);
@@ -31,7 +52,7 @@ void AddQuestionCommands(CLI::App& app, Context& ctx) {
                 &IsPathContainIndexed);
     AddQuestion(*is, ctx, "indexable", "Can the share path be indexed?", "path", &CanPathBeIndexed);
     AddQuestion(*is, ctx, "skipped", "Should the full path be left out of the index?", "full_path", &IsSkipIndex);
-    AddQuestion(*is, ctx, "roomy", "Does the share have room for its index?", "share", &IsShareSpaceEnough);
+    AddQuestion(*is, ctx, "roomy", "Does the share have room for its index?", "share", &IsShareSpaceEnough, true);
 }
 
 }  // namespace fileindexctl

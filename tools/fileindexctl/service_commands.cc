@@ -37,20 +37,30 @@ std::string Join(const Json::Value& items) {
     return text.empty() ? "-" : text;
 }
 
+// The pause state for machines: whether paused, the resume time in epoch seconds (0 = until
+// resumed, -1 = running) and the same time in ISO-8601 UTC when there is one.
+Json::Value PauseState(long long resumeTime) {
+    Json::Value pause(Json::objectValue);
+    pause["paused"] = resumeTime == 0 || (resumeTime > 0 && time(nullptr) < resumeTime);
+    pause["resume_time"] = static_cast<Json::Int64>(resumeTime);
+    pause["resume_time_utc"] = resumeTime > 0 ? Json::Value(FormatUtc(resumeTime)) : Json::Value();
+    return pause;
+}
+
 int Status(Context& ctx) {
     std::string word;
     long long resumeTime = -1;
-    if (!StatusMgr::GetStatus(word)) return Fail("service status");
-    if (!StatusMgr::GetPauseInfo(resumeTime)) return Fail("service status");
+    if (!ctx.Attempt([&] { return StatusMgr::GetStatus(word) && StatusMgr::GetPauseInfo(resumeTime); })) {
+        return ctx.Fail("service status");
+    }
     Json::Value out(Json::objectValue);
     out["status"] = word;
-    out["resume_time"] = static_cast<Json::Int64>(resumeTime);
-    out["pause"] = PauseText(resumeTime);
+    out["pause"] = PauseState(resumeTime);
     out["no_space"] = Json::Value(Json::arrayValue);
     out["need_reindex"] = Json::Value(Json::arrayValue);
     ShareFlags(out["no_space"], out["need_reindex"]);
     ctx.out.Emit(out, Table{{"status", word},
-                            {"pause", out["pause"].asString()},
+                            {"pause", PauseText(resumeTime)},
                             {"out of space", Join(out["no_space"])},
                             {"need reindex", Join(out["need_reindex"])}});
     return 0;
@@ -70,30 +80,32 @@ void AddServiceCommands(CLI::App& app, Context& ctx) {
     pause->add_option("--hours", *hours, "Hours to pause (0 = until resumed)")->check(PauseHours);
     pause->callback([&ctx, hours] {
         if (!ctx.Attempt([&] { return StatusMgr::Pause(*hours); })) {
-            ctx.status = Fail("service pause");
+            ctx.status = ctx.Fail("service pause");
             return;
         }
         long long resumeTime = -1;
         StatusMgr::GetPauseInfo(resumeTime);
         Json::Value out(Json::objectValue);
-        out["resume_time"] = static_cast<Json::Int64>(resumeTime);
+        out["pause"] = PauseState(resumeTime);
         ctx.out.Emit(out, PauseText(resumeTime));
     });
     service->add_subcommand("resume", "Resume indexing")->callback([&ctx] {
         if (!ctx.Attempt([] { return StatusMgr::Resume(); })) {
-            ctx.status = Fail("service resume");
+            ctx.status = ctx.Fail("service resume");
             return;
         }
-        ctx.out.Emit(Json::Value("running"), "running");
+        Json::Value out(Json::objectValue);
+        out["pause"] = PauseState(-1);
+        ctx.out.Emit(out, "running");
     });
 
     app.add_subcommand("migrate", "Bring a system upgraded from the older release into the running state")
         ->callback([&ctx] {
             if (!ctx.Attempt([] { return QIRA::FILEINDEX::Updater_lum60_beta2(); })) {
-                ctx.status = Fail("migrate");
+                ctx.status = ctx.Fail("migrate");
                 return;
             }
-            ctx.out.Emit(Json::Value(true), "ok");
+            ctx.out.Emit(Json::Value(Json::objectValue), "ok");
         });
 }
 

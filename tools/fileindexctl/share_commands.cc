@@ -14,10 +14,12 @@ void AddShareAction(CLI::App& share, Context& ctx, const char* verb, const char*
     cmd->add_option("share", *name, "Share name")->required()->check(ShareName);
     cmd->callback([&ctx, name, verb, action] {
         if (!ctx.Attempt([&] { return action(*name); })) {
-            ctx.status = Fail(std::string("share ") + verb);
+            ctx.status = ctx.Fail(std::string("share ") + verb);
             return;
         }
-        ctx.out.Emit(Json::Value(*name), "ok");
+        Json::Value result(Json::objectValue);
+        result["share"] = *name;
+        ctx.out.Emit(result, "ok");
     });
 }
 
@@ -30,18 +32,24 @@ void AddFlagCommand(CLI::App& share, Context& ctx, const char* verb, const char*
     cmd->add_option("state", *state, "on or off")->required()->check(CLI::IsMember({"on", "off"}));
     cmd->callback([&ctx, name, state, verb, set] {
         if (!ctx.Attempt([&] { return set(*name, *state == "on"); })) {
-            ctx.status = Fail(std::string("share ") + verb);
+            ctx.status = ctx.Fail(std::string("share ") + verb);
             return;
         }
-        ctx.out.Emit(Json::Value(*state == "on"), "ok");
+        Json::Value result(Json::objectValue);
+        result["share"] = *name;
+        result[std::string(verb) == "no-space" ? "no_space" : "need_reindex"] = *state == "on";
+        ctx.out.Emit(result, "ok");
     });
 }
 
 int Paths(Context& ctx, const std::string& share) {
     char db[4096];
     char queue[4096];
-    if (FILEIDXDBPathGet(share.c_str(), db, sizeof db) < 0 || FILEIDXQueuePathGet(share.c_str(), queue, sizeof queue) < 0) {
-        return Fail("share paths");
+    if (!ctx.Attempt([&] {
+            return FILEIDXDBPathGet(share.c_str(), db, sizeof db) >= 0 &&
+                   FILEIDXQueuePathGet(share.c_str(), queue, sizeof queue) >= 0;
+        })) {
+        return ctx.Fail("share paths");
     }
     Json::Value out(Json::objectValue);
     out["database"] = db;
@@ -71,10 +79,13 @@ void AddShareCommands(CLI::App& app, Context& ctx) {
     rename->add_option("new", *newName, "New share name")->required()->check(ShareName);
     rename->callback([&ctx, oldName, newName] {
         if (!ctx.Attempt([&] { return IndexMgr::ShareRename(*oldName, *newName); })) {
-            ctx.status = Fail("share rename");
+            ctx.status = ctx.Fail("share rename");
             return;
         }
-        ctx.out.Emit(Json::Value(*newName), "ok");
+        Json::Value result(Json::objectValue);
+        result["share"] = *oldName;
+        result["renamed_to"] = *newName;
+        ctx.out.Emit(result, "ok");
     });
 
     auto name = std::make_shared<std::string>();

@@ -17,6 +17,7 @@
 
 #include <CLI/CLI.hpp>
 
+#include "cli.h"
 #include "fileindex/fileindex.h"
 #include "queue_drain.h"
 
@@ -132,11 +133,12 @@ private:
 
 int main(int argc, char** argv) {
     CLI::App app{"Reference stand-in for the indexing daemon (not the production daemon)", "fileindexd-ref"};
+    app.set_version_flag("--version", "fileindexd-ref " FILEINDEX_VERSION);
     std::string root;
     int intervalMs = 200;
     app.add_option("--root", root, "Root prefix of the appliance (instead of QIRA_ROOT)");
     app.add_option("--interval", intervalMs, "Milliseconds between passes over the queues")->check(CLI::Range(1, 60000));
-    CLI11_PARSE(app, argc, argv);
+    if (const auto ended = tools::Parse(app, argc, argv)) return *ended;
     if (!root.empty()) setenv("QIRA_ROOT", root.c_str(), 1);
     signal(SIGTERM, OnTerm);
     signal(SIGINT, OnTerm);

@@ -5,6 +5,7 @@
 #include <CLI/CLI.hpp>
 
 #include "fileindex/json.h"
+#include "cli.h"
 #include "qira_sim/appliance.h"
 
 namespace {
@@ -98,6 +99,7 @@ void AddInspectCommands(CLI::App& app) {
 int main(int argc, char** argv) {
     CLI::App app{"Set up and inspect a simulated appliance", "qira-sim"};
     app.require_subcommand(1);
+    app.set_version_flag("--version", "qira-sim " FILEINDEX_VERSION);
     std::string root;
     app.add_option("--root", root, "Root of the simulated appliance (instead of QIRA_ROOT)");
     app.parse_complete_callback([&root] {
@@ -111,6 +113,5 @@ int main(int argc, char** argv) {
     AddShareCommands(app);
     AddFaultCommands(app);
     AddInspectCommands(app);
-    CLI11_PARSE(app, argc, argv);
-    return 0;
+    return tools::Parse(app, argc, argv).value_or(0);
 }
