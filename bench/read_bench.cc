@@ -3,6 +3,7 @@
 #include <memory>
 
 #include "fileindex/fileindex.h"
+#include "queue_count.h"
 #include "scratch_appliance.h"
 
 namespace {
@@ -24,6 +25,18 @@ void BM_GetFolderStatus_1MRecords(benchmark::State& state) {
                               [] { benchmark::DoNotOptimize(StatusMgr::GetFolderStatus("/music/busy")); });
 }
 BENCHMARK(BM_GetFolderStatus_1MRecords)->UseManualTime()->Unit(benchmark::kMillisecond)->Iterations(5);
+
+// The progress report's count of a share's pending records: lines, without parsing.
+void BM_ProgressCount_1MRecords(benchmark::State& state) {
+    ScratchAppliance app;
+    app.AddShare("music");
+    app.WriteQueue("music", bench::Scaled(130u << 20), 100);
+    const std::vector<std::string> files = {app.QueueOf("music")};
+    const double plain = bench::MedianSeconds(5, kNothing, [&] { benchmark::DoNotOptimize(bench::CountLinesPlain(files)); });
+    bench::RunAgainstBaseline(state, plain, kNothing,
+                              [&] { benchmark::DoNotOptimize(detail::CountLines(app.QueueOf("music"))); });
+}
+BENCHMARK(BM_ProgressCount_1MRecords)->UseManualTime()->Unit(benchmark::kMillisecond)->Iterations(5);
 
 // 1000 folders in 10 shares, each share's queue 10 MB; a page of 50 with status and validity.
 void BM_ListingPage50_TenBusyQueues(benchmark::State& state) {

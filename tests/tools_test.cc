@@ -266,6 +266,30 @@ TEST_F(DaemonStandInTest, FolderIsProcessingUntilTheDaemonDrainsIt) {
     EXPECT_NE(testkit::ReadFile(log_).find("event 131072 " + music_ + "/a: documents=0 audio=1"), std::string::npos);
 }
 
+// progress --watch shows the backlog shrink as the daemon drains it; wait returns once it is done.
+TEST_F(DaemonStandInTest, ProgressFollowsTheDrainAndWaitSeesTheEnd) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
+    StartDaemon();
+    ASSERT_TRUE(StatusMgr::Pause(0));
+    ASSERT_TRUE(IndexMgr::Reindex(J(R"(["/music/a", "/music/a/b"])")));
+    const std::string samples = Path("/samples.log");
+    const pid_t watch = testkit::Start({FILEINDEXCTL, "progress", "--watch", "--interval", "0.05"}, samples);
+    const auto backlogs = [&] {
+        std::vector<unsigned> seen;
+        std::istringstream in(testkit::ReadFile(samples));
+        for (std::string line; std::getline(in, line);) {
+            seen.push_back(testkit::ParseJson(line)["shares"][0]["pending"].asUInt());
+        }
+        return seen;
+    };
+    ASSERT_TRUE(testkit::WaitFor([&] { return !backlogs().empty(); }));
+    EXPECT_EQ(backlogs().front(), 2u);
+    ASSERT_TRUE(StatusMgr::Resume());
+    ASSERT_TRUE(testkit::WaitFor([&] { return backlogs().back() == 0; }));
+    testkit::Stop(watch);
+    EXPECT_EQ(testkit::Run({FILEINDEXCTL, "wait", "--timeout", "10"}).status, 0);
+}
+
 TEST_F(DaemonStandInTest, PauseHoldsWorkBack) {
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
     StartDaemon();

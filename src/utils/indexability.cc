@@ -7,6 +7,7 @@
 #include "fileindex/utils.h"
 #include "log.h"
 #include "folder_fields.h"
+#include "indexability_rules.h"
 #include "path_rules.h"
 #include "qira/qira_fs.h"
 #include "qira/qira_quota.h"
@@ -19,7 +20,6 @@ namespace {
 
 const std::vector<std::string> kSystemPreservedNames = {".TemporaryItems", "QIRA@.fileindexdb",
                                                         "QIRA@file_index_queue", ".QIRAPPSDB", ".DS_Store"};
-const std::vector<std::string> kSkippedShareNames = {"surveillance", "NetBackup"};
 
 constexpr int kNeverIndexedFsType = 12;
 constexpr unsigned long long kIndexSpaceNeeded = 10485760ULL;
@@ -52,17 +52,6 @@ bool IsListed(const std::vector<std::string>& names, const std::string& name) {
     return false;
 }
 
-// A mount point may be indexed only in a share that uses encryption.
-bool IsForbiddenMountPoint(const std::string& fullPath, QIRASHARE* share) {
-    int isEncryption = 0;
-    return QIRAFSDirIsMntPoint(fullPath.c_str()) == 1 && QLIBShareIsEncryptionGet(share, &isEncryption) == 0 &&
-           isEncryption == 0;
-}
-
-bool IsCanonical(const std::string& fullPath) {
-    char resolved[4096];
-    return realpath(fullPath.c_str(), resolved) != nullptr && fullPath == resolved;
-}
 
 }  // namespace
 
@@ -81,14 +70,7 @@ bool IsSkipIndex(const std::string& fullPath) {
     return IsUnindexableFsType(type);
 }
 
-bool CanShareBeIndexed(_tag_QIRASHARE* share) {
-    if (share == nullptr || IsListed(kSkippedShareNames, share->szName)) return false;
-    int encrypted = 0;
-    int readOnly = 0;
-    if (QLIBShareIsEncryptedGet(share, &encrypted) < 0) return false;
-    if (QLIBShareIsReadOnlyGet(share, &readOnly) < 0 || encrypted != 0) return false;
-    return readOnly == 0;
-}
+bool CanShareBeIndexed(_tag_QIRASHARE* share) { return detail::EvaluateShare(share, nullptr); }
 
 bool CanPathBeIndexed(const std::string& path) {
     if (!detail::NulFree(path)) return false;
@@ -102,32 +84,7 @@ bool CanPathBeIndexed(const std::string& path) {
 }
 
 bool CanFullPathBeIndexed(const std::string& fullPath) {
-    if (!detail::NulFree(fullPath)) return false;
-    if (InRecycleBin(fullPath) || InSnapshot(fullPath)) return false;
-    const int type = QIRAGetFSType(fullPath.c_str(), 0);
-    if (type == -1 || IsUnindexableFsType(type)) return false;
-    std::string shareName;
-    std::string sharePath;
-    if (!GetShareNamePathByFullPath(shareName, sharePath, fullPath)) {
-        FILEIDX_LOG("GetShareNamePathByFullPath failed, path=%s", fullPath.c_str());
-        return false;
-    }
-    QIRASHARE* raw = nullptr;
-    if (QIRAShareGet(shareName.c_str(), &raw) < 0) {
-        FILEIDX_LOG("QIRAShareGet failed, share=%s", shareName.c_str());
-        return false;
-    }
-    const SharePtr share(raw);
-    if (!CanShareBeIndexed(share.get())) return false;
-    if (IsForbiddenMountPoint(fullPath, share.get())) {
-        FILEIDX_LOG("Mount point[%s] is not allowed to be indexed", fullPath.c_str());
-        return false;
-    }
-    if (!IsCanonical(fullPath)) {
-        FILEIDX_LOG("check realpath failed, path=%s", fullPath.c_str());
-        return false;
-    }
-    return true;
+    return detail::NulFree(fullPath) && detail::EvaluateFullPath(fullPath, nullptr);
 }
 
 bool IsShareSpaceEnough(const std::string& shareName) {

@@ -9,7 +9,7 @@ _fileindexctl() {
         *" service "*) words="status pause resume" ;;
         *" share "*) words="remove rename pause resume clean revive no-space need-reindex paths" ;;
         *" is "*) words="share-indexed path-indexed full-path-indexed contains-indexed indexable skipped roomy" ;;
-        *) words="folder service share is reindex migrate" ;;
+        *) words="folder service share is reindex migrate explain progress wait" ;;
     esac
     mapfile -t COMPREPLY < <(compgen -W "$words $options" -- "$cur")
 }

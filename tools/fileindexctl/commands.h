@@ -31,5 +31,6 @@ void AddFolderCommands(CLI::App& app, Context& ctx);
 void AddServiceCommands(CLI::App& app, Context& ctx);
 void AddShareCommands(CLI::App& app, Context& ctx);
 void AddQuestionCommands(CLI::App& app, Context& ctx);
+void AddInsightCommands(CLI::App& app, Context& ctx);
 
 }  // namespace fileindexctl

@@ -39,6 +39,7 @@ int main(int argc, char** argv) {
     fileindexctl::AddServiceCommands(app, ctx);
     fileindexctl::AddShareCommands(app, ctx);
     fileindexctl::AddQuestionCommands(app, ctx);
+    fileindexctl::AddInsightCommands(app, ctx);
     if (const auto ended = tools::Parse(app, argc, argv)) return *ended;
     return ctx.status;
 }

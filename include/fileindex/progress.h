@@ -1,0 +1,22 @@
+// How far indexing has got. An addition to the specified interface.
+#pragma once
+
+#include <json/value.h>
+
+#include "fileindex/export.h"
+
+namespace QIRA {
+namespace FILEINDEX {
+
+// Fills `out` with {"pause": {"paused", "resume_time"}, "shares": [...]}: one entry per share
+// holding indexed folders, in name order, with "share", "queue" and "companion" (the lines
+// pending in its queue file and in the ".tmp" companion, counted without parsing; a malformed
+// line is work for the daemon too), "pending" (their sum) and "folders" (per indexed folder of
+// the share: "path" and "pending", the well-formed records whose path, or old path for event 256,
+// is the folder or beneath it, as the folder status counts them). Takes no lock and logs no
+// malformed line. False, with the error code of the load, when folder.conf or status.conf
+// cannot be read.
+FILEINDEX_EXPORT bool GetProgress(Json::Value& out);
+
+}  // namespace FILEINDEX
+}  // namespace QIRA

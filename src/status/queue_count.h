@@ -1,0 +1,22 @@
+// Counting what a share's queue holds, for the explanation and the progress report.
+#pragma once
+
+#include <map>
+#include <string>
+#include <vector>
+
+namespace QIRA {
+namespace FILEINDEX {
+namespace detail {
+
+// Lines in the file (a last line without "\n" counts); 0 when it is missing or not a regular file.
+unsigned long long CountLines(const std::string& file);
+
+// Per folder prefix ("<full path>/"), the well-formed records of the file whose path (or old
+// path, for event 256) lies in it. Malformed lines are skipped without a log line.
+std::map<std::string, unsigned long long> CountRecordsUnder(const std::string& file,
+                                                            const std::vector<std::string>& prefixes);
+
+}  // namespace detail
+}  // namespace FILEINDEX
+}  // namespace QIRA

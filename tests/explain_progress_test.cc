@@ -1,0 +1,147 @@
+// Why a path is or is not indexed, how far indexing has got, and the commands over both.
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <functional>
+#include <sstream>
+
+#include "fileindex/fileindex.h"
+#include "index_fixture.h"
+#include "process.h"
+
+using namespace QIRA::FILEINDEX;
+using testkit::J;
+
+namespace {
+
+class ExplainTest : public testkit::IndexFixture {
+protected:
+    Json::Value Explain(const std::string& path) {
+        Json::Value out;
+        EXPECT_TRUE(ExplainPath(path, out));
+        return out;
+    }
+};
+
+// One table drives both: the explanation's verdict is CanPathBeIndexed's, and it names the rule.
+TEST_F(ExplainTest, NamesTheRefusingRuleAndAgreesWithCanPathBeIndexed) {
+    struct Case {
+        std::string path;
+        std::function<void()> setUp;
+        Json::Value refusedBy;
+    };
+    const auto share = [this](const std::string& name, const char* props) {
+        return [this, name, props] { MakeDir(AddShare(name, J(props)) + "/d"); };
+    };
+    const std::vector<Case> cases = {
+        {"/music/a", [] {}, Json::Value()},
+        {"/music/#recycle/x", [this] { MakeDir(music_ + "/#recycle/x"); }, "recycle_bin"},
+        {"/music/#snapshot/x", [this] { MakeDir(music_ + "/#snapshot/x"); }, "snapshot"},
+        {"/unknownfs/d", share("unknownfs", R"({"fs_type": -1})"), "file_system"},
+        {"/remote/d", share("remote", R"({"fs_type": 21})"), "file_system"},
+        {"/image/d", share("image", R"({"fs_type": 31})"), "file_system"},
+        {"/twelve/d", share("twelve", R"({"fs_type": 12})"), "file_system"},
+        {"/nosuch/d", [] {}, "share_path"},
+        {"/surveillance/d", share("surveillance", "{}"), "skipped_share_name"},
+        {"/locked/d", share("locked", R"({"encrypted": true})"), "encrypted_share"},
+        {"/frozen/d", share("frozen", R"({"read_only": true})"), "read_only_share"},
+        {"/music/mnt", [this] {
+             MakeDir(music_ + "/mnt");
+             qira_sim::PutShare("music", music_, J("{\"mount_points\": [\"" + music_ + "/mnt\"]}"));
+         }, "mount_point"},
+        {"/music/link", [this] { ASSERT_EQ(symlink((music_ + "/a").c_str(), (music_ + "/link").c_str()), 0); },
+         "canonical_path"},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.path);
+        c.setUp();
+        const Json::Value out = Explain(c.path);
+        EXPECT_EQ(out["refused_by"], c.refusedBy);
+        EXPECT_EQ(out["indexable"].asBool(), CanPathBeIndexed(c.path));
+        EXPECT_EQ(out["rules"].size(), 11u);  // every rule, in its order
+        EXPECT_EQ(out["rules"][10]["rule"].asString(), "canonical_path");
+    }
+}
+
+TEST_F(ExplainTest, TellsTheGoverningFolderByTheLastMatchAndWhatIsPending) {
+    testkit::WriteFile(FolderConf(), R"({"/music": {"name": "all", "audio": true}, "/music/a": {"name": "a", "photo": true}})");
+    MakeDir(music_ + "/@eaDir");
+    testkit::WriteFile(QueueOf("music"), "{\"event\":1,\"path\":\"" + music_ + "/a/b/x\"}\nnot json\n{\"event\":1,\"path\":\"" +
+                                             music_ + "/ab\"}\n");
+    testkit::WriteFile(QueueOf("music") + ".tmp", "{\"event\":1,\"path\":\"" + music_ + "/a/b\"}\n");
+    const Json::Value inner = Explain("/music/a/b");
+    EXPECT_EQ(inner["governing_folder"], J(R"({"path": "/music/a", "name": "a", "document": false, "audio": false,
+                                              "video": false, "photo": true})"));
+    EXPECT_TRUE(inner["inside_indexed_folder"].asBool());
+    EXPECT_FALSE(inner["contains_indexed_folder"].asBool());
+    EXPECT_EQ(inner["pending"], J(R"({"queue": 1, "companion": 1})"));
+    EXPECT_EQ(inner["status"].asString(), "processing");
+    EXPECT_EQ(Explain("/music/c")["governing_folder"]["name"].asString(), "all");
+    EXPECT_TRUE(Explain("/music")["contains_indexed_folder"].asBool());
+    EXPECT_TRUE(Explain("/photo/a")["governing_folder"].isNull());
+}
+
+TEST_F(ExplainTest, ProgressCountsLinesPerShareAndRecordsPerFolder) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/a/b": {}, "/music/c": {}, "/photo/a": {}})");
+    MakeDir(music_ + "/@eaDir");
+    const auto record = [this](const std::string& inside, int event = 1, const std::string& old = "") {
+        return "{\"event\":" + std::to_string(event) + ",\"path\":\"" + music_ + inside + "\"" +
+               (old.empty() ? "" : ",\"path_old\":\"" + music_ + old + "\"") + "}\n";
+    };
+    testkit::WriteFile(QueueOf("music"), record("/a/x") + record("/a/b/y") + "garbage\n" + record("/ab") +
+                                             record("/elsewhere", 256, "/c/z") + record("/a", 256, "/a/q"));
+    testkit::WriteFile(QueueOf("music") + ".tmp", record("/c") + "{\"event\":1}");
+    Json::Value out;
+    ASSERT_TRUE(GetProgress(out));
+    EXPECT_EQ(out["pause"], J(R"({"paused": false, "resume_time": -1})"));
+    ASSERT_EQ(out["shares"].size(), 2u);
+    EXPECT_EQ(out["shares"][0], J(R"({"share": "music", "queue": 6, "companion": 2, "pending": 8, "folders": [
+        {"path": "/music/a", "pending": 3}, {"path": "/music/a/b", "pending": 1}, {"path": "/music/c", "pending": 2}]})"));
+    EXPECT_EQ(out["shares"][1]["pending"].asUInt(), 0u);
+    EXPECT_TRUE(testkit::LogLines().empty());  // no malformed line is logged
+}
+
+class InsightToolTest : public testkit::IndexFixture {
+protected:
+    testkit::RunResult Ctl(std::vector<std::string> args) {
+        args.insert(args.begin(), FILEINDEXCTL);
+        return testkit::Run(args);
+    }
+    void Seed() {
+        testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
+        MakeDir(music_ + "/@eaDir");
+        testkit::WriteFile(QueueOf("music"), "{\"event\":1,\"path\":\"" + music_ + "/a/x\"}\n");
+    }
+};
+
+TEST_F(InsightToolTest, WaitEndsWhenFinishedOrAtItsTimeOut) {
+    Seed();
+    ASSERT_TRUE(StatusMgr::Pause(0));
+    EXPECT_EQ(Ctl({"wait", "--timeout", "0.2"}).status, 3);  // paused with work pending
+    unlink(QueueOf("music").c_str());                        // drained
+    const auto result = Ctl({"wait", "--timeout", "5", "--json"});
+    EXPECT_EQ(result.status, 0);
+    EXPECT_EQ(testkit::ParseJson(result.out)["result"]["status"].asString(), "finished");
+}
+
+TEST_F(InsightToolTest, WatchWritesJsonLinesOffATerminalAndBarsOnOne) {
+    Seed();
+    const auto lines = Ctl({"progress", "--watch", "--samples", "2", "--interval", "0.05"});
+    ASSERT_EQ(lines.status, 0) << lines.err;
+    std::istringstream in(lines.out);
+    int samples = 0;
+    for (std::string line; std::getline(in, line); ++samples) {
+        EXPECT_EQ(testkit::ParseJson(line)["shares"][0]["pending"].asUInt(), 1u);
+    }
+    EXPECT_EQ(samples, 2);
+    const auto screen = testkit::Run({"/usr/bin/script", "-qec",
+                                      std::string(FILEINDEXCTL) + " progress --watch --samples 2 --interval 0.05",
+                                      "/dev/null"});
+    ASSERT_EQ(screen.status, 0) << screen.err;
+    EXPECT_NE(screen.out.find("\033[H\033[J"), std::string::npos);
+    EXPECT_NE(screen.out.find("music [------------------------------] 1 pending"), std::string::npos) << screen.out;
+    const auto explain = Ctl({"explain", "/nosuch/x"});
+    EXPECT_EQ(explain.out.rfind("/nosuch/x: cannot be indexed, refused by share_path\n", 0), 0u) << explain.out;
+}
+
+}  // namespace

@@ -1,0 +1,206 @@
+// explain PATH | progress [--watch] | wait: why a path is (not) indexed and how far indexing has got.
+#include <unistd.h>
+
+#include <algorithm>
+#include <chrono>
+#include <cmath>
+#include <iostream>
+#include <map>
+#include <thread>
+
+#include "commands.h"
+#include "fileindex/fileindex.h"
+
+namespace fileindexctl {
+namespace {
+
+using Clock = std::chrono::steady_clock;
+
+std::string Facts(const Json::Value& facts) {
+    std::string text;
+    if (!facts.isObject()) return text;
+    for (const auto& name : facts.getMemberNames()) {
+        const Json::Value& value = facts[name];
+        text += (text.empty() ? "" : ", ") + name + "=" +
+                (value.isString() ? value.asString() : value.isNull() ? "-" : QIRA::FILEINDEX::toString(value));
+    }
+    return text;
+}
+
+std::string YesNo(bool yes) { return yes ? "yes" : "no"; }
+
+void PrintExplanation(const Json::Value& e) {
+    std::cout << e["path"].asString() << ": "
+              << (e["indexable"].asBool() ? "can be indexed" : "cannot be indexed, refused by " + e["refused_by"].asString())
+              << "\n";
+    std::cout << "  share " << e["share"].asString() << ", full path "
+              << (e["full_path"].isNull() ? "(not resolved)" : e["full_path"].asString()) << "\n\n";
+    Table rules = {{"VERDICT", "RULE", "REFUSES", "FACTS"}};
+    const auto row = [](const Json::Value& r) {
+        return std::vector<std::string>{r["verdict"].asString(), r["rule"].asString(), r["description"].asString(),
+                                        Facts(r["facts"])};
+    };
+    for (const auto& rule : e["rules"]) {
+        if (rule["rule"] == e["refused_by"]) rules.push_back(row(rule));  // the refusing rule first
+    }
+    for (const auto& rule : e["rules"]) {
+        if (rule["rule"] != e["refused_by"]) rules.push_back(row(rule));
+    }
+    Output{}.Emit(Json::Value(), rules);
+    const Json::Value& folder = e["governing_folder"];
+    std::cout << "\ngoverning folder: ";
+    if (folder.isNull()) {
+        std::cout << "none\n";
+    } else {
+        std::cout << folder["path"].asString() << " (" << folder["name"].asString() << "; document "
+                  << YesNo(folder["document"].asBool()) << ", audio " << YesNo(folder["audio"].asBool()) << ", video "
+                  << YesNo(folder["video"].asBool()) << ", photo " << YesNo(folder["photo"].asBool()) << ")\n";
+    }
+    std::cout << "inside an indexed folder: " << YesNo(e["inside_indexed_folder"].asBool())
+              << "; contains one: " << YesNo(e["contains_indexed_folder"].asBool()) << "\n"
+              << "share flags: out of space " << YesNo(e["share_flags"]["no_space"].asBool()) << ", need reindex "
+              << YesNo(e["share_flags"]["need_reindex"].asBool()) << "\n"
+              << "status: " << e["status"].asString() << "; pending for the path: " << e["pending"]["queue"].asUInt64()
+              << " in the queue, " << e["pending"]["companion"].asUInt64() << " in its companion\n";
+}
+
+// Adds to `now` the drain rate (records per second) and the estimated seconds left of every share
+// and folder, from the previous sample taken `seconds` before.
+void AddRates(Json::Value& now, const Json::Value& before, double seconds) {
+    std::map<std::string, unsigned long long> previous;
+    for (const auto& share : before["shares"]) {
+        previous[share["share"].asString()] = share["pending"].asUInt64();
+        for (const auto& folder : share["folders"]) previous[folder["path"].asString()] = folder["pending"].asUInt64();
+    }
+    const auto rate = [&](Json::Value& entry, const std::string& key) {
+        const double pending = static_cast<double>(entry["pending"].asUInt64());
+        const auto found = previous.find(key);
+        const double drained = found == previous.end() ? 0 : static_cast<double>(found->second) - pending;
+        const double perSecond = seconds > 0 && drained > 0 ? drained / seconds : 0;
+        entry["rate"] = std::round(perSecond * 10) / 10;
+        entry["eta_seconds"] = pending == 0 ? Json::Value(0) : perSecond > 0 ? Json::Value(std::ceil(pending / perSecond)) : Json::Value();
+    };
+    for (auto& share : now["shares"]) {
+        rate(share, share["share"].asString());
+        for (auto& folder : share["folders"]) rate(folder, folder["path"].asString());
+    }
+}
+
+std::string Eta(const Json::Value& eta) { return eta.isNull() ? "-" : std::to_string(eta.asLargestInt()) + "s"; }
+
+Table ProgressTable(const Json::Value& sample) {
+    Table table = {{"SHARE / FOLDER", "PENDING", "RATE/S", "LEFT"}};
+    for (const auto& share : sample["shares"]) {
+        table.push_back({share["share"].asString(), std::to_string(share["pending"].asUInt64()),
+                         QIRA::FILEINDEX::toString(share["rate"]), Eta(share["eta_seconds"])});
+        for (const auto& folder : share["folders"]) {
+            table.push_back({"  " + folder["path"].asString(), std::to_string(folder["pending"].asUInt64()),
+                             QIRA::FILEINDEX::toString(folder["rate"]), Eta(folder["eta_seconds"])});
+        }
+    }
+    return table;
+}
+
+// One screen of the watch: a bar per share against the largest backlog seen since the start.
+void DrawScreen(const Json::Value& sample, std::map<std::string, unsigned long long>& largest) {
+    std::cout << "\033[H\033[J" << (sample["pause"]["paused"].asBool() ? "indexing paused\n\n" : "indexing\n\n");
+    for (const auto& share : sample["shares"]) {
+        const std::string name = share["share"].asString();
+        const unsigned long long pending = share["pending"].asUInt64();
+        largest[name] = std::max(largest[name], pending);
+        const int width = 30;
+        const int done = largest[name] == 0 ? width : static_cast<int>(width * (largest[name] - pending) / largest[name]);
+        std::cout << name << " [" << std::string(done, '#') << std::string(width - done, '-') << "] " << pending
+                  << " pending, " << QIRA::FILEINDEX::toString(share["rate"]) << "/s, left " << Eta(share["eta_seconds"])
+                  << "\n";
+    }
+    std::cout.flush();
+}
+
+int Progress(Context& ctx, bool watch, double interval, int samples) {
+    Json::Value before, now;
+    if (!ctx.Attempt([&] { return QIRA::FILEINDEX::GetProgress(before); })) return ctx.Fail("progress");
+    auto taken = Clock::now();
+    const bool screen = watch && !ctx.out.json && isatty(STDOUT_FILENO);
+    std::map<std::string, unsigned long long> largest;
+    for (int sample = 1; samples == 0 || sample <= samples; ++sample) {
+        std::this_thread::sleep_for(std::chrono::duration<double>(interval));
+        if (!ctx.Attempt([&] { return QIRA::FILEINDEX::GetProgress(now); })) return ctx.Fail("progress");
+        const auto at = Clock::now();
+        AddRates(now, before, std::chrono::duration<double>(at - taken).count());
+        if (!watch) {
+            ctx.out.Emit(now, ProgressTable(now));
+            return 0;
+        }
+        if (screen) {
+            DrawScreen(now, largest);
+        } else {
+            std::cout << QIRA::FILEINDEX::toString(now) << std::endl;  // one JSON line per sample
+        }
+        before = now;
+        taken = at;
+    }
+    return 0;
+}
+
+// 0 once the service word is "finished", 3 when the time runs out first.
+int Wait(Context& ctx, double timeout) {
+    const auto deadline = Clock::now() + std::chrono::duration<double>(timeout);
+    while (true) {
+        std::string word;
+        if (!ctx.Attempt([&] { return QIRA::FILEINDEX::StatusMgr::GetStatus(word); })) {
+            ctx.Fail("wait");
+            return kExitUnknown;
+        }
+        if (word == "finished") {
+            Json::Value result(Json::objectValue);
+            result["status"] = word;
+            ctx.out.Emit(result, word);
+            return 0;
+        }
+        if (Clock::now() >= deadline) {
+            Json::Value result(Json::objectValue);
+            result["status"] = word;
+            ctx.out.Emit(result, "still " + word + " after " + std::to_string(static_cast<long>(timeout)) + "s");
+            return 3;
+        }
+        std::this_thread::sleep_for(std::chrono::milliseconds(100));
+    }
+}
+
+}  // namespace
+
+void AddInsightCommands(CLI::App& app, Context& ctx) {
+    auto path = std::make_shared<std::string>();
+    auto* explain = app.add_subcommand("explain", "Why a share path is or is not indexed, rule by rule");
+    explain->add_option("path", *path, "Share path, e.g. /music/live")->required();
+    explain->callback([&ctx, path] {
+        Json::Value out;
+        if (!ctx.Attempt([&] { return QIRA::FILEINDEX::ExplainPath(*path, out); })) {
+            ctx.status = ctx.Fail("explain");
+            return;
+        }
+        if (ctx.out.json) {
+            ctx.out.Emit(out, "");
+        } else {
+            PrintExplanation(out);
+        }
+    });
+
+    auto watch = std::make_shared<bool>(false);
+    auto interval = std::make_shared<double>(1.0);
+    auto samples = std::make_shared<int>(0);
+    auto* progress = app.add_subcommand("progress", "Pending records per share and folder, drain rate and time left");
+    progress->add_flag("--watch", *watch, "Refresh until interrupted (a JSON line per sample when not on a terminal)");
+    progress->add_option("--interval", *interval, "Seconds between samples")->check(CLI::Range(0.05, 3600.0));
+    progress->add_option("--samples", *samples, "With --watch: stop after this many samples (0 = never)")
+        ->check(CLI::NonNegativeNumber);
+    progress->callback([&ctx, watch, interval, samples] { ctx.status = Progress(ctx, *watch, *interval, *samples); });
+
+    auto timeout = std::make_shared<double>(600);
+    auto* wait = app.add_subcommand("wait", "Wait until indexing is finished: exit 0, 3 on time-out, 2 on errors");
+    wait->add_option("--timeout", *timeout, "Seconds to wait")->check(CLI::NonNegativeNumber);
+    wait->callback([&ctx, timeout] { ctx.status = Wait(ctx, *timeout); });
+}
+
+}  // namespace fileindexctl
