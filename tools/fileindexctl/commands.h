@@ -24,7 +24,7 @@ struct Context {
     int Fail(const std::string& operation) const;
 
 private:
-    std::optional<SavedFiles> before_;
+    std::optional<tools::SavedFiles> before_;
 };
 
 void AddFolderCommands(CLI::App& app, Context& ctx);

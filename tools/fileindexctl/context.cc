@@ -7,7 +7,7 @@ namespace fileindexctl {
 bool Context::Attempt(const std::function<bool()>& operation) {
     before_.emplace();
     return RetryWhileLocked(lockWait, [&] {
-        ClearCapturedLog();
+        tools::ClearCapturedLog();
         return operation();
     });
 }

@@ -5,64 +5,15 @@
 #include <iostream>
 
 #include "captured_log.h"
+#include "envelope.h"
 #include "fileindex/error.h"
 #include "fileindex/json.h"
 
 namespace fileindexctl {
-namespace {
-
-using QIRA::FILEINDEX::_tag_fileindex_err_;
-
-struct ErrorText {
-    const char* name;
-    const char* explanation;
-};
-
-ErrorText Describe(_tag_fileindex_err_ code) {
-    using namespace QIRA::FILEINDEX;
-    switch (code) {
-        case FILEINDEX_ERR_NONE:
-            return {"FILEINDEX_ERR_NONE", "the library set no error code; the cause is in its log"};
-        case FILEINDEX_ERR_BAD_PARAM:
-            return {"FILEINDEX_ERR_BAD_PARAM", "the request is malformed or names an unknown item"};
-        case FILEINDEX_ERR_PATH:
-            return {"FILEINDEX_ERR_PATH", "a share or path could not be resolved"};
-        case FILEINDEX_ERR_NO_SUCH_FOLDER:
-            return {"FILEINDEX_ERR_NO_SUCH_FOLDER", "no indexed folder has that path"};
-        case FILEINDEX_ERR_EXCEED_MAX_FOLDER:
-            return {"FILEINDEX_ERR_EXCEED_MAX_FOLDER", "at most 1000 folders can be indexed"};
-        case FILEINDEX_ERR_LOAD_JSON:
-            return {"FILEINDEX_ERR_LOAD_JSON", "a configuration file could not be read or is not JSON"};
-        case FILEINDEX_ERR_SAVE_JSON:
-            return {"FILEINDEX_ERR_SAVE_JSON", "a configuration file could not be written"};
-        case FILEINDEX_ERR_MALFORMED_FOLDERS:
-            return {"FILEINDEX_ERR_MALFORMED_FOLDERS", "folder.conf is JSON but not a folder list"};
-        case FILEINDEX_ERR_LOCK:
-            return {"FILEINDEX_ERR_LOCK", "the configuration lock is held by another process; try again"};
-    }
-    return {"FILEINDEX_ERR_UNKNOWN", "unknown error code"};
-}
-
-Json::Value Strings(const std::vector<std::string>& items) {
-    Json::Value array(Json::arrayValue);
-    for (const auto& item : items) array.append(item);
-    return array;
-}
-
-}  // namespace
 
 void Output::EmitEnvelope(bool ok, const Json::Value& result, const std::string& message,
                           const std::vector<std::string>& saved) const {
-    const auto code = QIRA::FILEINDEX::ErrorHandler::GetError();
-    Json::Value envelope(Json::objectValue);
-    envelope["ok"] = ok;
-    envelope["result"] = result;
-    envelope["error"]["name"] = Describe(code).name;
-    envelope["error"]["number"] = static_cast<int>(code);
-    envelope["message"] = message;
-    envelope["log"] = Strings(CapturedLog());
-    envelope["saved"] = Strings(saved);
-    std::cout << QIRA::FILEINDEX::toString(envelope) << "\n";
+    std::cout << QIRA::FILEINDEX::toString(tools::Envelope(ok, result, message, saved)) << "\n";
 }
 
 void Output::Emit(const Json::Value& result, const Table& table) const {
@@ -88,17 +39,14 @@ void Output::Emit(const Json::Value& result, const std::string& text) const {
 }
 
 int Output::Fail(const std::string& operation, const std::vector<std::string>& saved) const {
-    const auto code = QIRA::FILEINDEX::ErrorHandler::GetError();
-    const ErrorText text = Describe(code);
-    const std::string message = operation + " failed: " + text.name + " (" + std::to_string(static_cast<int>(code)) +
-                                "): " + text.explanation;
+    const std::string message = tools::FailureMessage(operation);
     if (json) {
         EmitEnvelope(false, Json::Value(), message, saved);
         return kExitFailure;
     }
     std::cerr << "fileindexctl: " << message << "\n";
     if (!quiet) {
-        for (const auto& line : CapturedLog()) std::cerr << "fileindexctl: log: " << line << "\n";
+        for (const auto& line : tools::CapturedLog()) std::cerr << "fileindexctl: log: " << line << "\n";
     }
     for (const auto& file : saved) {
         std::cerr << "fileindexctl: " << file << " was already saved with the change; the steps after it did "

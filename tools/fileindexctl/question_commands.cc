@@ -21,7 +21,7 @@ void AddQuestion(CLI::App& is, Context& ctx, const char* verb, const char* help,
             return true;
         });
         const bool unknown = !yes && (QIRA::FILEINDEX::ErrorHandler::GetError() != QIRA::FILEINDEX::FILEINDEX_ERR_NONE ||
-                                      (logMeansUnknown && !CapturedLog().empty()));
+                                      (logMeansUnknown && !tools::CapturedLog().empty()));
         if (unknown) {
             ctx.Fail(std::string("is ") + verb);
             ctx.status = kExitUnknown;

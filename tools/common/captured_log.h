@@ -1,4 +1,4 @@
-// The library's log lines of the running operation. fileindexctl is the host process, so it takes
+// The library's log lines of the running operation. the tool is the host process, so it takes
 // the library's syslog calls: each line still goes to the system log and is kept here as well,
 // to be shown with the failure it explains.
 #pragma once
@@ -6,9 +6,9 @@
 #include <string>
 #include <vector>
 
-namespace fileindexctl {
+namespace tools {
 
 const std::vector<std::string>& CapturedLog();
 void ClearCapturedLog();
 
-}  // namespace fileindexctl
+}  // namespace tools

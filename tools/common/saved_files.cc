@@ -4,7 +4,7 @@
 
 #include "fileindex/fileindex.h"
 
-namespace fileindexctl {
+namespace tools {
 
 std::string SavedFiles::StampOf(const std::string& path) {
     struct stat st;
@@ -27,4 +27,4 @@ std::vector<std::string> SavedFiles::Changed() const {
     return changed;
 }
 
-}  // namespace fileindexctl
+}  // namespace tools

@@ -5,7 +5,7 @@
 #include <cstdarg>
 #include <cstdio>
 
-namespace fileindexctl {
+namespace tools {
 namespace {
 
 std::vector<std::string>& Lines() {
@@ -19,7 +19,7 @@ const std::vector<std::string>& CapturedLog() { return Lines(); }
 
 void ClearCapturedLog() { Lines().clear(); }
 
-}  // namespace fileindexctl
+}  // namespace tools
 
 // Takes the place of libc's syslog for the library loaded into this process.
 extern "C" void syslog(int priority, const char* format, ...) {
@@ -29,7 +29,7 @@ extern "C" void syslog(int priority, const char* format, ...) {
     va_copy(copy, args);
     char line[8192];
     vsnprintf(line, sizeof line, format, args);
-    fileindexctl::Lines().push_back(line);
+    tools::Lines().push_back(line);
     vsyslog(priority, format, copy);
     va_end(copy);
     va_end(args);

@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-namespace fileindexctl {
+namespace tools {
 
 class SavedFiles {
 public:
@@ -22,4 +22,4 @@ private:
     std::vector<Identity> files_;
 };
 
-}  // namespace fileindexctl
+}  // namespace tools
