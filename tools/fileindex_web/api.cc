@@ -1,0 +1,232 @@
+#include "api.h"
+
+#include <climits>
+#include <cstdint>
+#include <ctime>
+#include <functional>
+#include <mutex>
+#include <set>
+
+#include "captured_log.h"
+#include "envelope.h"
+#include "fileindex/fileindex.h"
+#include "saved_files.h"
+
+namespace web {
+namespace {
+
+using QIRA::FILEINDEX::ErrorHandler;
+using QIRA::FILEINDEX::IndexMgr;
+using QIRA::FILEINDEX::StatusMgr;
+
+// The library keeps one error code per process: requests enter it one at a time.
+std::mutex g_library;
+
+int StatusFor(QIRA::FILEINDEX::_tag_fileindex_err_ code) {
+    using namespace QIRA::FILEINDEX;
+    switch (code) {
+        case FILEINDEX_ERR_BAD_PARAM: return 400;
+        case FILEINDEX_ERR_PATH:
+        case FILEINDEX_ERR_NO_SUCH_FOLDER: return 404;
+        case FILEINDEX_ERR_EXCEED_MAX_FOLDER: return 422;
+        case FILEINDEX_ERR_LOCK: return 409;
+        case FILEINDEX_ERR_NONE: return 502;  // a platform step or the daemon failed
+        default: return 500;
+    }
+}
+
+void Send(httplib::Response& res, int status, const Json::Value& body) {
+    res.status = status;
+    res.set_content(QIRA::FILEINDEX::toString(body), "application/json");
+}
+
+// A request refused before the library is called.
+void Refuse(httplib::Response& res, int status, const std::string& message) {
+    std::lock_guard<std::mutex> lock(g_library);
+    ErrorHandler::SetError(QIRA::FILEINDEX::FILEINDEX_ERR_NONE);
+    tools::ClearCapturedLog();
+    Send(res, status, tools::Envelope(false, Json::Value(), message, {}));
+}
+
+// Runs one library operation and answers with the envelope: on failure the error code decides the
+// status, a held lock answers 409 with Retry-After, and files saved before the failure are named.
+void Run(httplib::Response& res, const std::string& operation, const std::function<bool(Json::Value&)>& call) {
+    std::lock_guard<std::mutex> lock(g_library);
+    const tools::SavedFiles before;
+    ErrorHandler::SetError(QIRA::FILEINDEX::FILEINDEX_ERR_NONE);
+    tools::ClearCapturedLog();
+    Json::Value result(Json::objectValue);
+    if (call(result)) return Send(res, 200, tools::Envelope(true, result, "", {}));
+    const auto code = ErrorHandler::GetError();
+    if (code == QIRA::FILEINDEX::FILEINDEX_ERR_LOCK) res.set_header("Retry-After", "1");
+    Send(res, StatusFor(code), tools::Envelope(false, Json::Value(), tools::FailureMessage(operation), before.Changed()));
+}
+
+// Writes: the token, the same origin and a JSON body. False after answering the refusal.
+bool AcceptWrite(const httplib::Request& req, httplib::Response& res, const std::string& token, Json::Value& body) {
+    if (req.get_header_value("X-Fileindex-Token") != token) {
+        Refuse(res, 403, "this request changes something: it needs the console's token in X-Fileindex-Token");
+        return false;
+    }
+    const std::string origin = req.get_header_value("Origin");
+    if ((!origin.empty() && origin != "http://" + req.get_header_value("Host")) ||
+        req.get_header_value("Sec-Fetch-Site") == "cross-site") {
+        Refuse(res, 403, "a write from another origin is refused");
+        return false;
+    }
+    if (req.body.empty()) {
+        body = Json::Value(Json::objectValue);
+        return true;
+    }
+    if (req.get_header_value("Content-Type").rfind("application/json", 0) != 0) {
+        Refuse(res, 415, "the request body must be JSON (Content-Type: application/json)");
+        return false;
+    }
+    if (!QIRA::FILEINDEX::fromString(body, req.body)) {
+        Refuse(res, 400, "the request body is not valid JSON");
+        return false;
+    }
+    return true;
+}
+
+using Write = std::function<bool(const Json::Value& body, Json::Value& result)>;
+
+void Post(httplib::Server& server, const std::string& token, const std::string& route, const std::string& operation,
+          const Write& write) {
+    server.Post(route, [token, operation, write](const httplib::Request& req, httplib::Response& res) {
+        Json::Value body;
+        if (!AcceptWrite(req, res, token, body)) return;
+        Run(res, operation, [&](Json::Value& result) { return write(body, result); });
+    });
+}
+
+std::string Param(const httplib::Request& req, const std::string& name, const std::string& fallback = "") {
+    return req.has_param(name) ? req.get_param_value(name) : fallback;
+}
+
+unsigned long Number(const httplib::Request& req, const std::string& name, unsigned long fallback) {
+    const std::string text = Param(req, name);
+    if (text.empty() || text.find_first_not_of("0123456789") != std::string::npos || text.size() > 9) return fallback;
+    return std::stoul(text);
+}
+
+Json::Value Additional(const std::string& list) {
+    Json::Value additional(Json::arrayValue);
+    size_t start = 0;
+    while (start < list.size()) {
+        const size_t comma = list.find(',', start);
+        const std::string item = list.substr(start, comma == std::string::npos ? std::string::npos : comma - start);
+        if (!item.empty()) additional.append(item);
+        if (comma == std::string::npos) break;
+        start = comma + 1;
+    }
+    return additional;
+}
+
+Json::Value PauseState(long long resumeTime) {
+    Json::Value pause(Json::objectValue);
+    pause["paused"] = resumeTime == 0 || (resumeTime > 0 && time(nullptr) < resumeTime);
+    pause["resume_time"] = static_cast<Json::Int64>(resumeTime);
+    return pause;
+}
+
+bool ServiceStatus(Json::Value& result) {
+    std::string word;
+    long long resumeTime = -1;
+    std::vector<QIRA::FILEINDEX::Folder> folders;
+    if (!StatusMgr::GetStatus(word) || !StatusMgr::GetPauseInfo(resumeTime) || !IndexMgr::List(folders) ||
+        !QIRA::FILEINDEX::GetProgress(result["progress"])) {
+        return false;
+    }
+    result["status"] = word;
+    result["pause"] = PauseState(resumeTime);
+    std::set<std::string> shares;
+    for (const auto& folder : folders) {
+        std::string share;
+        if (QIRA::FILEINDEX::GetShareNameByPath(share, folder.path)) shares.insert(share);
+    }
+    result["shares"] = Json::Value(Json::arrayValue);
+    for (const auto& share : shares) {
+        Json::Value flags(Json::objectValue);
+        flags["share"] = share;
+        flags["no_space"] = StatusMgr::ShareIsNoSpace(share);
+        flags["need_reindex"] = StatusMgr::ShareIsNeedReindex(share);
+        result["shares"].append(flags);
+    }
+    return true;
+}
+
+// Hours of a pause whose end does not pass the 32-bit resume time; -1 when not acceptable.
+int PauseHours(const Json::Value& body) {
+    const Json::Value& hours = body["hours"];
+    if (!hours.isIntegral() || hours.asLargestInt() < 0) return -1;
+    const long long last = INT32_MAX;
+    if (hours.asLargestInt() > (last - static_cast<long long>(time(nullptr))) / 3600) return -1;
+    return static_cast<int>(hours.asLargestInt());
+}
+
+std::string ShareOf(const Json::Value& body) {
+    return body.isObject() && body["share"].isString() ? body["share"].asString() : "";
+}
+
+}  // namespace
+
+void AddApiRoutes(httplib::Server& server, const std::string& token) {
+    server.Get("/api/folders", [](const httplib::Request& req, httplib::Response& res) {
+        Run(res, "list folders", [&](Json::Value& result) {
+            return IndexMgr::List(result, Number(req, "offset", 0), Number(req, "limit", 50), Param(req, "sort_by", "path"),
+                                  Param(req, "sort_direction", "ASC"), Additional(Param(req, "additional")));
+        });
+    });
+    server.Get("/api/folder", [](const httplib::Request& req, httplib::Response& res) {
+        Run(res, "get folder", [&](Json::Value& result) { return IndexMgr::Get(result, Param(req, "path")); });
+    });
+    server.Get("/api/explain", [](const httplib::Request& req, httplib::Response& res) {
+        Run(res, "explain", [&](Json::Value& result) { return QIRA::FILEINDEX::ExplainPath(Param(req, "path"), result); });
+    });
+    server.Get("/api/progress", [](const httplib::Request&, httplib::Response& res) {
+        Run(res, "progress", [](Json::Value& result) { return QIRA::FILEINDEX::GetProgress(result); });
+    });
+    server.Get("/api/status", [](const httplib::Request&, httplib::Response& res) { Run(res, "status", ServiceStatus); });
+
+    Post(server, token, "/api/folders", "add or change folders",
+         [](const Json::Value& body, Json::Value&) { return IndexMgr::Upsert(body); });
+    Post(server, token, "/api/folders/delete", "delete folders",
+         [](const Json::Value& body, Json::Value&) { return IndexMgr::Delete(body); });
+    Post(server, token, "/api/reindex", "reindex", [](const Json::Value& body, Json::Value&) { return IndexMgr::Reindex(body); });
+    Post(server, token, "/api/resume", "resume", [](const Json::Value&, Json::Value& result) {
+        result["pause"] = PauseState(-1);
+        return StatusMgr::Resume();
+    });
+    server.Post("/api/pause", [token](const httplib::Request& req, httplib::Response& res) {
+        Json::Value body;
+        if (!AcceptWrite(req, res, token, body)) return;
+        const int hours = PauseHours(body);
+        if (hours < 0) return Refuse(res, 400, "\"hours\" must be a whole number, 0 or more, ending before 2038-01-19");
+        Run(res, "pause", [hours](Json::Value& result) {
+            long long resumeTime = -1;
+            const bool paused = StatusMgr::Pause(hours);
+            StatusMgr::GetPauseInfo(resumeTime);
+            result["pause"] = PauseState(resumeTime);
+            return paused;
+        });
+    });
+    server.Post("/api/shares/revive", [token](const httplib::Request& req, httplib::Response& res) {
+        Json::Value body;
+        if (!AcceptWrite(req, res, token, body)) return;
+        if (ShareOf(body).empty()) return Refuse(res, 400, "\"share\" must name a share");
+        Run(res, "revive share", [&](Json::Value&) { return StatusMgr::ShareRevive(ShareOf(body)); });
+    });
+    server.Post("/api/shares/need-reindex", [token](const httplib::Request& req, httplib::Response& res) {
+        Json::Value body;
+        if (!AcceptWrite(req, res, token, body)) return;
+        if (ShareOf(body).empty() || !body["need_reindex"].isBool()) {
+            return Refuse(res, 400, "\"share\" must name a share and \"need_reindex\" be true or false");
+        }
+        Run(res, "set need-reindex", [&](Json::Value&) {
+            return StatusMgr::ShareSetNeedReindex(ShareOf(body), body["need_reindex"].asBool());
+        });
+    });
+}
+
+}  // namespace web
