@@ -173,6 +173,11 @@ std::string ShareOf(const Json::Value& body) {
 
 void AddApiRoutes(httplib::Server& server, const std::string& token) {
     server.Get("/api/folders", [](const httplib::Request& req, httplib::Response& res) {
+        for (const auto& name : Additional(Param(req, "additional"))) {
+            if (name != "status" && name != "is_valid") {
+                return Refuse(res, 400, "unknown additional fact \"" + name.asString() + "\"; use status, is_valid");
+            }
+        }
         Run(res, "list folders", [&](Json::Value& result) {
             return IndexMgr::List(result, Number(req, "offset", 0), Number(req, "limit", 50), Param(req, "sort_by", "path"),
                                   Param(req, "sort_direction", "ASC"), Additional(Param(req, "additional")));

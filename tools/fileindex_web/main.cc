@@ -79,7 +79,10 @@ int main(int argc, char** argv) {
 
     httplib::Server server;
     server.set_payload_max_length(64 * 1024);
-    server.set_read_timeout(5, 0);
+    // Enough workers that idle or slow connections cannot take them all; each waits 3 s at most.
+    server.new_task_queue = [] { return new httplib::ThreadPool(48); };
+    server.set_read_timeout(3, 0);
+    server.set_keep_alive_timeout(3);
     server.set_write_timeout(5, 0);
     server.set_keep_alive_max_count(20);
     server.set_default_headers({{"X-Content-Type-Options", "nosniff"},

@@ -65,10 +65,21 @@ function button(parent, label, onClick) {
   parent.appendChild(b);
 }
 
+// The library's descending page is its first records reversed; a descending page here is the
+// matching ascending page counted from the end, reversed.
+async function fetchPage() {
+  const ask = (offset, limit) => api('GET', '/api/folders?' + new URLSearchParams({
+    offset, limit, sort_by: state.sortBy, sort_direction: 'ASC', additional: 'status,is_valid' }));
+  if (state.direction === 'ASC') return ask(state.offset, state.limit);
+  const total = (await ask(0, 0)).total;
+  const end = Math.max(0, total - state.offset);
+  const listing = await ask(Math.max(0, end - state.limit), Math.min(state.limit, end));
+  listing.folder.reverse();
+  return listing;
+}
+
 async function loadFolders() {
-  const query = new URLSearchParams({ offset: state.offset, limit: state.limit, sort_by: state.sortBy,
-                                      sort_direction: state.direction, additional: 'status,is_valid' });
-  const listing = await api('GET', '/api/folders?' + query);
+  const listing = await fetchPage();
   state.total = listing.total;
   const body = $('folders').tBodies[0];
   body.replaceChildren();
