@@ -66,6 +66,10 @@ TEST_F(PathsTest, FullPathTakesTheVolumeFromTheSharesOwnPath) {
     EXPECT_FALSE(GetFullPath(full, ""));
     EXPECT_TRUE(testkit::Logged("GetShareNameByPath failed, path="));
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NONE);
+    // Only the volume comes from the share's directory; its last component is not the name.
+    qira_sim::PutShare("films", Path("/volume2/store"));
+    ASSERT_TRUE(GetFullPath(full, "/films/2024"));
+    EXPECT_EQ(full, Path("/volume2/films/2024"));
 }
 
 TEST_F(PathsTest, ShareOfAFullPathComesFromThePlatform) {

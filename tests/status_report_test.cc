@@ -94,6 +94,14 @@ TEST_F(StatusReportTest, RecordsMatchOnASlashBoundaryAndOldPathsOnlyForEvent256)
     EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "finished");
     testkit::WriteFile(QueueOf("music"), "{\"event\":256,\"path\":\"/elsewhere\",\"path_old\":7}\n");
     EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "finished");
+    // null and booleans convert to an unsigned event: records, not malformed lines.
+    for (const char* event : {"null", "true", "false", "1.5"}) {
+        SCOPED_TRACE(event);
+        testkit::ClearLog();
+        testkit::WriteFile(QueueOf("music"), std::string("{\"event\":") + event + ",\"path\":\"" + music_ + "/a/x\"}\n");
+        EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "processing");
+        EXPECT_TRUE(testkit::LogLines().empty());
+    }
 }
 
 TEST_F(StatusReportTest, MalformedLinesAreLoggedAndSkipped) {

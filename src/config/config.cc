@@ -11,6 +11,7 @@
 #include "fileindex/json.h"
 #include "fileindex/utils.h"
 #include "log.h"
+#include "strict_json.h"
 
 namespace QIRA {
 namespace FILEINDEX {
@@ -52,6 +53,7 @@ bool Config::LoadJson() {
 
 bool Config::SaveJson() {
     const std::string path = GetPath();
+    detail::RemoveSaveTemporaries(path);
     if (!toFile(body, path)) {
         FILEIDX_LOG("Failed to save json to %s", path.c_str());
         ErrorHandler::SetError(FILEINDEX_ERR_SAVE_JSON);

@@ -1,5 +1,6 @@
 #include "fileindex/json.h"
 
+#include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -98,9 +99,37 @@ bool WriteAll(int fd, const std::string& text) {
     return true;
 }
 
+// The rename reaches the disk only with its directory.
+void SyncDirectoryOf(const std::string& path) {
+    const size_t slash = path.rfind('/');
+    const std::string dir = slash == std::string::npos ? "." : slash == 0 ? "/" : path.substr(0, slash);
+    const int fd = open(dir.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    if (fd < 0) return;
+    fsync(fd);
+    close(fd);
+}
+
+bool IsSaveTemporaryOf(const std::string& name, const std::string& leaf) {
+    if (name.size() != leaf.size() + 7 || name.compare(0, leaf.size() + 1, leaf + ".") != 0) return false;
+    return name.find_first_not_of("ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789", leaf.size() + 1) ==
+           std::string::npos;
+}
+
 }  // namespace
 
 namespace detail {
+
+void RemoveSaveTemporaries(const std::string& path) {
+    const size_t slash = path.rfind('/');
+    const std::string dir = slash == std::string::npos ? "." : slash == 0 ? "/" : path.substr(0, slash);
+    const std::string leaf = path.substr(slash == std::string::npos ? 0 : slash + 1);
+    DIR* listing = opendir(dir.c_str());
+    if (listing == nullptr) return;
+    while (const dirent* entry = readdir(listing)) {
+        if (IsSaveTemporaryOf(entry->d_name, leaf)) unlinkat(dirfd(listing), entry->d_name, 0);
+    }
+    closedir(listing);
+}
 
 StrictJsonReader::StrictJsonReader() : reader_(StrictReader().newCharReader()) {}
 
@@ -145,6 +174,7 @@ bool toFile(const Json::Value& value, const std::string& path) {
         unlink(tmp.c_str());
         return false;
     }
+    SyncDirectoryOf(path);
     return true;
 }
 

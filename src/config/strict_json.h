@@ -2,6 +2,7 @@
 #pragma once
 
 #include <memory>
+#include <string>
 
 #include <json/reader.h>
 #include <json/value.h>
@@ -13,6 +14,10 @@ namespace detail {
 // True when the strict reading surely refuses the text, seen without parsing it: a "/" outside
 // strings, a string left open, or brackets that do not balance.
 bool StrictReadingRefuses(const char* begin, const char* end);
+
+// Removes the temporaries "<file>.XXXXXX" that saves killed before their rename left beside
+// `path`. REQUIRES: the file's lock is held, so that no save is writing one now.
+void RemoveSaveTemporaries(const std::string& path);
 
 class StrictJsonReader {
 public:
