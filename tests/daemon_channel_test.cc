@@ -8,6 +8,7 @@
 #include "daemon_channel.h"
 #include "fake_daemon.h"
 #include "fileindex/json.h"
+#include "fileindex/root.h"
 #include "fileindex/utils.h"
 #include "sandbox.h"
 
@@ -18,7 +19,7 @@ namespace {
 class DaemonChannelTest : public testkit::Sandbox {};
 
 TEST_F(DaemonChannelTest, FrameIsLengthThenJsonThenNul) {
-    testkit::FakeDaemon daemon(detail::DaemonSocketPath());
+    testkit::FakeDaemon daemon(DaemonSocketPath());
     ASSERT_TRUE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));
     const auto frames = daemon.Drain();
     ASSERT_EQ(frames.size(), 1u);
@@ -29,14 +30,14 @@ TEST_F(DaemonChannelTest, FrameIsLengthThenJsonThenNul) {
 
 TEST_F(DaemonChannelTest, NoDaemonMeansFalse) {
     EXPECT_FALSE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));
-    testkit::WriteFile(detail::DaemonSocketPath(), "not a socket");
+    testkit::WriteFile(DaemonSocketPath(), "not a socket");
     EXPECT_FALSE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));
 }
 
 TEST_F(DaemonChannelTest, SocketPathLivesUnderTheRoot) {
-    EXPECT_EQ(detail::DaemonSocketPath(), Path("/var/run/fileindexd.sock"));
+    EXPECT_EQ(DaemonSocketPath(), Path("/var/run/fileindexd.sock"));
     unsetenv("QIRA_ROOT");
-    EXPECT_EQ(detail::DaemonSocketPath(), "/var/run/fileindexd.sock");
+    EXPECT_EQ(DaemonSocketPath(), "/var/run/fileindexd.sock");
     setenv("QIRA_ROOT", root().c_str(), 1);
 }
 
@@ -65,7 +66,7 @@ TEST(ChunkedWriterTest, LargeMessageGoesInPiecesOfAtMost1024) {
 }
 
 TEST_F(DaemonChannelTest, TwoThousandByteMessageIsOneWholeFrame) {
-    testkit::FakeDaemon daemon(detail::DaemonSocketPath());
+    testkit::FakeDaemon daemon(DaemonSocketPath());
     Json::Value data(Json::objectValue);
     data["folder_path"] = std::string(1942, 'p');
     ASSERT_TRUE(SendCammandToDaemon("upsert_folder_setting", data));

@@ -115,7 +115,7 @@ TEST_F(DeleteTest, FailuresAfterTheSaveAreReportedWithTheirMessages) {
     EXPECT_TRUE(testkit::Logged("SendCammandToDaemon failed"));
     EXPECT_FALSE(Conf().isMember("/music/a"));
 
-    daemon_ = std::make_unique<testkit::FakeDaemon>(QIRA::FILEINDEX::detail::DaemonSocketPath());
+    daemon_ = std::make_unique<testkit::FakeDaemon>(QIRA::FILEINDEX::DaemonSocketPath());
     Seed(R"({"/music/a": {}, "/music/b": {}})");
     qira_sim::InjectFault("MonitorQueue::Upsert", 0x90);
     EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a"])")));

@@ -88,7 +88,7 @@ protected:
     // A server in a child process that accepts one connection and then behaves as told.
     template <typename Behaviour>
     pid_t Serve(Behaviour behaviour) {
-        const std::string path = detail::DaemonSocketPath();
+        const std::string path = DaemonSocketPath();
         int ready[2];
         if (pipe(ready) != 0) return -1;
         const pid_t pid = fork();

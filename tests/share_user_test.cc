@@ -174,7 +174,7 @@ TEST_F(ShareUserTest, DaemonThatListensButNeverAcceptsFailsTheCallWithinTwoSecon
     const int listener = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
-    std::strncpy(address.sun_path, detail::DaemonSocketPath().c_str(), sizeof address.sun_path - 1);
+    std::strncpy(address.sun_path, DaemonSocketPath().c_str(), sizeof address.sun_path - 1);
     ASSERT_EQ(bind(listener, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
     ASSERT_EQ(listen(listener, 0), 0);
     const int pending = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);  // fills the backlog

@@ -7,6 +7,7 @@
 #include "child_holding.h"
 #include "daemon_channel.h"
 #include "fake_daemon.h"
+#include "fileindex/root.h"
 #include "fileindex/status.h"
 #include "fileindex/status_mgr.h"
 #include "fileindex/utils.h"
@@ -127,7 +128,7 @@ TEST_F(StatusTest, MalformedResumeTimeIsAJsonException) {
 }
 
 TEST_F(StatusTest, PauseAndResumeWriteTheFileAndTellTheDaemon) {
-    testkit::FakeDaemon daemon(detail::DaemonSocketPath());
+    testkit::FakeDaemon daemon(DaemonSocketPath());
     ASSERT_TRUE(StatusMgr::Pause(0));
     EXPECT_EQ(File(), J(R"({"resume_time": 0})"));
     const long long before = time(nullptr);
@@ -145,7 +146,7 @@ TEST_F(StatusTest, PauseAndResumeWriteTheFileAndTellTheDaemon) {
 }
 
 TEST_F(StatusTest, LongPausesWrapIn32Bits) {
-    testkit::FakeDaemon daemon(detail::DaemonSocketPath());
+    testkit::FakeDaemon daemon(DaemonSocketPath());
     const int hours = 600000;  // 2,160,000,000 s: past 2^31 from any present time
     const long long now = time(nullptr);
     ASSERT_TRUE(StatusMgr::Pause(hours));
@@ -156,7 +157,7 @@ TEST_F(StatusTest, LongPausesWrapIn32Bits) {
 }
 
 TEST_F(StatusTest, NegativePauseTouchesNothing) {
-    testkit::FakeDaemon daemon(detail::DaemonSocketPath());
+    testkit::FakeDaemon daemon(DaemonSocketPath());
     EXPECT_FALSE(StatusMgr::Pause(-1));
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
     EXPECT_FALSE(testkit::Exists(StatusConf()));
@@ -173,7 +174,7 @@ TEST_F(StatusTest, UnreachableDaemonLeavesTheFileChangedAndFails) {
 
 TEST_F(StatusTest, ReviveClearsOnlyTheNoSpaceFlagAndSendsTheCommand) {
     testkit::WriteFile(StatusConf(), R"({"no_space": {"s": true, "t": true}, "need_reindex": {"s": true}})");
-    testkit::FakeDaemon daemon(detail::DaemonSocketPath());
+    testkit::FakeDaemon daemon(DaemonSocketPath());
     ASSERT_TRUE(StatusMgr::ShareRevive("s"));
     ASSERT_TRUE(StatusMgr::ShareRevive("never"));
     EXPECT_EQ(File(), J(R"({"no_space": {"t": true}, "need_reindex": {"s": true}})"));
@@ -184,7 +185,7 @@ TEST_F(StatusTest, ReviveClearsOnlyTheNoSpaceFlagAndSendsTheCommand) {
 
 TEST_F(StatusTest, WritersFailWithErrorNineWhileAnotherProcessHoldsTheLock) {
     testkit::WriteFile(StatusConf(), R"({"resume_time": -1})");
-    testkit::FakeDaemon daemon(detail::DaemonSocketPath());
+    testkit::FakeDaemon daemon(DaemonSocketPath());
     testkit::ChildHolding holder([] {
         Status status;
         return status.Lock(true);

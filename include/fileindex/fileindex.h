@@ -10,6 +10,7 @@
 #include "fileindex/index_mgr.h"
 #include "fileindex/json.h"
 #include "fileindex/progress.h"
+#include "fileindex/root.h"
 #include "fileindex/status.h"
 #include "fileindex/status_mgr.h"
 #include "fileindex/utils.h"

@@ -1,5 +1,7 @@
 #include "qira_sim/appliance.h"
 
+#include "fileindex/root.h"
+
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -57,13 +59,7 @@ Json::Value DefaultServices() {
 
 }  // namespace
 
-std::string Root() {
-    const char* root = std::getenv("QIRA_ROOT");
-    if (root == nullptr) return "";
-    std::string value(root);
-    while (!value.empty() && value.back() == '/') value.pop_back();
-    return value;
-}
+std::string Root() { return QIRA::FILEINDEX::RootPrefix(); }
 
 std::string StateDir() { return Root() + "/var/lib/qira-sim"; }
 

@@ -1,4 +1,4 @@
-// Fixed paths resolve under the root prefix in QIRA_ROOT (unset, empty or "/" = the real root).
+// Fixed paths resolve under the root prefix of RootPrefix (fileindex/root.h).
 #pragma once
 
 #include <string>

@@ -12,6 +12,7 @@
 #include <cstring>
 
 #include "fileindex/json.h"
+#include "fileindex/root.h"
 #include "fileindex/utils.h"
 #include "root.h"
 
@@ -43,8 +44,6 @@ int ConnectToDaemon() {
 }
 
 }  // namespace
-
-std::string DaemonSocketPath() { return RootPath("/var/run/fileindexd.sock"); }
 
 bool WriteChunked(int fd, const char* data, size_t size) {
     long offset = 0;

@@ -10,7 +10,6 @@ namespace detail {
 
 constexpr size_t kDaemonWriteChunk = 1024;
 
-std::string DaemonSocketPath();
 
 // Writes `size` bytes in pieces of at most 1024. A result of 0 fails unless errno is EINTR
 // (three retries over the whole buffer); any other result, -1 included, counts as written.

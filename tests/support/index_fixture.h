@@ -3,7 +3,7 @@
 
 #include <memory>
 
-#include "daemon_channel.h"
+#include "fileindex/root.h"
 #include "fake_daemon.h"
 #include "fileindex/json.h"
 #include "log_capture.h"
@@ -22,7 +22,7 @@ protected:
             MakeDir(music_ + dir);
             MakeDir(photo_ + dir);
         }
-        daemon_ = std::make_unique<FakeDaemon>(QIRA::FILEINDEX::detail::DaemonSocketPath());
+        daemon_ = std::make_unique<FakeDaemon>(QIRA::FILEINDEX::DaemonSocketPath());
     }
     void TearDown() override {
         daemon_.reset();

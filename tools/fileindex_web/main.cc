@@ -58,7 +58,10 @@ int main(int argc, char** argv) {
         std::cerr << "fileindex-web: --listen: give ADDRESS:PORT, e.g. 127.0.0.1:8080\n";
         return tools::kExitUsage;
     }
-    if (!root.empty()) setenv("QIRA_ROOT", root.c_str(), 1);
+    if (!root.empty() && !QIRA::FILEINDEX::UseRootPrefix(root)) {
+        std::cerr << "fileindex-web: --root: this build uses the appliance's own paths\n";
+        return tools::kExitUsage;
+    }
 
     const std::string configDir = QIRA::FILEINDEX::Folders().GetPath().substr(0, QIRA::FILEINDEX::Folders().GetPath().rfind('/'));
     const std::string tokenFile = configDir + "/web.token";

@@ -6,18 +6,20 @@
 
 #include "cli.h"
 #include "commands.h"
+#include "fileindex/root.h"
 
 namespace {
 
-// The root prefix in force: --root, else QIRA_ROOT; it must be a directory.
+// The root prefix in force, from --root or the environment, must be a directory.
 void UseRoot(const std::string& option) {
-    const char* env = std::getenv("QIRA_ROOT");
-    const std::string root = !option.empty() ? option : (env ? env : "");
+    if (!option.empty() && !QIRA::FILEINDEX::UseRootPrefix(option)) {
+        throw CLI::ValidationError("--root", "this build uses the appliance's own paths");
+    }
+    const std::string root = QIRA::FILEINDEX::RootPrefix();
     struct stat st;
     if (!root.empty() && (stat(root.c_str(), &st) != 0 || !S_ISDIR(st.st_mode))) {
-        throw CLI::ValidationError(option.empty() ? "QIRA_ROOT" : "--root", "no such directory: " + root);
+        throw CLI::ValidationError(option.empty() ? "the root prefix" : "--root", "no such directory: " + root);
     }
-    if (!option.empty()) setenv("QIRA_ROOT", option.c_str(), 1);
 }
 
 }  // namespace

@@ -27,13 +27,6 @@ volatile sig_atomic_t g_stop = 0;
 
 void OnTerm(int) { g_stop = 1; }
 
-std::string SocketPath() {
-    const char* root = std::getenv("QIRA_ROOT");
-    std::string prefix = root ? root : "";
-    while (!prefix.empty() && prefix.back() == '/') prefix.pop_back();
-    return prefix + "/var/run/fileindexd.sock";
-}
-
 int Listen(const std::string& path) {
     sockaddr_un address;
     std::memset(&address, 0, sizeof address);
@@ -139,11 +132,11 @@ int main(int argc, char** argv) {
     app.add_option("--root", root, "Root prefix of the appliance (instead of QIRA_ROOT)");
     app.add_option("--interval", intervalMs, "Milliseconds between passes over the queues")->check(CLI::Range(1, 60000));
     if (const auto ended = tools::Parse(app, argc, argv)) return *ended;
-    if (!root.empty()) setenv("QIRA_ROOT", root.c_str(), 1);
+    if (!root.empty()) QIRA::FILEINDEX::UseRootPrefix(root);
     signal(SIGTERM, OnTerm);
     signal(SIGINT, OnTerm);
     signal(SIGPIPE, SIG_IGN);
-    const std::string path = SocketPath();
+    const std::string path = QIRA::FILEINDEX::DaemonSocketPath();
     const int listener = Listen(path);
     if (listener < 0) {
         std::cerr << "fileindexd-ref: cannot listen on " << path << "\n";

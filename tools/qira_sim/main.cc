@@ -6,6 +6,7 @@
 
 #include "fileindex/json.h"
 #include "cli.h"
+#include "fileindex/root.h"
 #include "qira_sim/appliance.h"
 
 namespace {
@@ -103,7 +104,7 @@ int main(int argc, char** argv) {
     std::string root;
     app.add_option("--root", root, "Root of the simulated appliance (instead of QIRA_ROOT)");
     app.parse_complete_callback([&root] {
-        if (!root.empty()) setenv("QIRA_ROOT", root.c_str(), 1);
+        if (!root.empty()) QIRA::FILEINDEX::UseRootPrefix(root);
     });
     app.add_subcommand("init", "Create the appliance's directories, notifier and default services")->callback([] {
         // A simulated appliance never goes into the real root.

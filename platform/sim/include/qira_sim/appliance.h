@@ -9,7 +9,7 @@
 
 namespace qira_sim {
 
-// The root prefix from QIRA_ROOT ("" when unset, empty or "/").
+// The root prefix in force (QIRA::FILEINDEX::RootPrefix: "" when QIRA_ROOT is unset, empty or "/").
 std::string Root();
 // Where the simulation keeps its state: <root>/var/lib/qira-sim.
 std::string StateDir();
