@@ -1,4 +1,12 @@
-// Abstract base of the locked JSON configuration files.
+// Config: the abstract base of the two locked JSON configuration files, folder.conf (Folders)
+// and status.conf (Status).
+//
+// A writer constructs the subclass on its stack, calls Lock(true), Load(), changes it, Save(),
+// and Unlock() on every way out. A reader calls Load() alone. The lock is advisory (flock on a
+// separate lock file under /tmp) and fail-fast: it is never waited for, so a writer meeting a
+// held lock fails with error 9 within about 30 ms and must retry if it wants to. Two instances
+// in one process (two threads, or one thread twice) conflict like two processes: the second
+// Lock(true) fails with error 9 instead of waiting.
 #pragma once
 
 #include "fileindex/export.h"
@@ -13,6 +21,7 @@ namespace FILEINDEX {
 class FILEINDEX_EXPORT Config {
 public:
     Config();
+    // Neither unlocks nor closes: every path that locks must call Unlock itself.
     virtual ~Config();
     Config(const Config&) = delete;
     Config& operator=(const Config&) = delete;
@@ -22,15 +31,21 @@ public:
     virtual std::string GetLockPath() const = 0;
     virtual std::string GetPath() const = 0;
 
-    // A missing file is an empty configuration; an unreadable or invalid one sets error 6.
+    // Fills the body from GetPath(). A missing file is an empty configuration (true). An
+    // unreadable or invalid file: false, error 6, body as it was.
     bool LoadJson();
-    // Replaces the file atomically and gives it mode 0644; a failed write sets error 7.
+    // Replaces the file atomically (a temporary in the same directory, flushed, renamed, the
+    // directory synced) with mode 0644, first removing temporaries that killed saves left. A
+    // failed write: false, error 7, the old file intact. A failed chmod is only logged.
+    // REQUIRES: the exclusive lock is held (Lock(true)), as every writer of the library does.
     bool SaveJson();
-    // Three non-blocking attempts 0-9 ms apart; error 9 when the lock stays held. The lock file
-    // is opened without following a symbolic link and must be a regular file. Unlike the
-    // original design, which kept them open, the descriptor of each failed attempt is closed, so
-    // contention leaks nothing.
+    // Three non-blocking attempts 0-9 ms apart; error 9 when the lock stays held or the lock file
+    // cannot be opened. The lock file is opened without following a symbolic link and must be a
+    // regular file. Unlike the original design, which kept them open, the descriptor of each
+    // failed attempt is closed, so contention leaks nothing.
     bool Lock(bool exclusive);
+    // Releases the lock and closes its descriptor.
+    // REQUIRES: only after a successful Lock, once; after a failed Lock it does nothing.
     void Unlock();
 
 protected:

@@ -1,4 +1,5 @@
-/* Plain functions of libfileindex, with C linkage. */
+/* Plain functions of libfileindex, with C linkage. None takes a lock; each loads what it needs
+ * afresh. A failed load of folder.conf answers 0 and leaves its error code (6 or 8). */
 #pragma once
 
 #include "fileindex/export.h"

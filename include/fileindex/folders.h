@@ -1,4 +1,9 @@
-// folder.conf: the list of indexed folders, keyed by share path.
+// Folders: folder.conf, the list of indexed folders keyed by share path, in memory.
+//
+// Nothing here locks: a writer holds Lock(true) around Load, change and Save (see Config).
+// Upsert and Delete change only the in-memory map; nothing is written until Save, so a failed
+// change followed by no Save leaves the file as it was. Errors: 6 and 8 from Load, 7 from Save,
+// 1, 4 and 5 as listed per operation. Not shared between threads.
 #pragma once
 
 #include "fileindex/export.h"
@@ -33,9 +38,13 @@ public:
     // folders yields an empty page.
     bool List(Json::Value& out, unsigned long offset, unsigned long limit, const std::string& sort_by,
               const std::string& sort_direction, const Json::Value& additional);
-    // Adds or updates one folder in memory; `changed` = which media switches changed.
+    // Adds or updates one folder in memory; `changed` = which media switches changed, judged by
+    // the folder that governed the path before. A request without a string "path", with a path
+    // that is not a canonical share path or does not resolve: error 1 ("Bad param"), map
+    // unchanged. A 1001st folder: error 5, the record stays in memory (do not save).
     bool Upsert(Json::Value& changed, const Json::Value& request);
-    // Removes one folder in memory; `changed` = {path: which media switches changed}.
+    // Removes one folder in memory (an unknown path is no error); `changed` = {path: which media
+    // switches changed}, left untouched when the path does not resolve.
     bool Delete(Json::Value& changed, const std::string& path);
 
     size_t Count() const { return folders.size(); }

@@ -1,5 +1,11 @@
 // Share and path services: path conversion, indexability rules, daemon channel, custom events,
 // no-space notice and configuration migration.
+//
+// Free functions without state. None takes a configuration lock, except AddCustomEvent's
+// fallback (the status lock, to mark the share) and the migration (through what it calls).
+// Error codes: 2 when a share cannot be resolved (GetFullPath, GetShareNamePathByFullPath,
+// CanPathBeIndexed), 1 for a path or share name holding a NUL byte (the platform would see it cut
+// at the NUL); the rest report through their result and the log only.
 #pragma once
 
 #include "fileindex/export.h"
