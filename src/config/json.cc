@@ -78,16 +78,6 @@ Outline OutlineOf(const char* begin, const char* end) {
     return outline;
 }
 
-bool ReadWholeFile(const std::string& path, std::string& text) {
-    const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
-    if (fd < 0) return false;
-    char buffer[65536];
-    ssize_t got;
-    while ((got = read(fd, buffer, sizeof buffer)) > 0) text.append(buffer, static_cast<size_t>(got));
-    close(fd);
-    return got == 0;
-}
-
 bool WriteAll(int fd, const std::string& text) {
     size_t done = 0;
     while (done < text.size()) {
@@ -118,6 +108,16 @@ bool IsSaveTemporaryOf(const std::string& name, const std::string& leaf) {
 }  // namespace
 
 namespace detail {
+
+bool ReadWholeFile(const std::string& path, std::string& text) {
+    const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    if (fd < 0) return false;
+    char buffer[65536];
+    ssize_t got;
+    while ((got = read(fd, buffer, sizeof buffer)) > 0) text.append(buffer, static_cast<size_t>(got));
+    close(fd);
+    return got == 0;
+}
 
 void RemoveSaveTemporaries(const std::string& path) {
     const size_t slash = path.rfind('/');
@@ -159,7 +159,7 @@ bool fromString(Json::Value& out, const std::string& text) {
 
 bool fromFile(Json::Value& out, const std::string& path) {
     std::string text;
-    return ReadWholeFile(path, text) && fromString(out, text);
+    return detail::ReadWholeFile(path, text) && fromString(out, text);
 }
 
 std::string toString(const Json::Value& value) { return Json::writeString(CompactWriter(), value); }

@@ -15,6 +15,9 @@ namespace detail {
 // strings, a string left open, or brackets that do not balance.
 bool StrictReadingRefuses(const char* begin, const char* end);
 
+// Appends the whole content of `path` to `text`; false when it cannot be read.
+bool ReadWholeFile(const std::string& path, std::string& text);
+
 // Removes the temporaries "<file>.XXXXXX" that saves killed before their rename left beside
 // `path`. REQUIRES: the file's lock is held, so that no save is writing one now.
 void RemoveSaveTemporaries(const std::string& path);

@@ -1,9 +1,6 @@
 // folder.conf: load, save, lookups, upsert and delete of the folder map.
 #include "fileindex/folders.h"
 
-#include <fcntl.h>
-#include <unistd.h>
-
 #include "fileindex/error.h"
 #include "fileindex/json.h"
 #include "fileindex/utils.h"
@@ -11,6 +8,7 @@
 #include "folder_fields.h"
 #include "full_path_resolver.h"
 #include "log.h"
+#include "strict_json.h"
 #include "path_rules.h"
 #include "root.h"
 
@@ -54,16 +52,6 @@ void AddLoaded(std::map<std::string, Folder>& folders, std::map<std::string, Fol
     }
 }
 
-bool ReadWhole(const std::string& path, std::string& text) {
-    const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
-    if (fd < 0) return false;
-    char buffer[65536];
-    ssize_t got;
-    while ((got = read(fd, buffer, sizeof buffer)) > 0) text.append(buffer, static_cast<size_t>(got));
-    close(fd);
-    return got == 0;
-}
-
 }  // namespace
 
 Folders::~Folders() { folders.clear(); }
@@ -75,7 +63,7 @@ std::string Folders::GetPath() const { return detail::RootPath("/usr/qira/etc/fi
 bool Folders::Load() {
     std::string text;
     std::map<std::string, Folder> read;
-    if (IsFileExist(GetPath()) && ReadWhole(GetPath(), text) && detail::ReadFolderConfFast(text, read)) {
+    if (IsFileExist(GetPath()) && detail::ReadWholeFile(GetPath(), text) && detail::ReadFolderConfFast(text, read)) {
         AddLoaded(folders, read);
         return true;
     }
