@@ -12,8 +12,10 @@ namespace fuzzkit {
 
 const std::string& Root() {
     static const std::string root = [] {
-        char tmpl[] = "/tmp/fileindex-fuzz-XXXXXX";
-        const std::string dir = mkdtemp(tmpl);
+        // Under TMPDIR when given, so that a run's clean-up removes its own roots only.
+        const char* tmp = std::getenv("TMPDIR");
+        std::string tmpl = std::string(tmp && *tmp ? tmp : "/tmp") + "/fileindex-fuzz-XXXXXX";
+        const std::string dir = mkdtemp(&tmpl[0]);
         setenv("QIRA_ROOT", dir.c_str(), 1);
         qira_sim::InitAppliance(dir);
         for (const char* sub : {"/volume1", "/volume1/music", "/volume1/music/a", "/volume1/music/a/b",

@@ -9,7 +9,8 @@ CC=clang CXX=clang++ cmake -S . -B build-fuzz -DCMAKE_BUILD_TYPE=RelWithDebInfo 
   -DFILEINDEX_BUILD_TESTS=OFF >/dev/null
 cmake --build build-fuzz -j "$(nproc)" >/dev/null
 work=$(mktemp -d /tmp/fileindex-fuzz-run-XXXXXX)
-trap 'rm -rf "$work" /tmp/fileindex-fuzz-??????' EXIT
+trap 'rm -rf "$work"' EXIT
+export TMPDIR="$work"  # the targets' scratch roots go here, removed with it
 for target in folder_conf status_conf queue_scan requests queue_line folder_conf_reading; do
   mkdir -p "$work/$target"
   cp fuzz/corpus/"$target"/* "$work/$target/"

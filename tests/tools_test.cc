@@ -295,10 +295,18 @@ TEST_F(DaemonStandInTest, PauseHoldsWorkBack) {
     StartDaemon();
     ASSERT_TRUE(StatusMgr::Pause(0));
     ASSERT_TRUE(IndexMgr::Reindex(J(R"(["/music/a"])")));
-    for (int i = 0; i < 20; ++i) {
-        usleep(2000);
-        EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "paused");
-    }
+    // The daemon takes commands before each drain pass: once it has taken a second pause, sent
+    // after the record was queued, it has had its pass over the queue and held the record back.
+    ASSERT_TRUE(StatusMgr::Pause(0));
+    const auto pauses = [this] {
+        const std::string log = testkit::ReadFile(log_);
+        size_t count = 0;
+        for (size_t at = log.find("\"type\":\"pause\""); at != std::string::npos; at = log.find("\"type\":\"pause\"", at + 1)) ++count;
+        return count;
+    };
+    ASSERT_TRUE(testkit::WaitFor([&] { return pauses() == 2; }));
+    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "paused");
+    EXPECT_TRUE(testkit::Exists(QueueOf("music")));
     ASSERT_TRUE(StatusMgr::Resume());
     EXPECT_TRUE(testkit::WaitFor([] { return StatusMgr::GetFolderStatus("/music/a") == "finished"; }));
 }
