@@ -6,6 +6,7 @@
 #include "fileindex/status_mgr.h"
 #include "fileindex/utils.h"
 #include "folder_fields.h"
+#include "path_rules.h"
 #include "log.h"
 
 namespace QIRA {
@@ -22,10 +23,7 @@ void MergeFolderFields(Folder& folder, const Json::Value& obj) {
 }
 
 bool Governs(const std::string& folderFullPath, const std::string& fullPath) {
-    const size_t length = folderFullPath.size();
-    // The boundary and the last byte first: siblings that share a long prefix fail at once.
-    return length != 0 && fullPath.size() >= length && (fullPath.size() == length || fullPath[length] == '/') &&
-           fullPath[length - 1] == folderFullPath[length - 1] && fullPath.compare(0, length, folderFullPath) == 0;
+    return !folderFullPath.empty() && IsWithin(fullPath, folderFullPath);
 }
 
 }  // namespace detail

@@ -5,6 +5,7 @@
 #include "fileindex/index_mgr.h"
 #include "fileindex/json.h"
 #include "fileindex/utils.h"
+#include "daemon_channel.h"
 #include "index_support.h"
 #include "path_rules.h"
 

@@ -63,25 +63,22 @@ bool IndexMgr::IsFullPathIndexed(const std::string& full_path) {
 }
 
 bool IndexMgr::IsPathIndexed(const std::string& path, const std::vector<Folder>& list) {
-    const std::string probe = path + "/";
     for (const auto& folder : list) {
-        if (StringStartWith(probe, folder.path + "/")) return true;
+        if (detail::IsWithin(path, folder.path)) return true;
     }
     return false;
 }
 
 bool IndexMgr::IsPathContainIndexed(const std::string& path, const std::vector<Folder>& list) {
-    const std::string prefix = path + "/";
     for (const auto& folder : list) {
-        if (StringStartWith(folder.path + "/", prefix)) return true;
+        if (detail::IsWithin(folder.path, path)) return true;
     }
     return false;
 }
 
 bool IndexMgr::IsFullPathIndexed(const std::string& full_path, const std::vector<Folder>& list) {
-    const std::string probe = full_path + "/";
     for (const auto& folder : list) {
-        if (StringStartWith(probe, folder.GetFullPath() + "/")) return true;
+        if (detail::IsWithin(full_path, folder.GetFullPath())) return true;
     }
     return false;
 }

@@ -49,11 +49,6 @@ bool RegisterShareMonitor(Folders& folders, const std::string& share) {
     return ShareQueuePath(share, queuePath) && RegisterShareMonitor(folders, share, queuePath);
 }
 
-Json::Value FolderPathData(const std::string& path) {
-    Json::Value data(Json::objectValue);
-    data["folder_path"] = path;
-    return data;
-}
 
 }  // namespace detail
 }  // namespace FILEINDEX

@@ -8,28 +8,16 @@
 #include "fileindex/folders.h"
 #include "log.h"
 #include "pending_reindex.h"
+#include "unlock_on_exit.h"
 
 namespace QIRA {
 namespace FILEINDEX {
 namespace detail {
 
-// Releases a configuration lock on every way out of a scope.
-class UnlockOnExit {
-public:
-    explicit UnlockOnExit(Config& config) : config_(config) {}
-    ~UnlockOnExit() { config_.Unlock(); }
-    UnlockOnExit(const UnlockOnExit&) = delete;
-    UnlockOnExit& operator=(const UnlockOnExit&) = delete;
-
-private:
-    Config& config_;
-};
-
 // The last indexed folder is gone: stop fileindexd, switch Spotlight off and restart samba when
 // it was on. Failures are logged only.
 void StopIndexingServices();
 
-Json::Value FolderPathData(const std::string& path);
 
 // UpsertQIRANotifydCfg over the list an operation has just saved, instead of loading it again.
 bool RegisterShareMonitor(Folders& folders, const std::string& share, const std::string& queuePath);

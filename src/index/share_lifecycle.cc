@@ -3,6 +3,7 @@
 #include "fileindex/folders.h"
 #include "fileindex/index_mgr.h"
 #include "fileindex/utils.h"
+#include "daemon_channel.h"
 #include "ea_dir.h"
 #include "index_support.h"
 #include "path_rules.h"
@@ -11,12 +12,6 @@
 namespace QIRA {
 namespace FILEINDEX {
 namespace {
-
-Json::Value ShareData(const std::string& share) {
-    Json::Value data(Json::objectValue);
-    data["share_name"] = share;
-    return data;
-}
 
 bool LockAndListShare(Folders& folders, const std::string& share, std::vector<Folder>& list) {
     return folders.Lock(true) && folders.Load() && folders.List(list, share);
@@ -56,7 +51,7 @@ bool IndexMgr::ShareRename(const std::string& oldName, const std::string& newNam
 
 bool IndexMgr::SharePause(const std::string& share) {
     if (!detail::NulFree(share)) return false;
-    if (!SendCammandToDaemon("delete_share_worker", ShareData(share))) return false;
+    if (!SendCammandToDaemon("delete_share_worker", detail::ShareNameData(share))) return false;
     if (!DeleteQIRANotifydCfg(share)) {
         FILEIDX_LOG("DeleteQIRANotifydCfg failed, share=%s", share.c_str());
         return false;
@@ -70,7 +65,7 @@ bool IndexMgr::ShareResume(const std::string& share) {
         FILEIDX_LOG("UpsertQIRANotifydCfg failed, share=%s", share.c_str());
         return false;
     }
-    return SendCammandToDaemon("revive_share_worker", ShareData(share));
+    return SendCammandToDaemon("revive_share_worker", detail::ShareNameData(share));
 }
 
 bool IndexMgr::CleanShareIndexData(const std::string& share) {

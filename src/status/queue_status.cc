@@ -19,19 +19,13 @@ namespace {
 
 thread_local FolderStatusBatch* currentBatch = nullptr;
 
-// recordPath + "/" starts with folderPrefix (which ends in "/"), without building the string.
-bool IsUnder(const std::string& recordPath, const std::string& folderPrefix) {
-    const size_t n = folderPrefix.size();
-    if (recordPath.size() >= n) return recordPath.compare(0, n, folderPrefix) == 0;
-    return recordPath.size() + 1 == n && folderPrefix.compare(0, n - 1, recordPath) == 0;
-}
-
-bool ScanForFolder(const std::string& prefix, const std::string& queuePath) {
+bool ScanForFolder(const std::string& folderFullPath, const std::string& queuePath) {
     bool found = false;
     const bool opened = ScanQueue(
         queuePath,
         [&](const QueueRecord& record) {
-            if (IsUnder(record.path, prefix) || (record.event == kEventRename && IsUnder(record.path_old, prefix))) {
+            if (IsWithin(record.path, folderFullPath) ||
+                (record.event == kEventRename && IsWithin(record.path_old, folderFullPath))) {
                 found = true;
             }
         },
@@ -55,7 +49,7 @@ bool IsFolderInQueue(const std::string& folderPath, const std::string& queuePath
     const std::string prefix = fullPath + "/";
     bool inQueue = false;
     if (currentBatch != nullptr && currentBatch->Answer(prefix, queuePath, inQueue)) return inQueue;
-    return ScanForFolder(prefix, queuePath);
+    return ScanForFolder(fullPath, queuePath);
 }
 
 FolderStatusBatch::FolderStatusBatch(const std::vector<Folder>& folders) : outer_(currentBatch) {

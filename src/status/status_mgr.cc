@@ -7,7 +7,9 @@
 
 #include "fileindex/status.h"
 #include "fileindex/utils.h"
+#include "daemon_channel.h"
 #include "log.h"
+#include "unlock_on_exit.h"
 #include "path_rules.h"
 
 namespace QIRA {
@@ -24,19 +26,13 @@ bool Read(const std::string& name, const std::function<bool(Status&)>& question)
 // The daemon command (when `type` is not empty) is sent while the status lock is held.
 bool Write(const Change& change, const std::string& type = std::string(), const Json::Value& data = Json::Value()) {
     Status status;
-    bool ok = status.Lock(true) && status.Load() && change(status) && status.Save();
-    if (ok && !type.empty() && !SendCammandToDaemon(type, data)) {
+    detail::UnlockOnExit unlock(status);
+    if (!status.Lock(true) || !status.Load() || !change(status) || !status.Save()) return false;
+    if (!type.empty() && !SendCammandToDaemon(type, data)) {
         FILEIDX_LOG("SendCammandToDaemon failed");
-        ok = false;
+        return false;
     }
-    status.Unlock();
-    return ok;
-}
-
-Json::Value ShareData(const std::string& share) {
-    Json::Value data(Json::objectValue);
-    data["share_name"] = share;
-    return data;
+    return true;
 }
 
 // Kept deliberately narrow: the sum wraps past 2,147,483,647 and then reads as not paused.
@@ -93,7 +89,7 @@ bool StatusMgr::Resume() {
 
 bool StatusMgr::ShareRevive(const std::string& share) {
     return detail::NulFree(share) &&
-           Write([&](Status& s) { return s.ShareSetNoSpace(share, false); }, "revive_share_worker", ShareData(share));
+           Write([&](Status& s) { return s.ShareSetNoSpace(share, false); }, "revive_share_worker", detail::ShareNameData(share));
 }
 
 }  // namespace FILEINDEX

@@ -45,6 +45,18 @@ int ConnectToDaemon() {
 
 }  // namespace
 
+Json::Value ShareNameData(const std::string& share) {
+    Json::Value data(Json::objectValue);
+    data["share_name"] = share;
+    return data;
+}
+
+Json::Value FolderPathData(const std::string& path) {
+    Json::Value data(Json::objectValue);
+    data["folder_path"] = path;
+    return data;
+}
+
 bool WriteChunked(int fd, const char* data, size_t size) {
     long offset = 0;
     long remaining = static_cast<long>(size);

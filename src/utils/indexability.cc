@@ -9,6 +9,7 @@
 #include "folder_fields.h"
 #include "indexability_rules.h"
 #include "path_rules.h"
+#include "share_record.h"
 #include "qira/qira_fs.h"
 #include "qira/qira_quota.h"
 #include "qira/qira_share.h"
@@ -23,11 +24,6 @@ const std::vector<std::string> kSystemPreservedNames = {".TemporaryItems", "QIRA
 
 constexpr int kNeverIndexedFsType = 12;
 constexpr unsigned long long kIndexSpaceNeeded = 10485760ULL;
-
-struct ShareDeleter {
-    void operator()(QIRASHARE* share) const { QIRAShareFree(share); }
-};
-using SharePtr = std::unique_ptr<QIRASHARE, ShareDeleter>;
 
 bool Contains(const std::string& text, const char* part) { return text.find(part) != std::string::npos; }
 
@@ -89,12 +85,11 @@ bool CanFullPathBeIndexed(const std::string& fullPath) {
 
 bool IsShareSpaceEnough(const std::string& shareName) {
     if (!detail::NulFree(shareName)) return false;
-    QIRASHARE* raw = nullptr;
-    if (QIRAShareGet(shareName.c_str(), &raw) < 0) {
+    const detail::ShareRecord share = detail::GetShareRecord(shareName);
+    if (!share) {
         FILEIDX_LOG("QIRAShareGet failed, share=%s", shareName.c_str());
         return false;
     }
-    const SharePtr share(raw);
     if (QIRAQuotaIsEnough(0, share->szPath, kIndexSpaceNeeded) != 0) return true;
     const int err = QLIBCErrGet();
     return err != QLIBC_ERR_NO_SPACE && err != QLIBC_ERR_QUOTA_EXCEEDED;

@@ -8,6 +8,7 @@
 #include "log.h"
 #include "qira/qira_fs.h"
 #include "qira/qira_share.h"
+#include "share_record.h"
 
 namespace QIRA {
 namespace FILEINDEX {
@@ -16,11 +17,6 @@ namespace {
 
 const std::vector<std::string> kSkippedShareNames = {"surveillance", "NetBackup"};
 constexpr int kNeverIndexedFsType = 12;
-
-struct ShareDeleter {
-    void operator()(QIRASHARE* share) const { QIRAShareFree(share); }
-};
-using SharePtr = std::unique_ptr<QIRASHARE, ShareDeleter>;
 
 bool IsListed(const std::vector<std::string>& names, const std::string& name) {
     for (const auto& listed : names) {
@@ -140,9 +136,8 @@ bool EvaluateFullPath(const std::string& fullPath, std::vector<RuleVerdict>* tra
     facts["share"] = inShare ? Json::Value(shareName) : Json::Value();
     if (verdicts.Stop("share_of_path", !inShare, facts)) return false;
 
-    QIRASHARE* raw = nullptr;
-    const bool known = inShare && QIRAShareGet(shareName.c_str(), &raw) >= 0;
-    const SharePtr share(known ? raw : nullptr);
+    const ShareRecord share = inShare ? GetShareRecord(shareName) : ShareRecord();
+    const bool known = share != nullptr;
     if (inShare && !known) FILEIDX_LOG("QIRAShareGet failed, share=%s", shareName.c_str());
     if (inShare) {
         facts["found"] = known;

@@ -18,6 +18,13 @@ bool NulFree(const std::string& value) {
     return false;
 }
 
+bool IsWithin(const std::string& path, const std::string& dir) {
+    const size_t n = dir.size();
+    // The boundary and the last byte first: siblings sharing a long prefix fail at once.
+    if (path.size() < n || (path.size() > n && path[n] != '/') || (n > 0 && path[n - 1] != dir[n - 1])) return false;
+    return path.compare(0, n, dir) == 0;
+}
+
 bool FitsPathMax(size_t length) { return length < PATH_MAX; }
 
 bool IsCanonicalSharePath(const std::string& path) {

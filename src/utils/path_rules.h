@@ -15,6 +15,11 @@ bool NulFree(const std::string& value);
 // within NAME_MAX and the whole within PATH_MAX.
 bool IsCanonicalSharePath(const std::string& path);
 
+// The containment rule of every path comparison: `path` + "/" starts with `dir` + "/", so a
+// directory holds itself and what lies beneath it, not a sibling sharing a name prefix. An
+// empty `dir` holds every absolute path.
+bool IsWithin(const std::string& path, const std::string& dir);
+
 // True when a full path of `length` bytes fits the system's path length.
 bool FitsPathMax(size_t length);
 

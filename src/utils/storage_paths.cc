@@ -10,6 +10,7 @@
 #include "qira/qira_fs.h"
 #include "qira/qira_share.h"
 #include "qira/qlib_core.h"
+#include "share_record.h"
 
 namespace QIRA {
 namespace FILEINDEX {
@@ -38,12 +39,11 @@ bool ArgumentsValid(const char* szName, const char* szOut, const char* outCheck,
 int StoragePathGet(const char* szName, char* szOut, int cbOutLen, const char* outCheck, const char* leaf,
                    bool makeLeafDir) {
     if (!ArgumentsValid(szName, szOut, outCheck, cbOutLen)) return -1;
-    QIRASHARE* raw = nullptr;
-    if (QIRAShareGet(szName, &raw) < 0) {
+    const detail::ShareRecord share = detail::GetShareRecord(szName);
+    if (!share) {
         FILEIDX_LOG("QIRAShareGet failed, name=%s, code=%d", szName, QLIBCErrGet());
         return -1;
     }
-    const std::unique_ptr<QIRASHARE, void (*)(QIRASHARE*)> share(raw, QIRAShareFree);
     const std::string eaDir = std::string(share->szPath) + "/" + kEaDir;
     if (QIRAEAMKDir(0, eaDir.c_str()) < 0) FILEIDX_LOG("QIRAEAMKDir failed, path=%s, code=%d", eaDir.c_str(), QLIBCErrGet());
     const int length = snprintf(szOut, static_cast<size_t>(cbOutLen), "%s/%s/%s", share->szPath, kEaDir, leaf);

@@ -8,6 +8,7 @@
 #include "fileindex/error.h"
 #include "log.h"
 #include "path_rules.h"
+#include "share_record.h"
 #include "qira/qira_share.h"
 
 namespace QIRA {
@@ -23,10 +24,9 @@ bool GetShareNameByPath(std::string& shareName, const std::string& path) {
 namespace detail {
 
 bool ShareFullPath(const std::string& shareName, const std::string& path, std::string& fullPath) {
-    QIRASHARE* share = nullptr;
-    if (QIRAShareGet(shareName.c_str(), &share) < 0) return false;
+    const ShareRecord share = GetShareRecord(shareName);
+    if (!share) return false;
     const std::string sharePath = share->szPath;
-    QIRAShareFree(share);
     const size_t lastSlash = sharePath.rfind('/');
     fullPath = (lastSlash == std::string::npos ? std::string() : sharePath.substr(0, lastSlash)) + path;
     return true;
