@@ -123,7 +123,8 @@ TEST_F(StatusReportTest, UnknownShareOrQueuePathFailsTheServiceWord) {
     std::string word;
     EXPECT_FALSE(StatusMgr::GetStatus(word));
     EXPECT_TRUE(testkit::Logged("Failed to get share name from path: "));
-    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", 3);  // load, CanPathBeIndexed x2 pass
+    // The load and CanPathBeIndexed need the share too: only a count parts them from the queue path.
+    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", 3);
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
     EXPECT_FALSE(StatusMgr::GetStatus(word));
     EXPECT_TRUE(testkit::Logged("FILEIDXQueuePathGet failed, share=music"));

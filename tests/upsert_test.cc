@@ -153,8 +153,9 @@ TEST_F(UpsertTest, UnreachableDaemonStopsBeforeTheEvents) {
 }
 
 TEST_F(UpsertTest, EventPathThatNoLongerResolvesFailsWithErrorTwo) {
-    // Five lookups of "music" pass (the element twice, then the registration's queue path, load
-    // and folder); the event's full path is the sixth.
+    // Five look-ups of "music" pass (the element twice, the registration's queue path and folder,
+    // the events' paths); the event's full path is the sixth. Every step needs the same share, so
+    // only a count can make it vanish between two of them.
     qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", 5);
     EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])")));
     EXPECT_TRUE(testkit::Logged("GetFullPath failed, path=/music/a"));
