@@ -29,15 +29,7 @@ FakeDaemon::~FakeDaemon() {
     unlink(path_.c_str());
 }
 
-Frame FakeDaemon::Decode(const std::string& bytes) {
-    Frame frame;
-    if (bytes.size() < 4) return frame;
-    std::memcpy(&frame.length, bytes.data(), 4);
-    frame.payload = bytes.substr(4);
-    frame.whole = frame.payload.size() == frame.length && !frame.payload.empty() && frame.payload.back() == '\0';
-    if (frame.whole) QIRA::FILEINDEX::fromString(frame.message, frame.payload.substr(0, frame.payload.size() - 1));
-    return frame;
-}
+Frame FakeDaemon::Decode(const std::string& bytes) { return tools::DecodeDaemonFrame(bytes); }
 
 std::vector<Frame> FakeDaemon::Drain() {
     std::vector<Frame> frames;

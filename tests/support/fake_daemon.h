@@ -6,14 +6,11 @@
 
 #include <json/value.h>
 
+#include "daemon_frame.h"
+
 namespace testkit {
 
-struct Frame {
-    uint32_t length = 0;   // the 4-byte prefix
-    std::string payload;   // the bytes after it (length bytes when whole)
-    Json::Value message;   // parsed JSON text (null when it does not parse)
-    bool whole = false;    // payload has `length` bytes and ends with one NUL
-};
+using Frame = tools::DaemonFrame;
 
 class FakeDaemon {
 public:

@@ -18,6 +18,7 @@
 #include <CLI/CLI.hpp>
 
 #include "cli.h"
+#include "daemon_frame.h"
 #include "fileindex/fileindex.h"
 #include "queue_drain.h"
 
@@ -87,13 +88,14 @@ private:
             if (!ReadExactly(client, &text[0], length)) text.clear();
         }
         close(client);
-        Json::Value message;
-        if (text.empty() || text.back() != '\0' || !QIRA::FILEINDEX::fromString(message, text.substr(0, text.size() - 1))) {
+        const tools::DaemonFrame frame =
+            tools::DecodeDaemonFrame(std::string(reinterpret_cast<const char*>(&length), sizeof length) + text);
+        if (!frame.message.isObject()) {
             std::cout << "fileindexd-ref: malformed frame" << std::endl;
             return;
         }
-        std::cout << "fileindexd-ref: command " << QIRA::FILEINDEX::toString(message) << std::endl;
-        Apply(message);
+        std::cout << "fileindexd-ref: command " << QIRA::FILEINDEX::toString(frame.message) << std::endl;
+        Apply(frame.message);
     }
 
     void Apply(const Json::Value& message) {
