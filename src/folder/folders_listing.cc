@@ -51,7 +51,7 @@ bool Folders::List(Json::Value& out, unsigned long offset, unsigned long limit, 
     std::vector<Folder> onPage(first, first + static_cast<long>(count));
     if (descending) std::reverse(onPage.begin(), onPage.end());
     // The statuses of the page come from one reading of each queue file.
-    const detail::FolderStatusBatch batch(onPage);
+    detail::FolderStatusBatch batch(onPage);
     Json::Value page(Json::arrayValue);
     for (const auto& folder : onPage) page.append(folder.asJson(additional));
     out["folder"] = page;

@@ -84,7 +84,9 @@ FolderStatusBatch::QueueReading& FolderStatusBatch::Read(const std::string& queu
     struct stat st;
     const bool present = lstat(queuePath.c_str(), &st) == 0;
     auto found = readings_.find(queuePath);
-    if (found != readings_.end() && present && found->second.dev == st.st_dev && found->second.ino == st.st_ino) {
+    struct stat held;
+    if (found != readings_.end() && present && found->second.dev == st.st_dev && found->second.ino == st.st_ino &&
+        fstat(found->second.fd, &held) == 0 && held.st_size == found->second.size) {
         return found->second;
     }
     QueueReading reading;
@@ -94,6 +96,7 @@ FolderStatusBatch::QueueReading& FolderStatusBatch::Read(const std::string& queu
     } else if (fstat(reading.fd, &st) == 0) {
         reading.dev = st.st_dev;
         reading.ino = st.st_ino;
+        reading.size = st.st_size;
         ScanQueue(
             reading.fd,
             [&](const QueueRecord& record) {

@@ -38,6 +38,7 @@ private:
     struct QueueReading {
         dev_t dev = 0;
         ino_t ino = 0;
+        off_t size = 0;  // when read; a file that has changed since is read again
         int fd = -1;     // kept open to read malformed lines again for their log lines
         int openErrno = 0;
         std::vector<std::pair<off_t, size_t>> malformed;

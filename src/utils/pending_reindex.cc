@@ -40,11 +40,20 @@ PendingReindex::PendingReindex(const std::vector<std::string>& paths) {
     for (const auto& path : paths) Watch(path);
 }
 
+PendingReindex::~PendingReindex() { Forget(); }
+
+void PendingReindex::Forget() {
+    for (auto& entry : files_) {
+        if (entry.second.fd >= 0) close(entry.second.fd);
+    }
+    files_.clear();
+}
+
 void PendingReindex::Watch(const std::string& path) {
     if (wanted_.count(path) != 0) return;
     owned_.push_back(std::make_unique<std::string>(path));
     wanted_.insert(*owned_.back());
-    files_.clear();  // what was read so far was not read for this path
+    Forget();  // what was read so far was not read for this path
 }
 
 // Without a backslash every string of the line stands verbatim between two quotes, so a line in
@@ -63,12 +72,20 @@ bool PendingReindex::MayCarryWantedPath(const char* begin, const char* end) cons
 
 void PendingReindex::CatchUp(int fd, FileState& state) {
     struct stat st;
-    if (fstat(fd, &st) != 0) return;
-    if (st.st_dev != state.dev || st.st_ino != state.ino || st.st_size < state.scanned ||
+    if (fstat(fd, &st) != 0) {
+        close(fd);
+        return;
+    }
+    if (state.fd < 0 || st.st_dev != state.dev || st.st_ino != state.ino || st.st_size < state.scanned ||
         !SameTail(fd, state.scanned, state.tail)) {
+        if (state.fd >= 0) close(state.fd);
         state = FileState();
         state.dev = st.st_dev;
         state.ino = st.st_ino;
+        state.fd = fd;
+    } else {
+        close(fd);  // the same file as the one held
+        fd = state.fd;
     }
     if (lseek(fd, state.scanned, SEEK_SET) != state.scanned) return;
     LineReader lines(fd);
@@ -96,7 +113,6 @@ bool PendingReindex::IsQueued(const std::string& path, const std::string& queueF
     }
     FileState& state = files_[queueFile];
     CatchUp(fd, state);
-    close(fd);
     return state.queued.count(path) != 0;
 }
 

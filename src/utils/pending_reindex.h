@@ -20,13 +20,19 @@ namespace detail {
 class PendingReindex {
 public:
     explicit PendingReindex(const std::vector<std::string>& paths);
+    ~PendingReindex();
+    PendingReindex(const PendingReindex&) = delete;
+    PendingReindex& operator=(const PendingReindex&) = delete;
 
     // True when `queueFile` holds a reindex record for exactly the full path `path`. A file that
     // exists but cannot be opened logs "Failed to open queue=%s, reason=%m" and answers false.
     bool IsQueued(const std::string& path, const std::string& queueFile);
 
 private:
+    // The file read is kept open, so that its inode cannot be reused by a new queue file that
+    // would then pass for it.
     struct FileState {
+        int fd = -1;
         dev_t dev = 0;
         ino_t ino = 0;
         off_t scanned = 0;       // bytes read up to the last complete line
@@ -35,8 +41,10 @@ private:
     };
 
     void Watch(const std::string& path);
-    // Reads the lines of `fd` from `state.scanned` on, or all of it when the file is not the one read.
+    // Reads the lines of `fd` from `state.scanned` on, or all of it when the file is not the one
+    // read; takes ownership of `fd`.
     void CatchUp(int fd, FileState& state);
+    void Forget();
     bool MayCarryWantedPath(const char* begin, const char* end) const;
 
     std::vector<std::unique_ptr<std::string>> owned_;
