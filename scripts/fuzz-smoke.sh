@@ -17,8 +17,10 @@ for target in folder_conf status_conf queue_scan requests queue_line folder_conf
   echo "fuzz_$target: ${seconds}s"
   build-fuzz/fuzz/fuzz_"$target" "$work/$target" -max_total_time="$seconds" -max_len=4096 \
     -artifact_prefix="$work/$target-" 2>&1 | grep -E "^Done|ERROR|SUMMARY" || true
-  if ls "$work/$target"-crash-* "$work/$target"-leak-* "$work/$target"-timeout-* >/dev/null 2>&1; then
-    echo "fuzz_$target found a failure:" "$work/$target"-*
+  if compgen -G "$work/$target-crash-*" >/dev/null || compgen -G "$work/$target-leak-*" >/dev/null ||
+    compgen -G "$work/$target-timeout-*" >/dev/null || compgen -G "$work/$target-oom-*" >/dev/null; then
+    echo "fuzz_$target found a failure:"
+    for artifact in "$work/$target"-*-*; do echo "== $artifact"; od -c "$artifact" | head -20; done
     exit 1
   fi
 done

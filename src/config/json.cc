@@ -50,30 +50,36 @@ const Json::StreamWriterBuilder& CompactWriter() {
 
 struct Outline {
     bool slashOutsideStrings = false;
-    bool stringOpen = false;
-    long depth = 0;  // openers minus closers outside strings
+    bool stringOpen = false;  // at the end of what jsoncpp reads
+    long depth = 0;           // openers minus closers outside strings, in what jsoncpp reads
 };
 
-// What a strict reading can tell without parsing: strings end at an unescaped quote, as in jsoncpp.
+// What a strict reading can tell without parsing: strings end at an unescaped quote, and jsoncpp
+// reads a NUL byte outside a string as the end of the text.
 Outline OutlineOf(const char* begin, const char* end) {
     Outline outline;
+    bool inString = false;
     bool escaped = false;
+    bool ended = false;
     for (const char* p = begin; p < end; ++p) {
         const char c = *p;
         if (escaped) {
             escaped = false;
-        } else if (outline.stringOpen) {
+        } else if (inString) {
             escaped = c == '\\';
-            outline.stringOpen = c != '"';
+            inString = c != '"';
         } else if (c == '"') {
-            outline.stringOpen = true;
-        } else if (c == '{' || c == '[') {
-            ++outline.depth;
-        } else if (c == '}' || c == ']') {
-            --outline.depth;
+            inString = true;
         } else if (c == '/') {
             outline.slashOutsideStrings = true;  // jsoncpp would skip it as a comment inside containers
+        } else if (c == '\0') {
+            ended = true;
+        } else if (!ended && (c == '{' || c == '[')) {
+            ++outline.depth;
+        } else if (!ended && (c == '}' || c == ']')) {
+            --outline.depth;
         }
+        if (!ended) outline.stringOpen = inString;
     }
     return outline;
 }
