@@ -1,14 +1,12 @@
 #include "api.h"
 
-#include <climits>
-#include <cstdint>
-#include <ctime>
 #include <functional>
 #include <mutex>
 #include <set>
 
 #include "captured_log.h"
 #include "envelope.h"
+#include "pause.h"
 #include "fileindex/fileindex.h"
 #include "saved_files.h"
 
@@ -123,13 +121,6 @@ Json::Value Additional(const std::string& list) {
     return additional;
 }
 
-Json::Value PauseState(long long resumeTime) {
-    Json::Value pause(Json::objectValue);
-    pause["paused"] = resumeTime == 0 || (resumeTime > 0 && time(nullptr) < resumeTime);
-    pause["resume_time"] = static_cast<Json::Int64>(resumeTime);
-    return pause;
-}
-
 bool ServiceStatus(Json::Value& result) {
     std::string word;
     long long resumeTime = -1;
@@ -139,7 +130,7 @@ bool ServiceStatus(Json::Value& result) {
         return false;
     }
     result["status"] = word;
-    result["pause"] = PauseState(resumeTime);
+    result["pause"] = tools::PauseState(resumeTime);
     std::set<std::string> shares;
     for (const auto& folder : folders) {
         std::string share;
@@ -156,13 +147,10 @@ bool ServiceStatus(Json::Value& result) {
     return true;
 }
 
-// Hours of a pause whose end does not pass the 32-bit resume time; -1 when not acceptable.
+// Hours of an acceptable pause; -1 when not a whole number, negative, or ending past 2038.
 int PauseHours(const Json::Value& body) {
     const Json::Value& hours = body["hours"];
-    if (!hours.isIntegral() || hours.asLargestInt() < 0) return -1;
-    const long long last = INT32_MAX;
-    if (hours.asLargestInt() > (last - static_cast<long long>(time(nullptr))) / 3600) return -1;
-    return static_cast<int>(hours.asLargestInt());
+    return hours.isIntegral() && tools::PauseEndFits(hours.asLargestInt()) ? static_cast<int>(hours.asLargestInt()) : -1;
 }
 
 std::string ShareOf(const Json::Value& body) {
@@ -200,7 +188,7 @@ void AddApiRoutes(httplib::Server& server, const std::string& token) {
          [](const Json::Value& body, Json::Value&) { return IndexMgr::Delete(body); });
     Post(server, token, "/api/reindex", "reindex", [](const Json::Value& body, Json::Value&) { return IndexMgr::Reindex(body); });
     Post(server, token, "/api/resume", "resume", [](const Json::Value&, Json::Value& result) {
-        result["pause"] = PauseState(-1);
+        result["pause"] = tools::PauseState(-1);
         return StatusMgr::Resume();
     });
     server.Post("/api/pause", [token](const httplib::Request& req, httplib::Response& res) {
@@ -212,7 +200,7 @@ void AddApiRoutes(httplib::Server& server, const std::string& token) {
             long long resumeTime = -1;
             const bool paused = StatusMgr::Pause(hours);
             StatusMgr::GetPauseInfo(resumeTime);
-            result["pause"] = PauseState(resumeTime);
+            result["pause"] = tools::PauseState(resumeTime);
             return paused;
         });
     });

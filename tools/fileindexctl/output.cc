@@ -64,13 +64,4 @@ std::string FormatLocalTime(long long epochSeconds) {
     return buffer;
 }
 
-std::string FormatUtc(long long epochSeconds) {
-    const time_t when = static_cast<time_t>(epochSeconds);
-    struct tm utc;
-    if (gmtime_r(&when, &utc) == nullptr) return std::to_string(epochSeconds);
-    char buffer[64];
-    strftime(buffer, sizeof buffer, "%Y-%m-%dT%H:%M:%SZ", &utc);
-    return buffer;
-}
-
 }  // namespace fileindexctl

@@ -36,6 +36,5 @@ private:
 };
 
 std::string FormatLocalTime(long long epochSeconds);
-std::string FormatUtc(long long epochSeconds);
 
 }  // namespace fileindexctl

@@ -3,6 +3,7 @@
 #include <set>
 
 #include "commands.h"
+#include "pause.h"
 #include "fileindex/fileindex.h"
 
 namespace fileindexctl {
@@ -37,16 +38,6 @@ std::string Join(const Json::Value& items) {
     return text.empty() ? "-" : text;
 }
 
-// The pause state for machines: whether paused, the resume time in epoch seconds (0 = until
-// resumed, -1 = running) and the same time in ISO-8601 UTC when there is one.
-Json::Value PauseState(long long resumeTime) {
-    Json::Value pause(Json::objectValue);
-    pause["paused"] = resumeTime == 0 || (resumeTime > 0 && time(nullptr) < resumeTime);
-    pause["resume_time"] = static_cast<Json::Int64>(resumeTime);
-    pause["resume_time_utc"] = resumeTime > 0 ? Json::Value(FormatUtc(resumeTime)) : Json::Value();
-    return pause;
-}
-
 int Status(Context& ctx) {
     std::string word;
     long long resumeTime = -1;
@@ -55,7 +46,7 @@ int Status(Context& ctx) {
     }
     Json::Value out(Json::objectValue);
     out["status"] = word;
-    out["pause"] = PauseState(resumeTime);
+    out["pause"] = tools::PauseState(resumeTime);
     out["no_space"] = Json::Value(Json::arrayValue);
     out["need_reindex"] = Json::Value(Json::arrayValue);
     ShareFlags(out["no_space"], out["need_reindex"]);
@@ -86,7 +77,7 @@ void AddServiceCommands(CLI::App& app, Context& ctx) {
         long long resumeTime = -1;
         StatusMgr::GetPauseInfo(resumeTime);
         Json::Value out(Json::objectValue);
-        out["pause"] = PauseState(resumeTime);
+        out["pause"] = tools::PauseState(resumeTime);
         ctx.out.Emit(out, PauseText(resumeTime));
     });
     service->add_subcommand("resume", "Resume indexing")->callback([&ctx] {
@@ -95,7 +86,7 @@ void AddServiceCommands(CLI::App& app, Context& ctx) {
             return;
         }
         Json::Value out(Json::objectValue);
-        out["pause"] = PauseState(-1);
+        out["pause"] = tools::PauseState(-1);
         ctx.out.Emit(out, "running");
     });
 

@@ -1,8 +1,7 @@
 #include "validators.h"
 
-#include <cstdint>
-#include <ctime>
-#include <limits>
+#include "pause.h"
+
 
 namespace fileindexctl {
 
@@ -16,8 +15,7 @@ const CLI::Validator PauseHours(
     [](std::string& text) -> std::string {
         long long hours = 0;
         if (!CLI::detail::lexical_cast(text, hours) || hours < 0) return "hours must be a whole number, 0 or more";
-        const long long last = std::numeric_limits<int32_t>::max();
-        if (hours > (last - static_cast<long long>(time(nullptr))) / 3600) {
+        if (!tools::PauseEndFits(hours)) {
             return "a pause of " + text + " hours would end after 2038-01-19 03:14:07 UTC, where the resume time "
                    "wraps and reads as running; use --hours 0 to pause until resumed";
         }
