@@ -209,9 +209,14 @@ TEST_F(ToolTest, RootOptionStandsInForTheEnvironment) {
     const std::string root = Path("");
     unsetenv("QIRA_ROOT");
     const auto result = testkit::Run({FILEINDEXCTL, "--root", root, "share", "paths", "music"});
+    const auto shares = testkit::Run({QIRA_SIM, "--root", root, "--json", "share", "list"});
     setenv("QIRA_ROOT", root.c_str(), 1);
     ASSERT_EQ(result.status, 0) << result.err;
     EXPECT_NE(result.out.find(QueueOf("music")), std::string::npos);
+    ASSERT_EQ(shares.status, 0) << shares.err;
+    const auto envelope = testkit::ParseJson(shares.out);
+    EXPECT_TRUE(envelope["ok"].asBool());
+    EXPECT_EQ(envelope["result"]["music"]["path"].asString(), music_);
 }
 
 TEST_F(ToolTest, BashCompletionOffersTheSubcommands) {

@@ -12,6 +12,12 @@
 
 namespace fileindexctl {
 
+using tools::Output;
+using tools::Table;
+using tools::FormatLocalTime;
+
+constexpr int kExitUnknown = 2;  // a question whose answer could not be worked out
+
 struct Context {
     Output out;
     int status = 0;

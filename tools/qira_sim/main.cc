@@ -1,97 +1,130 @@
 // qira-sim: set up and inspect a simulated appliance under a root, by hand or from scripts.
-#include <cstdlib>
-#include <iostream>
-
 #include <CLI/CLI.hpp>
 
 #include "fileindex/json.h"
 #include "cli.h"
+#include "output.h"
 #include "fileindex/root.h"
 #include "qira_sim/appliance.h"
 
 namespace {
 
-void Print(const Json::Value& value) { std::cout << value.toStyledString(); }
+// What the command line fills in; one instance lives in main for the whole run.
+struct Options {
+    tools::Output out{"qira-sim"};
+    std::string root;
+    std::string name, dir;
+    bool encrypted = false, encryption = false, readOnly = false;
+    int fsType = 2;
+    long long quotaFree = -1;
+    std::vector<std::string> mountPoints;
+    std::string op, arg;
+    int err = 0x0100, skip = 0;
+    bool clearJournal = false;
+    std::string service, state, onOff;
+};
 
-void AddShareCommands(CLI::App& app) {
+void Show(const Options& options, const Json::Value& value) {
+    std::string text = value.toStyledString();
+    if (!text.empty() && text.back() == '\n') text.pop_back();
+    options.out.Emit(value, text);
+}
+
+Json::Value ShareProperties(const Options& o) {
+    Json::Value props(Json::objectValue);
+    props["encrypted"] = o.encrypted;
+    props["encryption"] = o.encryption;
+    props["read_only"] = o.readOnly;
+    props["fs_type"] = o.fsType;
+    if (o.quotaFree >= 0) props["quota_free"] = static_cast<Json::Int64>(o.quotaFree);
+    for (const auto& point : o.mountPoints) props["mount_points"].append(point);
+    return props;
+}
+
+void AddShareCommands(CLI::App& app, Options& o) {
     auto* share = app.add_subcommand("share", "Shares of the appliance");
     share->require_subcommand(1);
-    static std::string name, dir;
-    static bool encrypted = false, encryption = false, readOnly = false;
-    static int fsType = 2;
-    static long long quotaFree = -1;
-    static std::vector<std::string> mountPoints;
     auto* add = share->add_subcommand("add", "Add or replace a share (its directory must exist)");
-    add->add_option("name", name)->required();
-    add->add_option("dir", dir, "The share's directory (its full path)")->required()->check(CLI::ExistingDirectory);
-    add->add_flag("--encrypted", encrypted, "The share's volume is locked");
-    add->add_flag("--encryption", encryption, "The share uses encryption (its directory is a mount)");
-    add->add_flag("--read-only", readOnly);
-    add->add_option("--fs-type", fsType, "2 ext4, 12 never indexed, 20-29 remote, 30-39 image");
-    add->add_option("--quota-free", quotaFree, "Bytes the share's quota still allows");
-    add->add_option("--mount-point", mountPoints, "Full paths to report as mount points");
-    add->callback([] {
-        Json::Value props(Json::objectValue);
-        props["encrypted"] = encrypted;
-        props["encryption"] = encryption;
-        props["read_only"] = readOnly;
-        props["fs_type"] = fsType;
-        if (quotaFree >= 0) props["quota_free"] = static_cast<Json::Int64>(quotaFree);
-        for (const auto& point : mountPoints) props["mount_points"].append(point);
-        qira_sim::PutShare(name, dir, props);
-    });
+    add->add_option("name", o.name)->required();
+    add->add_option("dir", o.dir, "The share's directory (its full path)")->required()->check(CLI::ExistingDirectory);
+    add->add_flag("--encrypted", o.encrypted, "The share's volume is locked");
+    add->add_flag("--encryption", o.encryption, "The share uses encryption (its directory is a mount)");
+    add->add_flag("--read-only", o.readOnly);
+    add->add_option("--fs-type", o.fsType, "2 ext4, 12 never indexed, 20-29 remote, 30-39 image");
+    add->add_option("--quota-free", o.quotaFree, "Bytes the share's quota still allows");
+    add->add_option("--mount-point", o.mountPoints, "Full paths to report as mount points");
+    add->callback([&o] { qira_sim::PutShare(o.name, o.dir, ShareProperties(o)); });
     auto* remove = share->add_subcommand("remove", "Remove a share from the share table");
-    remove->add_option("name", name)->required();
-    remove->callback([] { qira_sim::RemoveShare(name); });
-    share->add_subcommand("list", "Show the share table")->callback([] { Print(qira_sim::Shares()); });
+    remove->add_option("name", o.name)->required();
+    remove->callback([&o] { qira_sim::RemoveShare(o.name); });
+    share->add_subcommand("list", "Show the share table")->callback([&o] { Show(o, qira_sim::Shares()); });
 }
 
-void AddFaultCommands(CLI::App& app) {
+void AddFaultCommands(CLI::App& app, Options& o) {
     auto* fault = app.add_subcommand("fault", "Make platform operations fail");
     fault->require_subcommand(1);
-    static std::string op, arg;
-    static int err = 0x0100, skip = 0;
     auto* set = fault->add_subcommand("set", "Make an operation fail with a platform error number");
-    set->add_option("op", op, "Operation, e.g. QLIBServiceStart or MonitorQueue::Upsert")->required();
-    set->add_option("--err", err, "Platform error number (e.g. 0x2900)");
-    set->add_option("--arg", arg, "Only when the first argument equals this");
-    set->add_option("--skip", skip, "Let this many matching calls pass first");
-    set->callback([] { qira_sim::InjectFault(op, err, arg, skip); });
+    set->add_option("op", o.op, "Operation, e.g. QLIBServiceStart or MonitorQueue::Upsert")->required();
+    set->add_option("--err", o.err, "Platform error number (e.g. 0x2900)");
+    set->add_option("--arg", o.arg, "Only when the first argument equals this");
+    set->add_option("--skip", o.skip, "Let this many matching calls pass first");
+    set->callback([&o] { qira_sim::InjectFault(o.op, o.err, o.arg, o.skip); });
     auto* clear = fault->add_subcommand("clear", "Clear one fault, or all");
-    clear->add_option("op", op);
-    clear->callback([] { op.empty() ? qira_sim::ClearFaults() : qira_sim::ClearFault(op); });
-    fault->add_subcommand("list", "Show the faults")->callback([] { Print(qira_sim::Faults()); });
+    clear->add_option("op", o.op);
+    clear->callback([&o] { o.op.empty() ? qira_sim::ClearFaults() : qira_sim::ClearFault(o.op); });
+    fault->add_subcommand("list", "Show the faults")->callback([&o] { Show(o, qira_sim::Faults()); });
 }
 
-void AddInspectCommands(CLI::App& app) {
-    static bool clear = false;
-    auto* journal = app.add_subcommand("journal", "Show the platform calls the library made");
-    journal->add_flag("--clear", clear, "Empty the journal afterwards");
-    journal->callback([] {
-        for (const auto& entry : qira_sim::Journal()) std::cout << QIRA::FILEINDEX::toString(entry) << "\n";
-        if (clear) qira_sim::ClearJournal();
-    });
-    app.add_subcommand("monitors", "Show the monitor-queue registrations")->callback([] { Print(qira_sim::Registrations()); });
-    app.add_subcommand("notices", "Show the administrator notices raised")->callback([] {
-        for (const auto& call : qira_sim::NotifierCalls()) {
-            for (const auto& arg : call) std::cout << arg << " ";
-            std::cout << "\n";
+void ShowJournal(const Options& o) {
+    Json::Value entries(Json::arrayValue);
+    std::string text;
+    for (const auto& entry : qira_sim::Journal()) {
+        entries.append(entry);
+        text += (text.empty() ? "" : "\n") + QIRA::FILEINDEX::toString(entry);
+    }
+    if (!text.empty() || o.out.json) o.out.Emit(entries, text);
+}
+
+void ShowNotices(const Options& o) {
+    Json::Value calls(Json::arrayValue);
+    std::string text;
+    for (const auto& call : qira_sim::NotifierCalls()) {
+        Json::Value args(Json::arrayValue);
+        for (const auto& arg : call) {
+            args.append(arg);
+            text += arg + " ";
         }
+        calls.append(args);
+        text += "\n";
+    }
+    if (!text.empty()) text.pop_back();
+    if (!text.empty() || o.out.json) o.out.Emit(calls, text);
+}
+
+void AddInspectCommands(CLI::App& app, Options& o) {
+    auto* journal = app.add_subcommand("journal", "Show the platform calls the library made");
+    journal->add_flag("--clear", o.clearJournal, "Empty the journal afterwards");
+    journal->callback([&o] {
+        ShowJournal(o);
+        if (o.clearJournal) qira_sim::ClearJournal();
     });
-    static std::string service, state;
+    app.add_subcommand("monitors", "Show the monitor-queue registrations")->callback([&o] {
+        Show(o, qira_sim::Registrations());
+    });
+    app.add_subcommand("notices", "Show the administrator notices raised")->callback([&o] { ShowNotices(o); });
     auto* svc = app.add_subcommand("service", "Show or set a service's state");
-    svc->add_option("name", service)->required();
-    svc->add_option("state", state)->check(CLI::IsMember({"running", "stopped"}));
-    svc->callback([] {
-        if (!state.empty()) qira_sim::SetServiceState(service, state);
-        std::cout << qira_sim::ServiceState(service) << "\n";
+    svc->add_option("name", o.service)->required();
+    svc->add_option("state", o.state)->check(CLI::IsMember({"running", "stopped"}));
+    svc->callback([&o] {
+        if (!o.state.empty()) qira_sim::SetServiceState(o.service, o.state);
+        const std::string state = qira_sim::ServiceState(o.service);
+        o.out.Emit(state, state);
     });
-    static std::string onOff;
     auto* spotlight = app.add_subcommand("spotlight", "Show or set the SMB Spotlight switch");
-    spotlight->add_option("state", onOff)->check(CLI::IsMember({"on", "off"}));
-    spotlight->callback([] {
-        if (!onOff.empty()) qira_sim::SetSpotlightState(onOff == "on");
-        std::cout << (qira_sim::SpotlightState() ? "on" : "off") << "\n";
+    spotlight->add_option("state", o.onOff)->check(CLI::IsMember({"on", "off"}));
+    spotlight->callback([&o] {
+        if (!o.onOff.empty()) qira_sim::SetSpotlightState(o.onOff == "on");
+        o.out.Emit(qira_sim::SpotlightState(), qira_sim::SpotlightState() ? "on" : "off");
     });
 }
 
@@ -101,18 +134,19 @@ int main(int argc, char** argv) {
     CLI::App app{"Set up and inspect a simulated appliance", "qira-sim"};
     app.require_subcommand(1);
     app.set_version_flag("--version", "qira-sim " FILEINDEX_VERSION);
-    std::string root;
-    app.add_option("--root", root, "Root of the simulated appliance (instead of QIRA_ROOT)");
-    app.parse_complete_callback([&root] {
-        if (!root.empty()) QIRA::FILEINDEX::UseRootPrefix(root);
+    Options options;
+    app.add_option("--root", options.root, "Root of the simulated appliance (instead of QIRA_ROOT)");
+    app.add_flag("--json", options.out.json, "Print one JSON object: {\"ok\", \"result\", ...}");
+    app.parse_complete_callback([&options] {
+        if (!options.root.empty()) QIRA::FILEINDEX::UseRootPrefix(options.root);
     });
     app.add_subcommand("init", "Create the appliance's directories, notifier and default services")->callback([] {
         // A simulated appliance never goes into the real root.
         if (qira_sim::Root().empty()) throw CLI::ValidationError("--root", "give --root or QIRA_ROOT");
         if (!qira_sim::InitAppliance(qira_sim::Root())) throw CLI::RuntimeError("cannot create the appliance", 1);
     });
-    AddShareCommands(app);
-    AddFaultCommands(app);
-    AddInspectCommands(app);
+    AddShareCommands(app, options);
+    AddFaultCommands(app, options);
+    AddInspectCommands(app, options);
     return tools::Parse(app, argc, argv).value_or(0);
 }

@@ -1,4 +1,4 @@
-// How fileindexctl prints results and failures.
+// How the tools print results and failures.
 //
 // With --json every command prints one object on stdout, of the same shape for success and
 // failure: {"ok", "result", "error": {"name", "number"}, "message", "log", "saved"}. Without it a
@@ -12,16 +12,15 @@
 
 #include <json/value.h>
 
-namespace fileindexctl {
+namespace tools {
 
 using Table = std::vector<std::vector<std::string>>;
 
 constexpr int kExitFailure = 1;
-constexpr int kExitUsage = 2;
-constexpr int kExitUnknown = 2;  // a question whose answer could not be worked out
 
 class Output {
 public:
+    std::string tool = "fileindexctl";  // names the tool in what goes to stderr
     bool json = false;
     bool quiet = false;
 
@@ -37,4 +36,4 @@ private:
 
 std::string FormatLocalTime(long long epochSeconds);
 
-}  // namespace fileindexctl
+}  // namespace tools

@@ -9,11 +9,11 @@
 #include "fileindex/error.h"
 #include "fileindex/json.h"
 
-namespace fileindexctl {
+namespace tools {
 
 void Output::EmitEnvelope(bool ok, const Json::Value& result, const std::string& message,
                           const std::vector<std::string>& saved) const {
-    std::cout << QIRA::FILEINDEX::toString(tools::Envelope(ok, result, message, saved)) << "\n";
+    std::cout << QIRA::FILEINDEX::toString(Envelope(ok, result, message, saved)) << "\n";
 }
 
 void Output::Emit(const Json::Value& result, const Table& table) const {
@@ -39,17 +39,17 @@ void Output::Emit(const Json::Value& result, const std::string& text) const {
 }
 
 int Output::Fail(const std::string& operation, const std::vector<std::string>& saved) const {
-    const std::string message = tools::FailureMessage(operation);
+    const std::string message = FailureMessage(operation);
     if (json) {
         EmitEnvelope(false, Json::Value(), message, saved);
         return kExitFailure;
     }
-    std::cerr << "fileindexctl: " << message << "\n";
+    std::cerr << tool << ": " << message << "\n";
     if (!quiet) {
-        for (const auto& line : tools::CapturedLog()) std::cerr << "fileindexctl: log: " << line << "\n";
+        for (const auto& line : CapturedLog()) std::cerr << tool << ": log: " << line << "\n";
     }
     for (const auto& file : saved) {
-        std::cerr << "fileindexctl: " << file << " was already saved with the change; the steps after it did "
+        std::cerr << tool << ": " << file << " was already saved with the change; the steps after it did "
                      "not all succeed\n";
     }
     return kExitFailure;
@@ -64,4 +64,4 @@ std::string FormatLocalTime(long long epochSeconds) {
     return buffer;
 }
 
-}  // namespace fileindexctl
+}  // namespace tools
