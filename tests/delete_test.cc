@@ -138,9 +138,8 @@ TEST_F(DeleteTest, FailuresAfterTheSaveAreReportedWithTheirMessages) {
 
 TEST_F(DeleteTest, CleanupFailureKeepsTheMonitorQueue) {
     Seed(R"({"/music/a": {}, "/photo/a": {}})");
-    // Look-ups of "music" pass for the load, the delete, the event (its path, its full path and
-    // its queue), then fail: every step before the clean-up needs the same share, so it is counted.
-    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", 5);
+    // The share vanishes once the event's queue is known, before the clean-up asks for it again.
+    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", {"QIRAEAMKDir", ""});
     EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a"])")));
     EXPECT_TRUE(testkit::Logged("CleanShareIndexData failed, share=music"));
     EXPECT_EQ(qira_sim::Registrations().size(), 1u);

@@ -41,12 +41,11 @@ TEST_F(NotifydCfgTest, AnUnresolvableFolderChangesNoRegistration) {
     Settle();
     EXPECT_FALSE(IndexMgr::UpsertQIRANotifydCfg("music"));
     EXPECT_TRUE(testkit::Logged("FILEIDXQueuePathGet failed, share=music"));
-    // Queue path and the first folder resolve, the second folder does not. All three folders are in
-    // one share, so only the share vanishing between two look-ups can part them: counted here.
-    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", 3);  // queue path, the load, /music/a
+    // The share vanishes once its queue path is known: the folders no longer resolve.
+    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", {"QIRAEAMKDir", ""});
     testkit::ClearLog();
     EXPECT_FALSE(IndexMgr::UpsertQIRANotifydCfg("music"));
-    EXPECT_TRUE(testkit::Logged("GetFullPath failed, path=/music/b"));
+    EXPECT_TRUE(testkit::Logged("GetFullPath failed, path=/music/a"));
     EXPECT_TRUE(qira_sim::Journal().empty());
     EXPECT_EQ(qira_sim::Registrations()[0]["description"]["config"].size(), 1u);
 }

@@ -123,9 +123,9 @@ TEST_F(StatusReportTest, UnknownShareOrQueuePathFailsTheServiceWord) {
     std::string word;
     EXPECT_FALSE(StatusMgr::GetStatus(word));
     EXPECT_TRUE(testkit::Logged("Failed to get share name from path: "));
-    // The load and CanPathBeIndexed need the share too: only a count parts them from the queue path.
-    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", 3);
+    // The share vanishes after the indexability rules, before its queue path is asked for.
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
+    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", {"QIRAFSDirIsMntPoint", ShareDir("music") + "/a"});
     EXPECT_FALSE(StatusMgr::GetStatus(word));
     EXPECT_TRUE(testkit::Logged("FILEIDXQueuePathGet failed, share=music"));
 }

@@ -153,10 +153,8 @@ TEST_F(UpsertTest, UnreachableDaemonStopsBeforeTheEvents) {
 }
 
 TEST_F(UpsertTest, EventPathThatNoLongerResolvesFailsWithErrorTwo) {
-    // Five look-ups of "music" pass (the element twice, the registration's queue path and folder,
-    // the events' paths); the event's full path is the sixth. Every step needs the same share, so
-    // only a count can make it vanish between two of them.
-    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", 5);
+    // The share vanishes once the daemon has been started, before the events are queued.
+    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", {"QLIBServiceStart", "fileindexd"});
     EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])")));
     EXPECT_TRUE(testkit::Logged("GetFullPath failed, path=/music/a"));
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_PATH);

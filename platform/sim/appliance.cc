@@ -106,12 +106,16 @@ void SetSpotlightState(bool on) {
 
 bool SpotlightState() { return ReadState("services.json", DefaultServices())["spotlight"].asBool(); }
 
-void InjectFault(const std::string& op, int err, const std::string& arg, int skip) {
+void InjectFault(const std::string& op, int err, const std::string& arg, const Call& after) {
     UpdateState("faults.json", Json::Value(Json::objectValue), [&](Json::Value& faults) {
         Json::Value fault(Json::objectValue);
         fault["err"] = err;
         if (!arg.empty()) fault["arg"] = arg;
-        if (skip > 0) fault["skip"] = skip;
+        if (!after.op.empty()) {
+            fault["after"]["op"] = after.op;
+            if (!after.arg.empty()) fault["after"]["arg"] = after.arg;
+            fault["armed"] = false;
+        }
         faults[op] = fault;
     });
 }

@@ -132,19 +132,37 @@ void AppendJournal(const std::string& op, const Json::Value& args, const Json::V
     close(fd);
 }
 
+namespace {
+
+bool Matches(const Json::Value& call, const char* op, const std::string& arg) {
+    return call.isObject() && call.get("op", "").asString() == op &&
+           (!call.isMember("arg") || call["arg"].asString() == arg);
+}
+
+// Arms the faults waiting for this call; they apply to the calls after it.
+void ArmFaultsAfter(const Json::Value& faults, const char* op, const std::string& arg) {
+    bool waiting = false;
+    for (const auto& fault : faults) waiting = waiting || (fault.isObject() && !fault.get("armed", true).asBool() &&
+                                                           Matches(fault["after"], op, arg));
+    if (!waiting) return;
+    UpdateState("faults.json", Json::Value(Json::objectValue), [&](Json::Value& all) {
+        for (auto& fault : all) {
+            if (fault.isObject() && Matches(fault["after"], op, arg)) fault["armed"] = true;
+        }
+    });
+}
+
+}  // namespace
+
 bool Faulted(const char* op, const std::string& arg) {
     static const Json::Value kNone(Json::objectValue);
-    const Json::Value& faults = ReadState("faults.json", kNone);
-    if (!faults.isObject() || !faults.isMember(op)) return false;
+    const Json::Value faults = ReadState("faults.json", kNone);
+    if (!faults.isObject()) return false;
+    ArmFaultsAfter(faults, op, arg);
+    if (!faults.isMember(op)) return false;
     const Json::Value& fault = faults[op];
-    if (!fault.isObject()) return false;
+    if (!fault.isObject() || !fault.get("armed", true).asBool()) return false;
     if (fault.isMember("arg") && fault["arg"].isString() && fault["arg"].asString() != arg) return false;
-    if (fault.get("skip", 0).isInt() && fault.get("skip", 0).asInt() > 0) {
-        UpdateState("faults.json", Json::Value(Json::objectValue), [op](Json::Value& all) {
-            if (all[op].isObject()) all[op]["skip"] = all[op].get("skip", 1).asInt() - 1;
-        });
-        return false;
-    }
     const int err = fault.get("err", 0x0100).isInt() ? fault.get("err", 0x0100).asInt() : 0x0100;
     SetError(err, (std::string("sim/") + op).c_str(), 1);
     return true;

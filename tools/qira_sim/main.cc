@@ -19,7 +19,8 @@ struct Options {
     long long quotaFree = -1;
     std::vector<std::string> mountPoints;
     std::string op, arg;
-    int err = 0x0100, skip = 0;
+    int err = 0x0100;
+    std::string afterOp, afterArg;
     bool clearJournal = false;
     std::string service, state, onOff;
 };
@@ -67,8 +68,9 @@ void AddFaultCommands(CLI::App& app, Options& o) {
     set->add_option("op", o.op, "Operation, e.g. QLIBServiceStart or MonitorQueue::Upsert")->required();
     set->add_option("--err", o.err, "Platform error number (e.g. 0x2900)");
     set->add_option("--arg", o.arg, "Only when the first argument equals this");
-    set->add_option("--skip", o.skip, "Let this many matching calls pass first");
-    set->callback([&o] { qira_sim::InjectFault(o.op, o.err, o.arg, o.skip); });
+    set->add_option("--after", o.afterOp, "Only once the library has called this operation");
+    set->add_option("--after-arg", o.afterArg, "... with this first argument")->needs("--after");
+    set->callback([&o] { qira_sim::InjectFault(o.op, o.err, o.arg, {o.afterOp, o.afterArg}); });
     auto* clear = fault->add_subcommand("clear", "Clear one fault, or all");
     clear->add_option("op", o.op);
     clear->callback([&o] { o.op.empty() ? qira_sim::ClearFaults() : qira_sim::ClearFault(o.op); });

@@ -29,9 +29,16 @@ std::string ServiceState(const std::string& service);
 void SetSpotlightState(bool on);
 bool SpotlightState();
 
+// A trigger for a fault: the call of operation `op` whose first argument is `arg` (any argument
+// when `arg` is empty).
+struct Call {
+    std::string op;
+    std::string arg;
+};
+
 // Makes platform operation `op` fail with platform error `err`; with `arg`, only when the
-// operation's first argument equals it; with `skip`, only after that many matching calls passed.
-void InjectFault(const std::string& op, int err, const std::string& arg = std::string(), int skip = 0);
+// operation's first argument equals it; with `after`, only once the library has made that call.
+void InjectFault(const std::string& op, int err, const std::string& arg = std::string(), const Call& after = Call());
 void ClearFault(const std::string& op);
 void ClearFaults();
 Json::Value Faults();
