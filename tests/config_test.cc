@@ -1,20 +1,10 @@
 // Error state, configuration loading and saving, and the advisory lock between processes.
-#include <signal.h>
-#include <sys/stat.h>
+#include "testkit.h"
+
 #include <syslog.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
-#include <string>
-
-#include "fileindex/folders.h"
-#include "fileindex/status.h"
 #include "qira/qlib_core.h"
-#include "child_holding.h"
-#include "log_capture.h"
-#include "sandbox.h"
 
-using namespace QIRA::FILEINDEX;
 using testkit::Logged;
 
 namespace {

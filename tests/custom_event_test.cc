@@ -1,23 +1,9 @@
 // Appending custom events to a share's queue; duplicates of a pending reindex; the fallback.
-#include <sys/file.h>
-#include <sys/stat.h>
-#include <sys/wait.h>
-#include <fcntl.h>
-#include <unistd.h>
+#include "testkit.h"
 
 #include <algorithm>
 
-#include "child_holding.h"
-#include "fileindex/error.h"
-#include "fileindex/status_mgr.h"
-#include "fileindex/utils.h"
-#include "log_capture.h"
 #include "pending_reindex.h"
-#include "qira_sim/appliance.h"
-#include "sandbox.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
 
 namespace {
 

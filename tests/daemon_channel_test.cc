@@ -1,18 +1,7 @@
 // Commands to fileindexd: frames on the wire and the chunked writer.
-#include <sys/socket.h>
-#include <sys/wait.h>
-#include <unistd.h>
-
-#include <cstring>
+#include "testkit.h"
 
 #include "daemon_channel.h"
-#include "fake_daemon.h"
-#include "fileindex/json.h"
-#include "fileindex/root.h"
-#include "fileindex/utils.h"
-#include "sandbox.h"
-
-using namespace QIRA::FILEINDEX;
 
 namespace {
 

@@ -1,11 +1,5 @@
 // Folder delete end to end.
-#include <unistd.h>
-
-#include "fileindex/index_mgr.h"
-#include "index_fixture.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
+#include "testkit.h"
 
 namespace {
 

@@ -1,16 +1,5 @@
 // Why a path is or is not indexed, how far indexing has got, and the commands over both.
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <functional>
-#include <sstream>
-
-#include "fileindex/fileindex.h"
-#include "index_fixture.h"
-#include "process.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
+#include "testkit.h"
 
 namespace {
 

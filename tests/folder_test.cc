@@ -1,12 +1,5 @@
 // The folder record and folder.conf: layout, limit, change reports.
-#include "fileindex/folders.h"
-#include "fileindex/json.h"
-#include "log_capture.h"
-#include "qira_sim/appliance.h"
-#include "sandbox.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
+#include "testkit.h"
 
 namespace {
 

@@ -1,21 +1,7 @@
 // Links planted in share directories and hostile daemons never steer the library.
-#include <fcntl.h>
-#include <signal.h>
-#include <sys/socket.h>
-#include <sys/stat.h>
-#include <sys/un.h>
-#include <sys/wait.h>
-#include <unistd.h>
+#include "testkit.h"
 
 #include <chrono>
-#include <cstring>
-
-#include "fileindex/fileindex.h"
-#include "canary.h"
-#include "index_fixture.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
 
 namespace {
 

@@ -1,15 +1,7 @@
 // Which shares, paths and names may be indexed; room for the index; the governing folder.
-#include <sys/stat.h>
-#include <unistd.h>
+#include "testkit.h"
 
-#include "fileindex/utils.h"
-#include "log_capture.h"
 #include "qira/qira_share.h"
-#include "qira_sim/appliance.h"
-#include "sandbox.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
 
 namespace {
 

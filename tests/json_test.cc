@@ -1,10 +1,5 @@
 // The JSON conveniences: strict reading, compact writing, atomic replacement.
-#include <sys/stat.h>
-
-#include "fileindex/json.h"
-#include "sandbox.h"
-
-using namespace QIRA::FILEINDEX;
+#include "testkit.h"
 
 namespace {
 

@@ -1,12 +1,5 @@
 // The sorted, paged listing with additional facts.
-#include "fileindex/folders.h"
-#include "fileindex/index_mgr.h"
-#include "fileindex/status_mgr.h"
-#include "fileindex/utils.h"
-#include "index_fixture.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
+#include "testkit.h"
 
 namespace {
 

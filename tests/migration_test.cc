@@ -1,9 +1,5 @@
 // Bringing an upgraded system into the running state.
-#include "fileindex/utils.h"
-#include "index_fixture.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
+#include "testkit.h"
 
 namespace {
 

@@ -1,9 +1,5 @@
 // Monitor-queue registrations with qiranotifyd.
-#include "fileindex/index_mgr.h"
-#include "index_fixture.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
+#include "testkit.h"
 
 namespace {
 

@@ -1,10 +1,5 @@
 // Share paths, full paths and the small helpers.
-#include "fileindex/utils.h"
-#include "log_capture.h"
-#include "qira_sim/appliance.h"
-#include "sandbox.h"
-
-using namespace QIRA::FILEINDEX;
+#include "testkit.h"
 
 namespace {
 

@@ -1,15 +1,12 @@
 // The simulated appliance behaves like the platform where Linux has the behaviour.
-#include <sys/stat.h>
-#include <unistd.h>
+#include "testkit.h"
 
 #include "qira/qira_fs.h"
 #include "qira/qira_quota.h"
 #include "qira/qira_share.h"
 #include "qira/qlib_core.h"
 #include "qira/qlib_service.h"
-#include "qira_sim/appliance.h"
 #include "qiranotifyd/monitor_queue.h"
-#include "sandbox.h"
 
 namespace {
 

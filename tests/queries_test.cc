@@ -1,15 +1,7 @@
 // What is indexed: lists, membership questions and the plain functions.
 #include <dlfcn.h>
 
-#include "fileindex/fileidx.h"
-#include "fileindex/folders.h"
-#include "fileindex/index_mgr.h"
-#include "log_capture.h"
-#include "qira_sim/appliance.h"
-#include "sandbox.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
+#include "testkit.h"
 
 namespace {
 

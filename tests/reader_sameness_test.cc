@@ -1,20 +1,11 @@
 // The fast readings of queue lines and folder.conf give the strict readings' answers on every
 // input of the fuzz targets' seed corpora (escapes, duplicate keys, number edges, deep nesting,
 // invalid UTF-8, byte order marks, comments, trailing garbage).
-#include <dirent.h>
-
-#include <map>
-#include <string>
-#include <vector>
-
-#include <gtest/gtest.h>
+#include "testkit.h"
 
 #include "folder_conf_reader.h"
 #include "line_reader.h"
 #include "queue_record.h"
-#include "sandbox.h"
-
-using namespace QIRA::FILEINDEX;
 
 namespace {
 

@@ -1,12 +1,5 @@
 // Reindex: validation first, revival of out-of-space shares, events in request order.
-#include <climits>
-
-#include "fileindex/index_mgr.h"
-#include "fileindex/status_mgr.h"
-#include "index_fixture.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
+#include "testkit.h"
 
 namespace {
 

@@ -1,13 +1,5 @@
 // Share removal, rename, pause, resume and the wiping of a share's index data.
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include "fileindex/folders.h"
-#include "fileindex/index_mgr.h"
-#include "index_fixture.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
+#include "testkit.h"
 
 namespace {
 

@@ -1,29 +1,11 @@
 // What a share's user can plant in the share or put in a request never makes the library hang,
 // leak descriptors, or act outside the share.
-#include <dirent.h>
-#include <fcntl.h>
-#include <signal.h>
+#include "testkit.h"
+
 #include <stdio.h>
 #include <sys/resource.h>
-#include <sys/socket.h>
-#include <sys/stat.h>
-#include <sys/un.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
-#include <climits>
-#include <cstring>
-#include <functional>
-
-#include "canary.h"
-#include "child_holding.h"
-#include "fileindex/fileindex.h"
-#include "index_fixture.h"
-#include "process.h"
 #include "queue_file.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
 
 namespace {
 

@@ -1,11 +1,5 @@
 // Status words of the service and of one folder.
-#include <ctime>
-
-#include "fileindex/status_mgr.h"
-#include "index_fixture.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
+#include "testkit.h"
 
 namespace {
 

@@ -1,22 +1,7 @@
 // status.conf, the status manager's writers and readers, and the no-space notice.
-#include <sys/wait.h>
-#include <unistd.h>
+#include "testkit.h"
 
-#include <ctime>
-
-#include "child_holding.h"
 #include "daemon_channel.h"
-#include "fake_daemon.h"
-#include "fileindex/root.h"
-#include "fileindex/status.h"
-#include "fileindex/status_mgr.h"
-#include "fileindex/utils.h"
-#include "log_capture.h"
-#include "qira_sim/appliance.h"
-#include "sandbox.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
 
 namespace {
 

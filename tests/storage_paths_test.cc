@@ -1,12 +1,7 @@
 // Locations of a share's index database and event queue.
-#include <sys/stat.h>
-#include <unistd.h>
+#include "testkit.h"
 
-#include "fileindex/fileidx.h"
-#include "log_capture.h"
 #include "qira/qlib_core.h"
-#include "qira_sim/appliance.h"
-#include "sandbox.h"
 
 namespace {
 

@@ -1,20 +1,8 @@
 // The command-line tool's contract and the reference daemon stand-in working with the library.
-#include <fcntl.h>
+#include "testkit.h"
+
 #include <poll.h>
-#include <sys/file.h>
 #include <sys/inotify.h>
-#include <sys/wait.h>
-#include <unistd.h>
-
-#include "fileindex/fileindex.h"
-#include "child_holding.h"
-#include "index_fixture.h"
-#include "process.h"
-
-#include <sstream>
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
 
 namespace {
 

@@ -1,13 +1,5 @@
 // Folder upsert end to end: folder.conf, platform calls, registrations, frames and events.
-#include <sys/wait.h>
-#include <unistd.h>
-
-#include "fileindex/folders.h"
-#include "fileindex/index_mgr.h"
-#include "index_fixture.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
+#include "testkit.h"
 
 namespace {
 

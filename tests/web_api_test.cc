@@ -1,19 +1,9 @@
 // The console's JSON API over HTTP: a real fileindex-web process on a free loopback port.
-#include <signal.h>
-#include <sys/socket.h>
-#include <unistd.h>
+#include "testkit.h"
 
 #include <regex>
 
 #include <httplib.h>
-
-#include "child_holding.h"
-#include "fileindex/fileindex.h"
-#include "index_fixture.h"
-#include "process.h"
-
-using namespace QIRA::FILEINDEX;
-using testkit::J;
 
 namespace {
 

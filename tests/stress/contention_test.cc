@@ -1,19 +1,9 @@
 // Several processes change folders, pause state, flags and queues at once while the daemon
 // stand-in drains the queues: what returned true is on disk, every file stays whole, no queued
 // record is lost or duplicated.
-#include <signal.h>
-#include <sys/wait.h>
-#include <unistd.h>
+#include "testkit.h"
 
-#include <map>
 #include <random>
-
-#include "fileindex/fileindex.h"
-#include "log_capture.h"
-#include "process.h"
-#include "sandbox.h"
-
-using namespace QIRA::FILEINDEX;
 
 namespace {
 

@@ -1,16 +1,8 @@
 // Killing a process at random moments while it saves never leaves a file that is not a saved
 // version; leftover temporary files never confuse a later load.
-#include <dirent.h>
-#include <signal.h>
-#include <sys/wait.h>
-#include <unistd.h>
+#include "testkit.h"
 
 #include <random>
-
-#include "fileindex/fileindex.h"
-#include "sandbox.h"
-
-using namespace QIRA::FILEINDEX;
 
 namespace {
 
