@@ -11,22 +11,9 @@ namespace {
 
 class ConfigTest : public testkit::Sandbox {};
 
-TEST(ErrorHandlerTest, CodeIsStickyAndTheLaterFailureWins) {
-    ErrorHandler::SetError(FILEINDEX_ERR_LOCK);
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
-    ErrorHandler::SetError(FILEINDEX_ERR_PATH);
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_PATH);
+TEST(ErrorHandlerTest, CodesAndLogLevelKeepTheirValues) {
     EXPECT_EQ(static_cast<int>(FILEINDEX_ERR_MALFORMED_FOLDERS), 8);
     EXPECT_EQ(LOG_LEVEL, 3);
-}
-
-TEST_F(ConfigTest, MissingFileLoadsAsEmptyConfiguration) {
-    Folders folders;
-    ASSERT_TRUE(folders.Load());
-    std::vector<Folder> list;
-    folders.List(list);
-    EXPECT_TRUE(list.empty());
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NONE);
 }
 
 TEST_F(ConfigTest, UnparsableFilesFailWithErrorSixAndTheirPath) {

@@ -83,12 +83,6 @@ TEST_F(CustomEventTest, QueuePathFailureMarksTheShare) {
     EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("s"));
 }
 
-TEST_F(CustomEventTest, UnopenableQueueMarksTheShare) {
-    MakeDir(QueueOf("s"));  // a directory where the queue file should be
-    EXPECT_FALSE(AddCustomEvent(kEventReindex, dir_ + "/x", Json::Value()));
-    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("s"));
-}
-
 TEST_F(CustomEventTest, FailedMarkingIsLoggedToo) {
     MakeDir(QueueOf("s"));
     mkdir(Path("/tmp/fileidx_cfg_status.lock").c_str(), 0755);

@@ -54,18 +54,6 @@ TEST(ChunkedWriterTest, LargeMessageGoesInPiecesOfAtMost1024) {
     EXPECT_TRUE(detail::WriteChunked(-1, "", 0));  // empty buffer succeeds at once
 }
 
-TEST_F(DaemonChannelTest, TwoThousandByteMessageIsOneWholeFrame) {
-    testkit::FakeDaemon daemon(DaemonSocketPath());
-    Json::Value data(Json::objectValue);
-    data["folder_path"] = std::string(1942, 'p');
-    ASSERT_TRUE(SendCammandToDaemon("upsert_folder_setting", data));
-    const auto frames = daemon.Drain();
-    ASSERT_EQ(frames.size(), 1u);
-    EXPECT_EQ(frames[0].length, 2001u);
-    EXPECT_TRUE(frames[0].whole);
-    EXPECT_EQ(frames[0].message["data"], data);
-}
-
 TEST(ChunkedWriterTest, AFailedFirstWriteNeverReadsBeforeTheBuffer) {
     int pair[2];
     ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM, 0, pair), 0);

@@ -35,14 +35,6 @@ TEST_F(DeleteTest, LastFolderOfTheApplianceStopsEverything) {
     EXPECT_FALSE(qira_sim::SpotlightState());
 }
 
-TEST_F(DeleteTest, ServiceStopFailureIsOnlyLogged) {
-    Seed(R"({"/music/a": {}})");
-    qira_sim::InjectFault("QLIBServiceStop", 0x80);
-    EXPECT_TRUE(IndexMgr::Delete(J(R"(["/music/a"])")));
-    EXPECT_TRUE(testkit::Logged("QLIBServiceStop failed: err=[0x0080 sim/QLIBServiceStop:1]"));
-    EXPECT_EQ(testkit::JournalOps()[1], "MonitorQueue::Delete " + QueueOf("music") + " fileindex 1");  // Spotlight was off
-}
-
 TEST_F(DeleteTest, OneOfTwoFoldersRebuildsTheMonitorQueue) {
     Seed(R"({"/music/a": {"audio": true}, "/music/b": {}})");
     ASSERT_TRUE(IndexMgr::Delete(J(R"(["/music/a"])")));

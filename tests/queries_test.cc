@@ -67,6 +67,7 @@ TEST_F(QueriesTest, NoFileMeansNothingIndexed) {
     std::vector<Folder> list(3);
     EXPECT_TRUE(IndexMgr::List(list));
     EXPECT_TRUE(list.empty());
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NONE);
     EXPECT_FALSE(IndexMgr::IsPathIndexed("/music"));
     EXPECT_FALSE(IndexMgr::IsShareIndexed("music"));
 }

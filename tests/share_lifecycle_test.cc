@@ -122,14 +122,4 @@ TEST_F(ShareLifecycleTest, CleanRemovesQueueFilesAndTheDatabaseTree) {
     EXPECT_TRUE(testkit::Logged("FILEIDXQueuePathGet failed, share=nosuch"));
 }
 
-TEST_F(ShareLifecycleTest, CleanNeverRemovesThroughAPlantedEaDirLink) {
-    const std::string outside = Path("/outside");
-    MakeDir(outside + "/QIRA@.fileindexdb");
-    testkit::WriteFile(outside + "/QIRA@file_index_queue", "canary");
-    ASSERT_EQ(symlink(outside.c_str(), (music_ + "/@eaDir").c_str()), 0);
-    EXPECT_TRUE(IndexMgr::CleanShareIndexData("music"));
-    EXPECT_EQ(testkit::ReadFile(outside + "/QIRA@file_index_queue"), "canary");
-    EXPECT_TRUE(testkit::Exists(outside + "/QIRA@.fileindexdb"));
-}
-
 }  // namespace

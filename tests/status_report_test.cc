@@ -7,7 +7,8 @@ class StatusReportTest : public testkit::IndexFixture {
 protected:
     void SetUp() override {
         IndexFixture::SetUp();
-        testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/photo/a": {}})");
+        testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/ab": {}, "/photo/a": {}})");
+        MakeDir(music_ + "/ab");
         MakeDir(music_ + "/@eaDir");
         MakeDir(photo_ + "/@eaDir");
     }
@@ -15,9 +16,6 @@ protected:
         std::string word = "unset";
         EXPECT_TRUE(StatusMgr::GetStatus(word));
         return word;
-    }
-    void PauseUntil(long long resumeTime) {
-        testkit::WriteFile(StatusConf(), "{\"resume_time\": " + std::to_string(resumeTime) + "}");
     }
     std::string Record(const std::string& path, int event = 131072) {
         return "{\"event\":" + std::to_string(event) + ",\"path\":\"" + path + "\",\"data\":{}}\n";
@@ -27,27 +25,6 @@ protected:
 TEST_F(StatusReportTest, NoFoldersIsFinished) {
     testkit::WriteFile(FolderConf(), "{}");
     EXPECT_EQ(Service(), "finished");
-}
-
-TEST_F(StatusReportTest, PauseShowsOnlyWhileWorkIsHeldBack) {
-    PauseUntil(0);
-    EXPECT_EQ(Service(), "finished");
-    testkit::WriteFile(QueueOf("photo"), "");
-    EXPECT_EQ(Service(), "paused");
-    PauseUntil(time(nullptr) - 10);
-    EXPECT_EQ(Service(), "processing");
-    PauseUntil(time(nullptr) + 3600);
-    EXPECT_EQ(Service(), "paused");
-    PauseUntil(-1);
-    EXPECT_EQ(Service(), "processing");
-}
-
-TEST_F(StatusReportTest, TmpCompanionIsPendingForTheServiceButForAFolderOnlyWithARecord) {
-    testkit::WriteFile(QueueOf("music") + ".tmp", Record(music_ + "/b"));
-    EXPECT_EQ(Service(), "processing");
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "finished");
-    testkit::WriteFile(QueueOf("music") + ".tmp", Record(music_ + "/a/x"));
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "processing");
 }
 
 TEST_F(StatusReportTest, UnreadablePauseStateFailsTheServiceWord) {
@@ -60,41 +37,52 @@ TEST_F(StatusReportTest, UnreadablePauseStateFailsTheServiceWord) {
     EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "processing");  // pause value -1
 }
 
-TEST_F(StatusReportTest, FolderWordsFollowTheQueueThePauseAndTheNoSpaceFlag) {
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "finished");
-    testkit::WriteFile(QueueOf("music"), Record(music_ + "/a/song.mp3"));
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "processing");
-    PauseUntil(0);
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "paused");
-    testkit::WriteFile(StatusConf(), R"({"resume_time": 0, "no_space": {"music": true}})");
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "err_no_space");
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/photo/a"), "finished");
-}
-
-TEST_F(StatusReportTest, FolderThatCannotBeIndexedIsPaused) {
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/missing"), "paused");
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/nosuch/a"), "paused");
-}
-
-TEST_F(StatusReportTest, RecordsMatchOnASlashBoundaryAndOldPathsOnlyForEvent256) {
-    MakeDir(music_ + "/ab");
-    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/ab": {}})");
-    testkit::WriteFile(QueueOf("music"), Record(music_ + "/ab/x"));
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/ab"), "processing");
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "finished");
-    testkit::WriteFile(QueueOf("music"), "{\"event\":256,\"path\":\"/elsewhere\",\"path_old\":\"" + music_ + "/a/old\"}\n");
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "processing");
-    testkit::WriteFile(QueueOf("music"), "{\"event\":5,\"path\":\"/elsewhere\",\"path_old\":\"" + music_ + "/a/old\"}\n");
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "finished");
-    testkit::WriteFile(QueueOf("music"), "{\"event\":256,\"path\":\"/elsewhere\",\"path_old\":7}\n");
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "finished");
-    // null and booleans convert to an unsigned event: records, not malformed lines.
-    for (const char* event : {"null", "true", "false", "1.5"}) {
-        SCOPED_TRACE(event);
+// One row: status.conf, one queue file and its content, then the word of the service (no folder)
+// or of a folder.
+TEST_F(StatusReportTest, WordsFollowTheQueuesThePauseAndTheNoSpaceFlag) {
+    const std::string later = std::to_string(time(nullptr) + 3600), earlier = std::to_string(time(nullptr) - 10);
+    const std::string music = QueueOf("music"), tmp = QueueOf("music") + ".tmp", photo = QueueOf("photo");
+    const std::string old = "\"path\":\"/elsewhere\",\"path_old\":\"" + music_ + "/a/old\"}\n";
+    const auto event = [&](const char* value) { return "{\"event\":" + std::string(value) + ",\"path\":\"" + music_ + "/a/x\"}\n"; };
+    struct Case {
+        std::string status, queue, content, folder, word;
+    } cases[] = {
+        {R"({"resume_time": 0})", "", "", "", "finished"},
+        {R"({"resume_time": 0})", photo, "", "", "paused"},
+        {"{\"resume_time\": " + earlier + "}", photo, "", "", "processing"},
+        {"{\"resume_time\": " + later + "}", photo, "", "", "paused"},
+        {R"({"resume_time": -1})", photo, "", "", "processing"},
+        {"", tmp, Record(music_ + "/b"), "", "processing"},  // any companion is pending for the service
+        {"", tmp, Record(music_ + "/b"), "/music/a", "finished"},
+        {"", tmp, Record(music_ + "/a/x"), "/music/a", "processing"},
+        {"", "", "", "/music/a", "finished"},
+        {"", music, Record(music_ + "/a/song.mp3"), "/music/a", "processing"},
+        {R"({"resume_time": 0})", music, Record(music_ + "/a/song.mp3"), "/music/a", "paused"},
+        {R"({"resume_time": 0, "no_space": {"music": true}})", music, Record(music_ + "/a/x"), "/music/a", "err_no_space"},
+        {R"({"resume_time": 0, "no_space": {"music": true}})", music, Record(music_ + "/a/x"), "/photo/a", "finished"},
+        {"", "", "", "/music/missing", "paused"},
+        {"", "", "", "/nosuch/a", "paused"},
+        {"", music, Record(music_ + "/ab/x"), "/music/ab", "processing"},
+        {"", music, Record(music_ + "/ab/x"), "/music/a", "finished"},  // on a slash boundary
+        {"", music, "{\"event\":256," + old, "/music/a", "processing"},  // old paths only for event 256
+        {"", music, "{\"event\":5," + old, "/music/a", "finished"},
+        {"", music, "{\"event\":256,\"path\":\"/elsewhere\",\"path_old\":7}\n", "/music/a", "finished"},
+        // null, booleans and fractions convert to an unsigned event: records, not malformed lines.
+        {"", music, event("null"), "/music/a", "processing"},
+        {"", music, event("true"), "/music/a", "processing"},
+        {"", music, event("false"), "/music/a", "processing"},
+        {"", music, event("1.5"), "/music/a", "processing"},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.status + " | " + c.queue + ": " + c.content + " | " + c.folder);
+        for (const auto& file : {StatusConf(), music, tmp, photo}) unlink(file.c_str());
+        if (!c.status.empty()) testkit::WriteFile(StatusConf(), c.status);
+        if (!c.queue.empty()) testkit::WriteFile(c.queue, c.content);
         testkit::ClearLog();
-        testkit::WriteFile(QueueOf("music"), std::string("{\"event\":") + event + ",\"path\":\"" + music_ + "/a/x\"}\n");
-        EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "processing");
-        EXPECT_TRUE(testkit::LogLines().empty());
+        EXPECT_EQ(c.folder.empty() ? Service() : StatusMgr::GetFolderStatus(c.folder), c.word);
+        if (c.queue == music) {
+            EXPECT_TRUE(testkit::LogLines().empty());
+        }
     }
 }
 

@@ -77,14 +77,4 @@ TEST_F(StoragePathsTest, EaDirFailuresAreLoggedAndThePathStillReturned) {
     EXPECT_TRUE(testkit::Logged("mkdir failed, path=" + dir + "/@eaDir/QIRA@.fileindexdb, reason=No such file or directory"));
 }
 
-TEST_F(StoragePathsTest, APlantedEaDirLinkIsNotFollowed) {
-    const std::string dir = AddShare("music");
-    const std::string outside = Path("/outside");
-    MakeDir(outside);
-    ASSERT_EQ(symlink(outside.c_str(), (dir + "/@eaDir").c_str()), 0);
-    char buffer[4096];
-    EXPECT_GT(FILEIDXDBPathGet("music", buffer, sizeof buffer), 0);
-    EXPECT_FALSE(testkit::Exists(outside + "/QIRA@.fileindexdb"));
-}
-
 }  // namespace
