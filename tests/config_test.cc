@@ -19,6 +19,7 @@ TEST(ErrorHandlerTest, CodesAndLogLevelKeepTheirValues) {
 TEST_F(ConfigTest, UnparsableFilesFailWithErrorSixAndTheirPath) {
     const std::string nested(100000, '[');
     for (const std::string& content : std::vector<std::string>{"", "{\"a\": ", "not json", "{} {}", "{/*c*/}", nested}) {
+        SCOPED_TRACE(content.substr(0, 20));
         testkit::WriteFile(StatusConf(), content);
         testkit::ClearError();
         testkit::ClearLog();

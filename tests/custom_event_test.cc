@@ -37,6 +37,7 @@ TEST_F(CustomEventTest, APendingReindexOfExactlyThePathSuppressesAnyEvent) {
     EXPECT_TRUE(AddCustomEvent(kEventReindex, dir_ + "/a", J("{}")));
     EXPECT_EQ(testkit::ReadFile(QueueOf("s")), "garbage\n{\"event\":\"x\",\"path\":1}\n" + queued);
     for (const std::string& other : std::vector<std::string>{dir_ + "/a/b", dir_, dir_ + "/A"}) {
+        SCOPED_TRACE(other);
         EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, other, J("{}")));
     }
     const std::string content = testkit::ReadFile(QueueOf("s"));

@@ -69,6 +69,7 @@ TEST_F(DeleteTest, BadRequestsChangeNothing) {
                                                          {R"(["/music/a", {"path": "/music/a"}])", R"({"path":"/music/a"})"},
                                                          {R"(["/music/a", 5])", "5"}};
     for (const auto& [request, logged] : cases) {
+        SCOPED_TRACE(request);
         Settle();
         EXPECT_FALSE(IndexMgr::Delete(J(request))) << request;
         EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{std::string("Bad param: ") + logged});

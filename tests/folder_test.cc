@@ -95,6 +95,7 @@ TEST_F(FolderTest, LoadAddsToTheMapWithoutReplacing) {
 
 TEST_F(FolderTest, MalformedFolderConfFailsWithErrorEight) {
     for (const char* text : {"[]", "7", "\"x\"", "null"}) {
+        SCOPED_TRACE(text);
         testkit::WriteFile(FolderConf(), text);
         testkit::ClearLog();
         Folders folders;
@@ -120,6 +121,7 @@ TEST_F(FolderTest, GetFindsExactKeysOnly) {
 TEST_F(FolderTest, UpsertRejectsBadRequestsAndLogsThemWhole) {
     Folders folders;
     for (const char* request : {R"({"path":7})", R"({"name":"x"})", R"({"path":"/nosuch/x"})", "[1]", "\"p\""}) {
+        SCOPED_TRACE(request);
         testkit::ClearLog();
         testkit::ClearError();
         Json::Value changed = "untouched";

@@ -32,6 +32,7 @@ TEST_F(IndexabilityTest, SystemPreservedNamesAndSkippedFiles) {
 
 TEST_F(IndexabilityTest, FileSystemTypesThatAreNeverIndexed) {
     for (const int type : {12, 20, 31}) {
+        SCOPED_TRACE(std::to_string(type));
         qira_sim::PutShare("s", dir_, J("{\"fs_type\": " + std::to_string(type) + "}"));
         EXPECT_TRUE(IsSkipIndex(dir_ + "/dir/f")) << type;
         EXPECT_FALSE(CanFullPathBeIndexed(dir_ + "/dir")) << type;
@@ -45,6 +46,7 @@ TEST_F(IndexabilityTest, ShareRules) {
     QIRASHARE* share = nullptr;
     EXPECT_FALSE(CanShareBeIndexed(nullptr));
     for (const char* props : {R"({"encrypted": true})", R"({"read_only": true})"}) {
+        SCOPED_TRACE(props);
         qira_sim::PutShare("s", dir_, J(props));
         ASSERT_EQ(QIRAShareGet("s", &share), 0);
         EXPECT_FALSE(CanShareBeIndexed(share)) << props;
@@ -58,6 +60,7 @@ TEST_F(IndexabilityTest, ShareRules) {
     QIRAShareFree(share);
     qira_sim::ClearFaults();
     for (const char* skipped : {"surveillance", "NetBackup"}) {
+        SCOPED_TRACE(skipped);
         AddShare(skipped);
         ASSERT_EQ(QIRAShareGet(skipped, &share), 0);
         EXPECT_FALSE(CanShareBeIndexed(share));
@@ -85,6 +88,7 @@ TEST_F(IndexabilityTest, FullPathRulesInOrderWithTheirLogLines) {
     EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"QIRAShareGet failed, share=s"});
     qira_sim::ClearFaults();
     for (const char* bad : {"/dir/", "/dir//sub", "/dir/../dir", "/missing"}) {
+        SCOPED_TRACE(bad);
         testkit::ClearLog();
         EXPECT_FALSE(CanFullPathBeIndexed(dir_ + bad)) << bad;
         EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"check realpath failed, path=" + dir_ + bad});

@@ -11,6 +11,7 @@ TEST(JsonTest, ReadingIsStrict) {
     EXPECT_EQ(value["a"][1].asInt(), 2);
     EXPECT_TRUE(fromString(value, "7"));
     for (const char* text : {"{\"a\":1} x", "[1 /* c */]", "{\"a\": 1 // c\n}", "{\"a\":1,}", "// c\n{}", "{'a':1}", "[1,,2]", "", "nan"}) {
+        SCOPED_TRACE(text);
         Json::Value untouched = "before";
         EXPECT_FALSE(fromString(untouched, text)) << text;
         EXPECT_EQ(untouched.asString(), "before");

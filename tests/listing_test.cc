@@ -53,6 +53,7 @@ TEST_F(ListingTest, DescendingPageIsTheFirstRecordsReversed) {
 
 TEST_F(ListingTest, LimitZeroAndOffsetsAtOrBeyondTheEndGiveEmptyPages) {
     for (const unsigned long offset : {0ul, 10ul, 11ul, 1000000ul}) {
+        SCOPED_TRACE(std::to_string(offset));
         const auto asc = List(offset, offset == 0 ? 0 : 5, "name", "ASC");
         EXPECT_EQ(asc["folder"], J("[]")) << offset;
         EXPECT_EQ(asc["total"].asUInt(), 10u);

@@ -45,6 +45,7 @@ TEST_F(MigrationTest, EachStepFailingEndsTheMigration) {
         {"MonitorQueue::Upsert", "", "UpsertQIRANotifydCfg failed, share=music", 3},
     };
     for (const auto& c : cases) {
+        SCOPED_TRACE(c.op);
         qira_sim::ClearFaults();
         qira_sim::InjectFault(c.op, 0xC1, c.arg);
         Settle();

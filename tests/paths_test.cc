@@ -12,6 +12,7 @@ TEST(ShareNameTest, FirstCharacterIsAlwaysDropped) {
     const std::pair<const char*, const char*> cases[] = {
         {"/music/live", "music"}, {"/music", "music"}, {"music/live", "usic"}, {"/", ""}, {"//x", ""}};
     for (const auto& c : cases) {
+        SCOPED_TRACE(c.first);
         ASSERT_TRUE(GetShareNameByPath(name, c.first));
         EXPECT_EQ(name, c.second) << c.first;
     }

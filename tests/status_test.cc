@@ -102,6 +102,7 @@ TEST_F(StatusTest, MarkersReadAsBooleans) {
 TEST_F(StatusTest, MalformedResumeTimeIsAJsonException) {
     for (const char* content : {R"({"resume_time": "x"})", R"({"resume_time": {}})", R"({"resume_time": 1e300})",
                                 "[1]"}) {
+        SCOPED_TRACE(content);
         testkit::WriteFile(StatusConf(), content);
         testkit::ClearLog();
         long long resume = 42;

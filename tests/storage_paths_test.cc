@@ -40,6 +40,7 @@ TEST_F(StoragePathsTest, BadArgumentsFailBeforeAnyLookup) {
         {"music", buffer, -5, "Invaild Argument (cbOutLen > 0)=[-5]\n"},
     };
     for (const auto& c : cases) {
+        SCOPED_TRACE(c.message);
         testkit::ClearLog();
         QLIBCErrSetEx(0, "", 0);
         EXPECT_EQ(FILEIDXQueuePathGet(c.name, c.out, c.size), -1);

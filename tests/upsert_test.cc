@@ -56,6 +56,7 @@ TEST_F(UpsertTest, SpotlightFailuresNeverFailTheUpsert) {
 
 TEST_F(UpsertTest, BadRequestsFailBeforeTouchingAnything) {
     for (const char* request : {R"({"path": "/music/a"})", "\"/music/a\"", "null"}) {
+        SCOPED_TRACE(request);
         Settle();
         EXPECT_FALSE(IndexMgr::Upsert(J(request)));
         EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
@@ -79,6 +80,7 @@ TEST_F(UpsertTest, ARejectedElementSavesNothing) {
     testkit::WriteFile(FolderConf(), R"({"/music/c": {"name": "C"}})");
     const std::string before = testkit::ReadFile(FolderConf());
     for (const char* bad : {R"({"path": 7})", R"({"path": "/nosuch/x"})", R"([1])", R"("s")", R"({"path": {}})"}) {
+        SCOPED_TRACE(bad);
         Settle();
         const std::string request = std::string(R"([{"path": "/music/a"}, )") + bad + R"(, {"path": "/music/b"}])";
         EXPECT_FALSE(IndexMgr::Upsert(J(request))) << bad;
@@ -123,6 +125,7 @@ TEST_F(UpsertTest, LaterStepsFailWithFolderConfAlreadyWritten) {
         {"QLIBServiceStart", "QLIBServiceStart failed: err=[0x0070 sim/QLIBServiceStart:1]"},
     };
     for (const auto& c : cases) {
+        SCOPED_TRACE(c.op);
         unlink(FolderConf().c_str());
         qira_sim::ClearFaults();
         qira_sim::InjectFault(c.op, 0x70);

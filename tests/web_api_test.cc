@@ -133,6 +133,7 @@ TEST_F(WebApiTest, AHeldLockIsRetryableAndStaticFilesStayInTheirDirectory) {
     EXPECT_EQ(page->status, 200);
     EXPECT_NE(page->body.find("<title>File indexing</title>"), std::string::npos);
     for (const char* escape : {"/../CMakeLists.txt", "/%2e%2e/CMakeLists.txt", "/static/../../LICENSE", "/..%2fLICENSE"}) {
+        SCOPED_TRACE(escape);
         const auto result = client_->Get(escape);
         ASSERT_TRUE(result) << escape;
         EXPECT_EQ(result->status, 404) << escape;

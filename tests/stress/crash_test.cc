@@ -52,6 +52,7 @@ TEST_F(CrashTest, EveryFileReadAfterAKillIsASavedVersion) {
     std::mt19937 random(12345);
     constexpr int kKills = 400;
     for (int round = 0; round < kKills; ++round) {
+        SCOPED_TRACE("round " + std::to_string(round));
         const pid_t saver = fork();
         if (saver == 0) SaveForever();
         usleep(std::uniform_int_distribution<useconds_t>(0, 3000)(random));
@@ -59,9 +60,9 @@ TEST_F(CrashTest, EveryFileReadAfterAKillIsASavedVersion) {
         waitpid(saver, nullptr, 0);
 
         Folders folders;
-        ASSERT_TRUE(folders.Load()) << "round " << round;
+        ASSERT_TRUE(folders.Load());
         Status status;
-        ASSERT_TRUE(status.Load()) << "round " << round;
+        ASSERT_TRUE(status.Load());
         const std::string folderText = testkit::ReadFile(FolderConf());
         const std::string statusText = testkit::ReadFile(StatusConf());
         if (!folderText.empty()) {
