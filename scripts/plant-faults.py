@@ -49,7 +49,7 @@ FAULTS = [
     ("src/config/config.cc", "chmod(path.c_str(), 0644)", "chmod(path.c_str(), 0600)"),
     ("src/utils/daemon_channel.cc", "static_cast<uint32_t>(text.size() + 1)", "static_cast<uint32_t>(text.size())"),
     ("src/utils/daemon_channel.cc", 'message["type"] = type;', 'message["kind"] = type;'),
-    ("src/utils/custom_event.cc", 'record["data"] = data;', 'record["data"] = Json::Value(Json::objectValue);'),
+    ("src/utils/custom_event.cc", 'record["data"] = data;', 'record["data"] = data.isNull() ? data : Json::Value(Json::objectValue);'),
     ("src/utils/custom_event.cc", " || pending.IsQueued(path, queuePath + \".tmp\")", ""),
     ("src/utils/custom_event.cc", "ShareSetNeedReindex(shareName, true)", "ShareSetNeedReindex(shareName, false)"),
     ("src/utils/custom_event.cc", "if (sized && wrote > 0) ftruncate", "if (false) ftruncate"),
@@ -76,7 +76,7 @@ FAULTS = [
     ("src/folder/folders_listing.cc", "offset < all.size() ? all.size() - offset : 0", "all.size()"),
     ("src/folder/folder.cc", "out = CanPathBeIndexed(path);", "out = true;"),
     ("src/index/index_mgr.cc", "if (detail::IsWithin(folder.path, path)) return true;", "if (detail::IsWithin(path, folder.path)) return true;"),
-    ("src/utils/storage_paths.cc", "if (makeLeafDir && !truncated", "if (!truncated"),
+    ("src/utils/storage_paths.cc", "if (makeLeafDir && !truncated", "if ((makeLeafDir || !makeLeafDir) && !truncated"),
     ("src/utils/ea_dir.cc", " || st.st_nlink > 1", ""),
     ("src/utils/path_rules.cc", " || (path.size() > n && path[n] != '/')", ""),
 ]
