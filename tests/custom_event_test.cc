@@ -52,6 +52,9 @@ TEST_F(CustomEventTest, OnlyReindexRecordsSuppressAndTheTmpCompanionCounts) {
     testkit::WriteFile(QueueOf("s") + ".tmp", "{\"event\":65536,\"path\":\"" + dir_ + "/c\",\"data\":null}\n");
     EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/c", J("{}")));
     EXPECT_EQ(testkit::ReadJsonLines(QueueOf("s")).size(), 2u);
+    testkit::WriteFile(QueueOf("s"), "{\"event\":65536,\"path\":\"" + dir_ + "\\/e\"}\n");  // an escaped slash
+    EXPECT_TRUE(AddCustomEvent(kEventReindex, dir_ + "/e", Json::Value()));
+    EXPECT_EQ(testkit::ReadJsonLines(QueueOf("s")).size(), 1u);
 }
 
 TEST_F(CustomEventTest, ContendedQueueGivesUpAfterThreeAttemptsAndReportsSuccess) {

@@ -165,6 +165,11 @@ TEST_F(FolderTest, DeleteNestsItsReportUnderThePath) {
     EXPECT_EQ(changed.asString(), "untouched");
     ASSERT_TRUE(folders.Delete(changed, "/music/a"));
     EXPECT_EQ(changed["/music/a"], Flags(true, true, true, true));
+    testkit::WriteFile(FolderConf(), R"({"/nosuch/x": {}})");
+    Folders loaded;
+    ASSERT_TRUE(loaded.Load());
+    ASSERT_TRUE(loaded.Delete(changed, "/nosuch/x"));  // a folder whose share is gone still goes
+    EXPECT_EQ(loaded.Count(), 0u);
 }
 
 TEST_F(FolderTest, AThousandFoldersAtMostOnInsertButUpdatesStillWork) {

@@ -28,6 +28,7 @@ TEST(ShareNameTest, ReplaceShareNameKeepsTheRest) {
 TEST(HelpersTest, PrefixAndJsonMembers) {
     EXPECT_TRUE(StringStartWith("abc", ""));
     EXPECT_TRUE(StringStartWith("abc", "ab"));
+    EXPECT_TRUE(StringStartWith("abc", "abc"));
     EXPECT_FALSE(StringStartWith("ab", "abc"));
     EXPECT_FALSE(StringStartWith("Abc", "ab"));
     bool flag = true;

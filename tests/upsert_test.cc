@@ -156,6 +156,15 @@ TEST_F(UpsertTest, EventPathThatNoLongerResolvesFailsWithErrorTwo) {
     EXPECT_EQ(Messages().size(), 1u);
 }
 
+TEST_F(UpsertTest, FailedSaveStopsBeforeAnyOtherStep) {
+    MakeDir(FolderConf());  // a save cannot rename over a directory
+    EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])")));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_SAVE_JSON);
+    EXPECT_TRUE(testkit::Logged("Failed to save json to " + FolderConf()));
+    EXPECT_TRUE(qira_sim::Journal().empty());
+    EXPECT_TRUE(Messages().empty());
+}
+
 TEST_F(UpsertTest, UnqueueableEventFailsAndMarksTheShare) {
     MakeDir(QueueOf("music"));
     EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])")));
