@@ -43,33 +43,24 @@ TEST_F(IndexabilityTest, FileSystemTypesThatAreNeverIndexed) {
 }
 
 TEST_F(IndexabilityTest, ShareRules) {
-    QIRASHARE* share = nullptr;
     EXPECT_FALSE(CanShareBeIndexed(nullptr));
-    for (const char* props : {R"({"encrypted": true})", R"({"read_only": true})"}) {
-        SCOPED_TRACE(props);
-        qira_sim::PutShare("s", dir_, J(props));
-        ASSERT_EQ(QIRAShareGet("s", &share), 0);
-        EXPECT_FALSE(CanShareBeIndexed(share)) << props;
+    struct Case {
+        const char *name, *props, *fault;
+        bool indexable;
+    } cases[] = {{"s", R"({"encrypted": true})", "", false}, {"s", R"({"read_only": true})", "", false},
+                 {"s", "{}", "", true},                       {"s", "{}", "QLIBShareIsReadOnlyGet", false},
+                 {"surveillance", "{}", "", false},           {"NetBackup", "{}", "", false},
+                 {"netbackup", "{}", "", true}};
+    for (const auto& c : cases) {
+        SCOPED_TRACE(std::string(c.name) + " " + c.props + " " + c.fault);
+        qira_sim::ClearFaults();
+        qira_sim::PutShare(c.name, dir_, J(c.props));
+        if (*c.fault != '\0') qira_sim::InjectFault(c.fault, 0x20);
+        QIRASHARE* share = nullptr;
+        ASSERT_EQ(QIRAShareGet(c.name, &share), 0);
+        EXPECT_EQ(CanShareBeIndexed(share), c.indexable);
         QIRAShareFree(share);
     }
-    qira_sim::PutShare("s", dir_, J("{}"));
-    ASSERT_EQ(QIRAShareGet("s", &share), 0);
-    EXPECT_TRUE(CanShareBeIndexed(share));
-    qira_sim::InjectFault("QLIBShareIsReadOnlyGet", 0x20);
-    EXPECT_FALSE(CanShareBeIndexed(share));
-    QIRAShareFree(share);
-    qira_sim::ClearFaults();
-    for (const char* skipped : {"surveillance", "NetBackup"}) {
-        SCOPED_TRACE(skipped);
-        AddShare(skipped);
-        ASSERT_EQ(QIRAShareGet(skipped, &share), 0);
-        EXPECT_FALSE(CanShareBeIndexed(share));
-        QIRAShareFree(share);
-    }
-    AddShare("netbackup");
-    ASSERT_EQ(QIRAShareGet("netbackup", &share), 0);
-    EXPECT_TRUE(CanShareBeIndexed(share));
-    QIRAShareFree(share);
 }
 
 TEST_F(IndexabilityTest, FullPathRulesInOrderWithTheirLogLines) {

@@ -17,17 +17,16 @@ protected:
 
 TEST_F(QueriesTest, PathsInsideAndContainingAFolder) {
     Index(R"({"/music/live": {"name": "Live"}})");
-    for (const char* inside : {"/music/live", "/music/live/2015", "/music/live/"}) {
-        EXPECT_TRUE(IndexMgr::IsPathIndexed(inside)) << inside;
-    }
-    for (const char* outside : {"/music/liveset", "/music", "/Music/live"}) {
-        EXPECT_FALSE(IndexMgr::IsPathIndexed(outside)) << outside;
-    }
-    for (const char* container : {"/music", "/music/live"}) {
-        EXPECT_TRUE(IndexMgr::IsPathContainIndexed(container)) << container;
-    }
-    for (const char* notContainer : {"/music/live/2015", "/music/live/", "/mus"}) {
-        EXPECT_FALSE(IndexMgr::IsPathContainIndexed(notContainer)) << notContainer;
+    struct Case {
+        const char* path;
+        bool inside, contains;
+    } cases[] = {{"/music/live", true, true},     {"/music/live/2015", true, false}, {"/music/live/", true, false},
+                 {"/music/liveset", false, false}, {"/music", false, true},         {"/Music/live", false, false},
+                 {"/mus", false, false}};
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.path);
+        EXPECT_EQ(IndexMgr::IsPathIndexed(c.path), c.inside);
+        EXPECT_EQ(IndexMgr::IsPathContainIndexed(c.path), c.contains);
     }
 }
 
