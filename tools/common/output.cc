@@ -55,13 +55,21 @@ int Output::Fail(const std::string& operation, const std::vector<std::string>& s
     return kExitFailure;
 }
 
-std::string FormatLocalTime(long long epochSeconds) {
+namespace {
+
+std::string FormatTime(long long epochSeconds, struct tm* (*convert)(const time_t*, struct tm*), const char* format) {
     const time_t when = static_cast<time_t>(epochSeconds);
-    struct tm local;
-    if (localtime_r(&when, &local) == nullptr) return std::to_string(epochSeconds);
+    struct tm broken;
+    if (convert(&when, &broken) == nullptr) return std::to_string(epochSeconds);
     char buffer[64];
-    strftime(buffer, sizeof buffer, "%Y-%m-%d %H:%M:%S %Z", &local);
+    strftime(buffer, sizeof buffer, format, &broken);
     return buffer;
 }
+
+}  // namespace
+
+std::string FormatLocalTime(long long epochSeconds) { return FormatTime(epochSeconds, localtime_r, "%Y-%m-%d %H:%M:%S %Z"); }
+
+std::string FormatUtc(long long epochSeconds) { return FormatTime(epochSeconds, gmtime_r, "%Y-%m-%dT%H:%M:%SZ"); }
 
 }  // namespace tools

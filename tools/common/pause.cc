@@ -4,19 +4,9 @@
 #include <ctime>
 #include <limits>
 
+#include "output.h"
+
 namespace tools {
-namespace {
-
-std::string FormatUtc(long long epochSeconds) {
-    const time_t when = static_cast<time_t>(epochSeconds);
-    struct tm utc;
-    if (gmtime_r(&when, &utc) == nullptr) return std::to_string(epochSeconds);
-    char buffer[64];
-    strftime(buffer, sizeof buffer, "%Y-%m-%dT%H:%M:%SZ", &utc);
-    return buffer;
-}
-
-}  // namespace
 
 Json::Value PauseState(long long resumeTime) {
     Json::Value pause(Json::objectValue);
