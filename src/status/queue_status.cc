@@ -60,7 +60,11 @@ FolderStatusBatch::FolderStatusBatch(const std::vector<Folder>& folders) : outer
             owned_.push_back(fullPath + "/");
         }
     }
-    for (const auto& prefix : owned_) prefixes_.insert(prefix);
+    for (const auto& prefix : owned_) {
+        prefixes_.insert(prefix);
+        byFolder_.emplace(std::string_view(prefix.data(), prefix.size() - 1), prefix);
+        folderLengths_.insert(prefix.size() - 1);
+    }
     currentBatch = this;
 }
 
@@ -71,12 +75,14 @@ FolderStatusBatch::~FolderStatusBatch() {
     }
 }
 
-// Every prefix of the batch that the record path lies in: its ancestors, ending in "/".
+// Every prefix of the batch that the record path lies in: a folder of the batch that is the path
+// or one of its ancestors. Only the lengths of the batch's folders are looked up.
 void FolderStatusBatch::Match(const std::string& recordPath, QueueReading& reading) const {
-    const std::string probe = recordPath + "/";
-    for (size_t slash = probe.find('/'); slash != std::string::npos; slash = probe.find('/', slash + 1)) {
-        const auto prefix = prefixes_.find(std::string_view(probe.data(), slash + 1));
-        if (prefix != prefixes_.end()) reading.matched.insert(*prefix);
+    for (const size_t length : folderLengths_) {
+        if (recordPath.size() < length) break;
+        if (recordPath.size() > length && recordPath[length] != '/') continue;
+        const auto folder = byFolder_.find(std::string_view(recordPath.data(), length));
+        if (folder != byFolder_.end()) reading.matched.insert(folder->second);
     }
 }
 

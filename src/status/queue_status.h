@@ -5,8 +5,10 @@
 #include <sys/types.h>
 
 #include <map>
+#include <set>
 #include <string>
 #include <string_view>
+#include <unordered_map>
 #include <unordered_set>
 #include <utility>
 #include <vector>
@@ -50,6 +52,8 @@ private:
 
     std::vector<std::string> owned_;  // the prefixes that the views below point into
     std::unordered_set<std::string_view> prefixes_;
+    std::unordered_map<std::string_view, std::string_view> byFolder_;  // prefix without its "/" -> prefix
+    std::set<size_t> folderLengths_;
     std::map<std::string, QueueReading> readings_;
     FolderStatusBatch* outer_;
 };
