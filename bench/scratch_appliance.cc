@@ -112,36 +112,66 @@ size_t ScratchAppliance::WriteQueue(const std::string& share, size_t bytes, size
     return written;
 }
 
-double MedianSeconds(int runs, const std::function<void()>& reset, const std::function<void()>& run) {
-    std::vector<double> times;
-    for (int i = 0; i < runs; ++i) {
-        reset();
-        const auto start = std::chrono::steady_clock::now();
-        run();
-        times.push_back(std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count());
-    }
+namespace {
+
+double Seconds(const std::function<void()>& run) {
+    const auto start = std::chrono::steady_clock::now();
+    run();
+    return std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
+}
+
+double Median(std::vector<double> times) {
     std::sort(times.begin(), times.end());
     return times[times.size() / 2];
 }
 
-void RunAgainstBaseline(benchmark::State& state, double baselineSeconds, const std::function<void()>& reset,
-                        const std::function<void()>& run) {
+void Report(benchmark::State& state, double medianSeconds, double baselineSeconds) {
+    state.counters["median_ms"] = medianSeconds * 1e3;
+    state.counters["baseline_ms"] = baselineSeconds * 1e3;
+    state.counters["ratio"] = medianSeconds / baselineSeconds;
+}
+
+}  // namespace
+
+double MedianSeconds(int runs, const std::function<void()>& reset, const std::function<void()>& run) {
+    std::vector<double> times;
+    for (int i = 0; i < runs; ++i) {
+        reset();
+        times.push_back(Seconds(run));
+    }
+    return Median(times);
+}
+
+namespace {
+
+// The benchmark loop: `untimed` before each timed `run`; the run's times.
+std::vector<double> Iterate(benchmark::State& state, const std::function<void()>& untimed,
+                            const std::function<void()>& run) {
     std::vector<double> times;
     for (auto _ : state) {
-        state.PauseTiming();
-        reset();
-        state.ResumeTiming();
-        const auto start = std::chrono::steady_clock::now();
-        run();
-        const double seconds = std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
-        state.SetIterationTime(seconds);
-        times.push_back(seconds);
+        untimed();
+        times.push_back(Seconds(run));
+        state.SetIterationTime(times.back());
     }
-    std::sort(times.begin(), times.end());
-    const double median = times[times.size() / 2];
-    state.counters["median_ms"] = median * 1e3;
-    state.counters["baseline_ms"] = baselineSeconds * 1e3;
-    state.counters["ratio"] = median / baselineSeconds;
+    return times;
+}
+
+}  // namespace
+
+void RunAgainstBaseline(benchmark::State& state, double baselineSeconds, const std::function<void()>& reset,
+                        const std::function<void()>& run) {
+    Report(state, Median(Iterate(state, reset, run)), baselineSeconds);
+}
+
+void RunAgainstBaseline(benchmark::State& state, const Step& baseline, const Step& measured) {
+    std::vector<double> baselineTimes;
+    const auto untimed = [&] {
+        baseline.reset();
+        baselineTimes.push_back(Seconds(baseline.run));
+        measured.reset();
+    };
+    const double median = Median(Iterate(state, untimed, measured.run));
+    Report(state, median, Median(baselineTimes));
 }
 
 size_t CountLinesPlain(const std::vector<std::string>& files) {

@@ -51,6 +51,16 @@ double MedianSeconds(int runs, const std::function<void()>& reset, const std::fu
 void RunAgainstBaseline(benchmark::State& state, double baselineSeconds, const std::function<void()>& reset,
                         const std::function<void()>& run);
 
+// An untimed reset, then the timed run.
+struct Step {
+    std::function<void()> reset;
+    std::function<void()> run;
+};
+
+// The same with the baseline timed in every iteration just before the measured step, so that a
+// spell in which the machine runs slower slows both alike.
+void RunAgainstBaseline(benchmark::State& state, const Step& baseline, const Step& measured);
+
 // One read()+memchr pass over the files, counting lines: the floor for reading them.
 size_t CountLinesPlain(const std::vector<std::string>& files);
 

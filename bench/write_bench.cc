@@ -67,8 +67,8 @@ void BM_Upsert1000_OneShare(benchmark::State& state) {
         app.WriteFolderConf({});
         unlink(app.QueueOf("music").c_str());
     };
-    const double baseline = bench::MedianSeconds(5, reset, [&] { IndexMgr::Upsert(hundred); });
-    bench::RunAgainstBaseline(state, baseline, reset, [&] { benchmark::DoNotOptimize(IndexMgr::Upsert(thousand)); });
+    bench::RunAgainstBaseline(state, {reset, [&] { IndexMgr::Upsert(hundred); }},
+                              {reset, [&] { benchmark::DoNotOptimize(IndexMgr::Upsert(thousand)); }});
 }
 BENCHMARK(BM_Upsert1000_OneShare)->UseManualTime()->Unit(benchmark::kMillisecond)->Iterations(5);
 
@@ -85,8 +85,7 @@ void BM_ShareRemove900(benchmark::State& state) {
     const auto reset900 = [&] { app.WriteFolderConf(FolderPaths("music", 900)); };
     const auto reset100 = [&] { app.WriteFolderConf(FolderPaths("music", 100)); };
     const auto run = [] { benchmark::DoNotOptimize(IndexMgr::ShareRemove("music")); };
-    const double baseline = bench::MedianSeconds(5, reset100, run);
-    bench::RunAgainstBaseline(state, baseline, reset900, run);
+    bench::RunAgainstBaseline(state, {reset100, run}, {reset900, run});
 }
 BENCHMARK(BM_ShareRemove900)->UseManualTime()->Unit(benchmark::kMillisecond)->Iterations(5);
 
@@ -98,8 +97,7 @@ void BM_ShareRename900(benchmark::State& state) {
     const auto reset900 = [&] { app.WriteFolderConf(FolderPaths("music", 900)); };
     const auto reset100 = [&] { app.WriteFolderConf(FolderPaths("music", 100)); };
     const auto run = [] { benchmark::DoNotOptimize(IndexMgr::ShareRename("music", "tunes")); };
-    const double baseline = bench::MedianSeconds(5, reset100, run);
-    bench::RunAgainstBaseline(state, baseline, reset900, run);
+    bench::RunAgainstBaseline(state, {reset100, run}, {reset900, run});
 }
 BENCHMARK(BM_ShareRename900)->UseManualTime()->Unit(benchmark::kMillisecond)->Iterations(5);
 
