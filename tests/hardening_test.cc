@@ -81,12 +81,7 @@ protected:
         if (pipe(ready) != 0) return -1;
         const pid_t pid = fork();
         if (pid == 0) {
-            const int fd = socket(AF_UNIX, SOCK_STREAM, 0);
-            sockaddr_un address{};
-            address.sun_family = AF_UNIX;
-            std::strncpy(address.sun_path, path.c_str(), sizeof address.sun_path - 1);
-            bind(fd, reinterpret_cast<sockaddr*>(&address), sizeof address);
-            listen(fd, 4);
+            const int fd = testkit::ListenUnix(path, 4);
             if (write(ready[1], "r", 1) != 1) _exit(1);
             const int client = accept(fd, nullptr, nullptr);
             behaviour(client);

@@ -39,9 +39,7 @@ TEST_F(ReindexTest, ValidationFailsBeforeAnyRevivalOrEvent) {
     EXPECT_FALSE(IndexMgr::Reindex(J(R"(["/music/a", "/empty/x"])")));  // share without folders: silent
     EXPECT_TRUE(testkit::LogLines().empty());
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NONE);
-    std::string tooLong = "/music";  // fits as a share path, not once the volume is put in front
-    while (tooLong.size() + 201 < PATH_MAX) tooLong += "/" + std::string(200, 'x');
-    tooLong += "/" + std::string(PATH_MAX - 2 - tooLong.size(), 'x');
+    const std::string tooLong = testkit::TooLongSharePath();
     for (const std::string& path : std::vector<std::string>{"", "/music/../photo", "/music/a/", "/music//a", "/music/./a",
                                                             "/music/a\\u0000b", tooLong}) {
         SCOPED_TRACE(path.substr(0, 40));

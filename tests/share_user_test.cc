@@ -86,9 +86,7 @@ TEST_F(ShareUserTest, NulBytesAreRefusedBeforeAnythingReachesThePlatform) {
 }
 
 TEST_F(ShareUserTest, UpsertPathsMustBeCanonicalSharePaths) {
-    std::string tooLong = "/music";  // fits as a share path, not once the volume is put in front
-    while (tooLong.size() + 201 < PATH_MAX) tooLong += "/" + std::string(200, 'x');
-    tooLong += "/" + std::string(PATH_MAX - 2 - tooLong.size(), 'x');
+    const std::string tooLong = testkit::TooLongSharePath();
     for (const std::string& path : {std::string("/music/../../etc"), std::string("/music/a/"), std::string("/music//a"),
                                     std::string("/music/./a"), std::string("/"), std::string(""), std::string("music/a"),
                                     "/music/" + std::string(NAME_MAX + 1, 'x'), tooLong, std::string(5000, '/')}) {
@@ -153,12 +151,11 @@ TEST_F(ShareUserTest, ContendedLocksLeakNoDescriptor) {
 
 TEST_F(ShareUserTest, DaemonThatListensButNeverAcceptsFailsTheCallWithinTwoSeconds) {
     daemon_.reset();
-    const int listener = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    const int listener = testkit::ListenUnix(DaemonSocketPath(), 0);
+    ASSERT_GE(listener, 0);
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
     std::strncpy(address.sun_path, DaemonSocketPath().c_str(), sizeof address.sun_path - 1);
-    ASSERT_EQ(bind(listener, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
-    ASSERT_EQ(listen(listener, 0), 0);
     const int pending = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);  // fills the backlog
     ASSERT_EQ(connect(pending, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
     EXPECT_EQ(testkit::RunBounded(2, [] { return SendCammandToDaemon("resume", J("{}")); }), 0);

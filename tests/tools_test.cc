@@ -291,12 +291,7 @@ TEST_F(DaemonStandInTest, PauseHoldsWorkBack) {
     // The daemon takes commands before each drain pass: once it has taken a second pause, sent
     // after the record was queued, it has had its pass over the queue and held the record back.
     ASSERT_TRUE(StatusMgr::Pause(0));
-    const auto pauses = [this] {
-        const std::string log = testkit::ReadFile(log_);
-        size_t count = 0;
-        for (size_t at = log.find("\"type\":\"pause\""); at != std::string::npos; at = log.find("\"type\":\"pause\"", at + 1)) ++count;
-        return count;
-    };
+    const auto pauses = [this] { return testkit::CountOf(testkit::ReadFile(log_), "\"type\":\"pause\""); };
     ASSERT_TRUE(testkit::WaitFor([&] { return pauses() == 2; }));
     EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "paused");
     EXPECT_TRUE(testkit::Exists(QueueOf("music")));
@@ -330,9 +325,7 @@ TEST_F(DaemonStandInTest, RecordsAppendedWhileTheDaemonDrainsAreNotLost) {
     ASSERT_TRUE(testkit::WaitFor([this] {
         return !testkit::Exists(QueueOf("music")) && !testkit::Exists(QueueOf("music") + ".tmp");
     }));
-    const std::string log = testkit::ReadFile(log_);
-    size_t processed = 0;
-    for (size_t at = 0; (at = log.find("event 131072", at)) != std::string::npos; ++at) ++processed;
+    const size_t processed = testkit::CountOf(testkit::ReadFile(log_), "event 131072");
     EXPECT_LT(dropped, 1000) << "an event failed and marked the share";
     EXPECT_EQ(processed + static_cast<size_t>(dropped), static_cast<size_t>(kEvents));
 }

@@ -141,8 +141,7 @@ TEST_F(ContentionTest, ConcurrentCallersLoseNothing) {
         return !testkit::Exists(QueueOf("ev")) && !testkit::Exists(QueueOf("ev") + ".tmp");
     }));
     const std::string log = testkit::ReadFile(Path("/daemon.log"));
-    size_t processed = 0;
-    for (size_t at = 0; (at = log.find("/ev_", at)) != std::string::npos; ++at) ++processed;
+    const size_t processed = testkit::CountOf(log, "/ev_");
     EXPECT_EQ(processed, expectedEvents);
     EXPECT_EQ(log.find("malformed"), std::string::npos);
 }

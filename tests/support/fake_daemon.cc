@@ -12,16 +12,22 @@
 
 namespace testkit {
 
+int ListenUnix(const std::string& path, int backlog, int flags) {
+    const int fd = socket(AF_UNIX, SOCK_STREAM | flags, 0);
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    std::strncpy(address.sun_path, path.c_str(), sizeof address.sun_path - 1);
+    if (fd >= 0 && (bind(fd, reinterpret_cast<sockaddr*>(&address), sizeof address) != 0 || listen(fd, backlog) != 0)) {
+        close(fd);
+        return -1;
+    }
+    return fd;
+}
+
 FakeDaemon::FakeDaemon(const std::string& socketPath) : fd_(-1), path_(socketPath) {
     unlink(path_.c_str());
-    fd_ = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
-    sockaddr_un address;
-    std::memset(&address, 0, sizeof address);
-    address.sun_family = AF_UNIX;
-    std::strncpy(address.sun_path, path_.c_str(), sizeof address.sun_path - 1);
-    if (fd_ < 0 || bind(fd_, reinterpret_cast<sockaddr*>(&address), sizeof address) != 0 || listen(fd_, 512) != 0) {
-        throw std::runtime_error("fake daemon cannot listen on " + path_);
-    }
+    fd_ = ListenUnix(path_, 512, SOCK_CLOEXEC | SOCK_NONBLOCK);
+    if (fd_ < 0) throw std::runtime_error("fake daemon cannot listen on " + path_);
 }
 
 FakeDaemon::~FakeDaemon() {

@@ -1,6 +1,8 @@
 // A stand-in for fileindexd that listens on the sandbox's socket and records every frame.
 #pragma once
 
+#include <sys/socket.h>
+
 #include <string>
 #include <vector>
 
@@ -11,6 +13,9 @@
 namespace testkit {
 
 using Frame = tools::DaemonFrame;
+
+// A unix stream socket bound to `path` and listening; -1 on failure.
+int ListenUnix(const std::string& path, int backlog, int flags = SOCK_CLOEXEC);
 
 class FakeDaemon {
 public:

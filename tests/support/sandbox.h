@@ -38,6 +38,12 @@ bool Exists(const std::string& path);
 Json::Value ParseJson(const std::string& text);
 std::vector<Json::Value> ReadJsonLines(const std::string& path);
 
+// How often `needle` occurs in `text`.
+size_t CountOf(const std::string& text, const std::string& needle);
+
+// A share path of "music" that fits PATH_MAX, while the full path (volume in front) does not.
+std::string TooLongSharePath();
+
 // Journal entries as "op" or "op arg1 arg2 ..." strings.
 std::vector<std::string> JournalOps();
 
