@@ -147,7 +147,7 @@ void ArmFaultsAfter(const Json::Value& faults, const char* op, const std::string
     if (!waiting) return;
     UpdateState("faults.json", Json::Value(Json::objectValue), [&](Json::Value& all) {
         for (auto& fault : all) {
-            if (fault.isObject() && Matches(fault["after"], op, arg)) fault["armed"] = true;
+            if (fault.isObject() && fault.isMember("after") && Matches(fault["after"], op, arg)) fault["armed"] = true;
         }
     });
 }
