@@ -170,8 +170,11 @@ void RunAgainstBaseline(benchmark::State& state, const Step& baseline, const Ste
         baselineTimes.push_back(Seconds(baseline.run));
         measured.reset();
     };
-    const double median = Median(Iterate(state, untimed, measured.run));
-    Report(state, median, Median(baselineTimes));
+    const std::vector<double> times = Iterate(state, untimed, measured.run);
+    std::vector<double> ratios;
+    for (size_t i = 0; i < times.size(); ++i) ratios.push_back(times[i] / baselineTimes[i]);
+    Report(state, Median(times), Median(baselineTimes));
+    state.counters["ratio"] = Median(ratios);  // of each iteration's pair
 }
 
 size_t CountLinesPlain(const std::vector<std::string>& files) {

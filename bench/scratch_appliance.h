@@ -58,7 +58,8 @@ struct Step {
 };
 
 // The same with the baseline timed in every iteration just before the measured step, so that a
-// spell in which the machine runs slower slows both alike.
+// spell in which the machine runs slower slows both alike; the ratio is the median of the
+// iterations' own ratios.
 void RunAgainstBaseline(benchmark::State& state, const Step& baseline, const Step& measured);
 
 // One read()+memchr pass over the files, counting lines: the floor for reading them.

@@ -115,9 +115,16 @@ TEST_F(ListingTest, OneReadingPerQueueGivesTheWordsAndLogLinesOfAReadingPerFolde
         return "{\"event\":131072,\"path\":\"" + music_ + inside + "\"}\n";
     };
     MakeDir(music_ + "/@eaDir");
+    // Folders of several lengths, nested and sharing a prefix, on one page.
+    Json::Value conf = testkit::ParseJson(testkit::ReadFile(FolderConf()));
+    for (const char* inside : {"/f1/x", "/f33"}) {
+        MakeDir(music_ + inside);
+        conf[std::string("/music") + inside] = Json::Value(Json::objectValue);
+    }
+    testkit::WriteFile(FolderConf(), toString(conf));
     testkit::WriteFile(QueueOf("music"), "junk 1\n" + record("/f1/x") + "[2]\n" + record("/f3") + "{\"event\":-1}\n");
     testkit::WriteFile(QueueOf("music") + ".tmp", "tmp junk\n" + record("/f5/y"));
-    const Json::Value out = List(0, 10, "path", "ASC", J(R"(["status", "is_valid"])"));
+    const Json::Value out = List(0, 12, "path", "ASC", J(R"(["status", "is_valid"])"));
     const std::vector<std::string> batched = testkit::LogMessages();
     std::vector<std::string> separately;
     for (const auto& folder : out["folder"]) {
@@ -129,9 +136,14 @@ TEST_F(ListingTest, OneReadingPerQueueGivesTheWordsAndLogLinesOfAReadingPerFolde
         separately.insert(separately.end(), lines.begin(), lines.end());
     }
     EXPECT_EQ(batched, separately);
-    EXPECT_EQ(out["folder"][1]["additional"]["status"].asString(), "processing");
-    EXPECT_EQ(out["folder"][5]["additional"]["status"].asString(), "processing");
-    EXPECT_EQ(out["folder"][2]["additional"]["status"].asString(), "finished");
+    std::map<std::string, std::string> words;
+    for (const auto& folder : out["folder"]) words[folder["path"].asString()] = folder["additional"]["status"].asString();
+    EXPECT_EQ(words["/music/f1"], "processing");
+    EXPECT_EQ(words["/music/f1/x"], "processing");
+    EXPECT_EQ(words["/music/f3"], "processing");
+    EXPECT_EQ(words["/music/f33"], "finished");
+    EXPECT_EQ(words["/music/f5"], "processing");
+    EXPECT_EQ(words["/music/f2"], "finished");
 }
 
 }  // namespace

@@ -44,6 +44,23 @@ TEST_F(PlatformSimTest, InjectedFaultsFailWithTheirNumberAndOnlyForTheirArgument
     QIRAShareFree(share);
 }
 
+TEST_F(PlatformSimTest, FaultsAfterACallWaitForThatCallWithItsArgument) {
+    AddShare("music");
+    qira_sim::InjectFault("QIRAShareGet", 0x21, "music", {"QLIBServiceStart", "samba"});
+    qira_sim::InjectFault("QLIBServiceStop", 0x22, "", {"QLIBServiceStart", "samba"});
+    qira_sim::InjectFault("QLIBServiceRestart", 0x23);
+    QIRASHARE* share = nullptr;
+    ASSERT_EQ(QIRAShareGet("music", &share), 0);
+    QIRAShareFree(share);
+    EXPECT_EQ(QLIBServiceStart("fileindexd", 1), 0);  // another argument arms nothing
+    EXPECT_EQ(QLIBServiceStop("fileindexd", 1), 0);
+    EXPECT_EQ(QLIBServiceStart("samba", 1), 0);  // the call itself still passes
+    EXPECT_LT(QIRAShareGet("music", &share), 0);
+    EXPECT_EQ(QLIBCErrGet(), 0x21);
+    EXPECT_LT(QLIBServiceStop("fileindexd", 1), 0);
+    EXPECT_EQ(qira_sim::Faults()["QLIBServiceRestart"], J(R"({"err": 35})"));  // others untouched
+}
+
 TEST_F(PlatformSimTest, StateChangingCallsAreJournalledInOrder) {
     EXPECT_EQ(QLIBServiceStart("fileindexd", 1), 0);
     EXPECT_EQ(qira_sim::ServiceState("fileindexd"), "running");

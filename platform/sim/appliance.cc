@@ -124,7 +124,9 @@ void ClearFault(const std::string& op) {
     UpdateState("faults.json", Json::Value(Json::objectValue), [&](Json::Value& faults) { faults.removeMember(op); });
 }
 
-void ClearFaults() { detail::WriteState("faults.json", Json::Value(Json::objectValue)); }
+void ClearFaults() {
+    UpdateState("faults.json", Json::Value(Json::objectValue), [](Json::Value& faults) { faults = Json::Value(Json::objectValue); });
+}
 
 Json::Value Faults() { return ReadState("faults.json", Json::Value(Json::objectValue)); }
 

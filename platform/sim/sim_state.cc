@@ -146,8 +146,12 @@ void ArmFaultsAfter(const Json::Value& faults, const char* op, const std::string
                                                            Matches(fault["after"], op, arg));
     if (!waiting) return;
     UpdateState("faults.json", Json::Value(Json::objectValue), [&](Json::Value& all) {
-        for (auto& fault : all) {
-            if (fault.isObject() && fault.isMember("after") && Matches(fault["after"], op, arg)) fault["armed"] = true;
+        for (const auto& name : all.getMemberNames()) {
+            Json::Value& fault = all[name];
+            const bool wasWaiting = faults.isMember(name) && faults[name] == fault;  // not set since the call began
+            if (wasWaiting && fault.isObject() && fault.isMember("after") && Matches(fault["after"], op, arg)) {
+                fault["armed"] = true;
+            }
         }
     });
 }

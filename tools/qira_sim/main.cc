@@ -135,6 +135,7 @@ void AddInspectCommands(CLI::App& app, Options& o) {
 int main(int argc, char** argv) {
     CLI::App app{"Set up and inspect a simulated appliance", "qira-sim"};
     app.require_subcommand(1);
+    app.fallthrough();
     app.set_version_flag("--version", "qira-sim " FILEINDEX_VERSION);
     Options options;
     app.add_option("--root", options.root, "Root of the simulated appliance (instead of QIRA_ROOT)");
