@@ -1,4 +1,5 @@
 // Which shares, paths and file names may be indexed; room for the index; governing folder.
+#include <algorithm>
 #include <climits>
 #include <cstdlib>
 #include <cstring>
@@ -22,37 +23,12 @@ namespace {
 const std::vector<std::string> kSystemPreservedNames = {".TemporaryItems", "QIRA@.fileindexdb",
                                                         "QIRA@file_index_queue", ".QIRAPPSDB", ".DS_Store"};
 
-constexpr int kNeverIndexedFsType = 12;
 constexpr unsigned long long kIndexSpaceNeeded = 10485760ULL;
-
-bool Contains(const std::string& text, const char* part) { return text.find(part) != std::string::npos; }
-
-bool InRecycleBin(const std::string& fullPath) {
-    return Contains(fullPath, "#recycle") && QIRAShareIsShareRecycle(fullPath.c_str()) != 0;
-}
-
-bool InSnapshot(const std::string& fullPath) {
-    if (!Contains(fullPath, "#snapshot")) return false;
-    int inSnapshot = 0;
-    return QLIBFhsPathInSnapshot(fullPath.c_str(), &inSnapshot) == 0 && inSnapshot == 1;
-}
-
-bool IsUnindexableFsType(int type) {
-    return QIRAFSIsRemoteFS(type) != 0 || QIRAFSIsImageFS(type) != 0 || type == kNeverIndexedFsType;
-}
-
-bool IsListed(const std::vector<std::string>& names, const std::string& name) {
-    for (const auto& listed : names) {
-        if (listed == name) return true;
-    }
-    return false;
-}
-
 
 }  // namespace
 
 bool IsSystemPreservedFileName(const std::string& name) {
-    return QIRAEAIsHiddenDir(name.c_str()) == 1 || IsListed(kSystemPreservedNames, name);
+    return QIRAEAIsHiddenDir(name.c_str()) == 1 || std::find(kSystemPreservedNames.begin(), kSystemPreservedNames.end(), name) != kSystemPreservedNames.end();
 }
 
 bool IsSkipIndex(const std::string& fullPath) {
@@ -61,9 +37,9 @@ bool IsSkipIndex(const std::string& fullPath) {
     const size_t slash = fullPath.rfind('/');
     if (slash == std::string::npos) return true;
     if (IsSystemPreservedFileName(fullPath.substr(slash + 1))) return true;
-    if (InRecycleBin(fullPath) || InSnapshot(fullPath)) return true;
+    if (detail::InRecycleBin(fullPath) || detail::InSnapshot(fullPath)) return true;
     if (type == -1) return false;
-    return IsUnindexableFsType(type);
+    return detail::IsUnindexableFsType(type);
 }
 
 bool CanShareBeIndexed(_tag_QIRASHARE* share) { return detail::EvaluateShare(share, nullptr); }

@@ -1,5 +1,6 @@
 #include "indexability_rules.h"
 
+#include <algorithm>
 #include <climits>
 #include <cstdlib>
 #include <memory>
@@ -17,13 +18,6 @@ namespace {
 
 const std::vector<std::string> kSkippedShareNames = {"surveillance", "NetBackup"};
 constexpr int kNeverIndexedFsType = 12;
-
-bool IsListed(const std::vector<std::string>& names, const std::string& name) {
-    for (const auto& listed : names) {
-        if (listed == name) return true;
-    }
-    return false;
-}
 
 std::string DescriptionOf(const std::string& rule) {
     for (const auto& [name, description] : IndexabilityRules()) {
@@ -57,7 +51,7 @@ bool Contains(const std::string& text, const char* part) { return text.find(part
 bool ShareRules(QIRASHARE* share, Verdicts& verdicts) {
     Json::Value facts(Json::objectValue);
     facts["share"] = share->szName;
-    if (verdicts.Stop("skipped_share_name", IsListed(kSkippedShareNames, share->szName), facts)) return false;
+    if (verdicts.Stop("skipped_share_name", std::find(kSkippedShareNames.begin(), kSkippedShareNames.end(), share->szName) != kSkippedShareNames.end(), facts)) return false;
     int encrypted = 0;
     int readOnly = 0;
     if (QLIBShareIsEncryptedGet(share, &encrypted) < 0) {
@@ -76,6 +70,20 @@ bool ShareRules(QIRASHARE* share, Verdicts& verdicts) {
 }
 
 }  // namespace
+
+bool InRecycleBin(const std::string& fullPath) {
+    return Contains(fullPath, "#recycle") && QIRAShareIsShareRecycle(fullPath.c_str()) != 0;
+}
+
+bool InSnapshot(const std::string& fullPath) {
+    if (!Contains(fullPath, "#snapshot")) return false;
+    int inSnapshot = 0;
+    return QLIBFhsPathInSnapshot(fullPath.c_str(), &inSnapshot) == 0 && inSnapshot == 1;
+}
+
+bool IsUnindexableFsType(int type) {
+    return QIRAFSIsRemoteFS(type) != 0 || QIRAFSIsImageFS(type) != 0 || type == kNeverIndexedFsType;
+}
 
 const std::vector<std::pair<std::string, std::string>>& IndexabilityRules() {
     static const std::vector<std::pair<std::string, std::string>> rules = {
@@ -103,22 +111,20 @@ bool EvaluateFullPath(const std::string& fullPath, std::vector<RuleVerdict>* tra
     Json::Value facts(Json::objectValue);
 
     facts["marked"] = Contains(fullPath, "#recycle");
-    const bool recycle = facts["marked"].asBool() && QIRAShareIsShareRecycle(fullPath.c_str()) != 0;
+    const bool recycle = InRecycleBin(fullPath);
     facts["recycle_bin"] = recycle;
     if (verdicts.Stop("recycle_bin", recycle, facts)) return false;
 
     facts = Json::Value(Json::objectValue);
     facts["marked"] = Contains(fullPath, "#snapshot");
-    int inSnapshot = 0;
-    const bool snapshot = facts["marked"].asBool() && QLIBFhsPathInSnapshot(fullPath.c_str(), &inSnapshot) == 0 &&
-                          inSnapshot == 1;
+    const bool snapshot = InSnapshot(fullPath);
     facts["in_snapshot"] = snapshot;
     if (verdicts.Stop("snapshot", snapshot, facts)) return false;
 
     const int type = QIRAGetFSType(fullPath.c_str(), 0);
     facts = Json::Value(Json::objectValue);
     facts["type"] = type;
-    bool badType = type == -1 || QIRAFSIsRemoteFS(type) != 0 || QIRAFSIsImageFS(type) != 0 || type == kNeverIndexedFsType;
+    const bool badType = type == -1 || IsUnindexableFsType(type);
     if (verdicts.Tracing()) {
         facts["class"] = type == -1                         ? "unknown"
                          : QIRAFSIsRemoteFS(type) != 0      ? "remote"

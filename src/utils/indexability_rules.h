@@ -28,6 +28,11 @@ const std::vector<std::pair<std::string, std::string>>& IndexabilityRules();
 // rule's verdict and facts and goes on with the rules that can still be evaluated.
 bool EvaluateFullPath(const std::string& fullPath, std::vector<RuleVerdict>* trace);
 
+// The checks IsSkipIndex shares with the rules, each with its platform call.
+bool InRecycleBin(const std::string& fullPath);   // "#recycle" in it and the share's recycle bin
+bool InSnapshot(const std::string& fullPath);     // "#snapshot" in it and inside a snapshot
+bool IsUnindexableFsType(int type);               // remote, image, or never indexed (12)
+
 // CanShareBeIndexed's rules (skipped name, encrypted, read-only) for a share record.
 bool EvaluateShare(_tag_QIRASHARE* share, std::vector<RuleVerdict>* trace);
 
