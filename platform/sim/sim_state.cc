@@ -160,8 +160,9 @@ void ArmFaultsAfter(const Json::Value& faults, const char* op, const std::string
 
 bool Faulted(const char* op, const std::string& arg) {
     static const Json::Value kNone(Json::objectValue);
-    const Json::Value faults = ReadState("faults.json", kNone);
-    if (!faults.isObject()) return false;
+    const Json::Value& current = ReadState("faults.json", kNone);
+    if (!current.isObject() || current.empty()) return false;
+    const Json::Value faults = current;  // arming below rewrites the state
     ArmFaultsAfter(faults, op, arg);
     if (!faults.isMember(op)) return false;
     const Json::Value& fault = faults[op];

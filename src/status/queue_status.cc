@@ -61,7 +61,6 @@ FolderStatusBatch::FolderStatusBatch(const std::vector<Folder>& folders) : outer
         }
     }
     for (const auto& prefix : owned_) {
-        prefixes_.insert(prefix);
         byFolder_.emplace(std::string_view(prefix.data(), prefix.size() - 1), prefix);
         folderLengths_.insert(prefix.size() - 1);
     }
@@ -116,7 +115,7 @@ FolderStatusBatch::QueueReading& FolderStatusBatch::Read(const std::string& queu
 }
 
 bool FolderStatusBatch::Answer(const std::string& prefix, const std::string& queuePath, bool& inQueue) {
-    if (prefixes_.count(prefix) == 0) return false;
+    if (byFolder_.count(std::string_view(prefix).substr(0, prefix.size() - 1)) == 0) return false;
     const QueueReading& reading = Read(queuePath);
     if (reading.fd < 0) {
         errno = reading.openErrno;

@@ -51,7 +51,6 @@ private:
     void Match(const std::string& recordPath, QueueReading& reading) const;
 
     std::vector<std::string> owned_;  // the prefixes that the views below point into
-    std::unordered_set<std::string_view> prefixes_;
     std::unordered_map<std::string_view, std::string_view> byFolder_;  // prefix without its "/" -> prefix
     std::set<size_t> folderLengths_;
     std::map<std::string, QueueReading> readings_;

@@ -28,7 +28,8 @@ constexpr unsigned long long kIndexSpaceNeeded = 10485760ULL;
 }  // namespace
 
 bool IsSystemPreservedFileName(const std::string& name) {
-    return QIRAEAIsHiddenDir(name.c_str()) == 1 || std::find(kSystemPreservedNames.begin(), kSystemPreservedNames.end(), name) != kSystemPreservedNames.end();
+    return QIRAEAIsHiddenDir(name.c_str()) == 1 ||
+           std::find(kSystemPreservedNames.begin(), kSystemPreservedNames.end(), name) != kSystemPreservedNames.end();
 }
 
 bool IsSkipIndex(const std::string& fullPath) {
