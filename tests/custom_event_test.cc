@@ -1,6 +1,9 @@
 // Appending custom events to a share's queue; duplicates of a pending reindex; the fallback.
 #include "testkit.h"
 
+#include <poll.h>
+#include <sys/inotify.h>
+
 #include <algorithm>
 
 #include "pending_reindex.h"
@@ -57,20 +60,50 @@ TEST_F(CustomEventTest, OnlyReindexRecordsSuppressAndTheTmpCompanionCounts) {
     EXPECT_EQ(testkit::ReadJsonLines(QueueOf("s")).size(), 1u);
 }
 
-TEST_F(CustomEventTest, ContendedQueueGivesUpAfterThreeAttemptsAndReportsSuccess) {
+// A queue whose lock another process holds is waited for: released once the append has met it,
+// the record lands and the call succeeds.
+TEST_F(CustomEventTest, AHeldQueueIsWaitedForUntilItsLockIsReleased) {
+    testkit::WriteFile(FolderConf(), R"({"/s/a": {}})");
+    MakeDir(dir_ + "/@eaDir");
+    testkit::WriteFile(QueueOf("s"), "");
+    testkit::ChildHolding holder([this] { return flock(open(QueueOf("s").c_str(), O_RDWR), LOCK_EX) == 0; });
+    ASSERT_TRUE(holder.Took());
+    const int watch = inotify_init1(IN_CLOEXEC);
+    ASSERT_GE(inotify_add_watch(watch, QueueOf("s").c_str(), IN_CLOSE_WRITE), 0);
+    const pid_t appender = fork();
+    if (appender == 0) _exit(IndexMgr::Reindex(J(R"(["/s/a"])")) ? 1 : 0);
+    // An attempt that met the lock closes the queue again: release it then.
+    pollfd attempted{watch, POLLIN, 0};
+    ASSERT_EQ(poll(&attempted, 1, 60000), 1);
+    holder.Release();
+    int status = -1;
+    ASSERT_EQ(waitpid(appender, &status, 0), appender);
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1);
+    EXPECT_EQ(testkit::ReadFile(QueueOf("s")), "{\"data\":null,\"event\":65536,\"path\":\"" + dir_ + "/a\"}\n");
+    EXPECT_FALSE(testkit::Exists(StatusConf()));
+    close(watch);
+}
+
+// A queue held for longer than the append waits: the event is given up, the share is marked for a
+// full reindex, the caller learns of it, and the queue is left as it was.
+TEST_F(CustomEventTest, AQueueHeldTooLongMarksTheShareAndFails) {
+    testkit::WriteFile(FolderConf(), R"({"/s/a": {}})");
     MakeDir(dir_ + "/@eaDir");
     testkit::WriteFile(QueueOf("s"), "");
     testkit::ChildHolding holder([this] { return flock(open(QueueOf("s").c_str(), O_RDWR), LOCK_EX) == 0; });
     ASSERT_TRUE(holder.Took());
     LOG_LEVEL = 7;
-    EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/a", J("{}")));
+    EXPECT_FALSE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/b", J("{}")));
     LOG_LEVEL = 3;
-    EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/a", J("{}")));
+    EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"try lock too many times, path=" + QueueOf("s") +
+                                                               ", reason=Resource temporarily unavailable"});
+    EXPECT_EQ(testkit::ParseJson(testkit::ReadFile(StatusConf())), J(R"({"need_reindex": {"s": true}})"));
+    testkit::ClearLog();
+    EXPECT_FALSE(IndexMgr::Reindex(J(R"(["/s/a"])")));
+    EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"AddCustomEvent failed, path=/s/a"});
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NONE);
     holder.Release();
     EXPECT_EQ(testkit::ReadFile(QueueOf("s")), "");
-    EXPECT_FALSE(testkit::Exists(StatusConf()));
-    ASSERT_EQ(testkit::LogLines().size(), 1u);  // the debug-only line, once
-    EXPECT_EQ(testkit::LogLines()[0].message.rfind("try lock too many times, path=" + QueueOf("s") + ", reason=", 0), 0u);
 }
 
 TEST_F(CustomEventTest, UnknownShareMarksTheEmptyShareNameAndFails) {

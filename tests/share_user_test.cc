@@ -164,7 +164,7 @@ TEST_F(ShareUserTest, DaemonThatListensButNeverAcceptsFailsTheCallWithinTwoSecon
     close(listener);
 }
 
-TEST_F(ShareUserTest, ShortWriteIsCutBackSoTheNextRecordStaysWhole) {
+TEST_F(ShareUserTest, ShortWriteIsCutBackAndMarksTheShare) {
     // A long record first, so that the size limit below stays above every other file written.
     ASSERT_TRUE(AddCustomEvent(kEventFolderSettingChanged, music_ + "/a", Json::Value(std::string(1 << 20, 'x'))));
     const std::string before = testkit::ReadFile(QueueOf("music"));
@@ -173,8 +173,9 @@ TEST_F(ShareUserTest, ShortWriteIsCutBackSoTheNextRecordStaysWhole) {
         const rlimit limit{before.size() + 10, RLIM_INFINITY};
         return setrlimit(RLIMIT_FSIZE, &limit) == 0 && AddCustomEvent(kEventReindex, music_ + "/c", Json::Value());
     });
-    EXPECT_EQ(wrote, 1);  // a short write is not reported as a failure
+    EXPECT_EQ(wrote, 0);  // the event did not land: the share is marked instead
     EXPECT_EQ(testkit::ReadFile(QueueOf("music")), before);
+    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
     ASSERT_TRUE(AddCustomEvent(kEventReindex, music_ + "/c", Json::Value()));
     const auto records = Queue("music");
     ASSERT_FALSE(records.empty());

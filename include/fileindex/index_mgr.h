@@ -54,7 +54,8 @@ public:
     // PATH_MAX): unlike the original design, which stored any path, others fail with error 1.
     // Errors: 1 (bad request, nothing saved), 5 (too many folders, nothing saved), 6/8/9 (before
     // anything changes), 7 (save failed), 2 (a path stopped resolving after the save); a
-    // registration, service or daemon failure sets none (folder.conf already saved).
+    // registration, service or daemon failure sets none (folder.conf already saved), and so does
+    // a changed-setting event that could not be queued (its share is then marked need-reindex).
     static bool Upsert(const Json::Value& folders);
     static bool Set(const Json::Value& folders);
     static bool Add(const Json::Value& folders);
@@ -68,7 +69,9 @@ public:
     // else fails (error 1 for a malformed element, none for a share without folders) before
     // anything is revived or queued. No lock of folder.conf; revives out-of-space shares (status
     // lock, briefly) and queues event 65536 per path; error 2 for a path that stops resolving,
-    // events queued before it stay.
+    // events queued before it stay. An event that cannot be queued (AddCustomEvent: a queue held
+    // for about a second, or unwritable) fails the call with no error code, its share marked
+    // need-reindex.
     static bool Reindex(const Json::Value& paths);
 
     // --- Share lifecycle ---

@@ -59,9 +59,15 @@ FILEINDEX_EXPORT bool SendCammandToDaemon(const std::string& type, const Json::V
 // --- Custom event queue ----------------------------------------------------------------------
 constexpr int kEventReindex = 0x10000;
 constexpr int kEventFolderSettingChanged = 0x20000;
-// Appends {"event", "path", "data"} to the queue of the share holding the full path `path`.
-// When the event cannot be queued the share is marked for reindexing and false is returned.
-// The queue, its "@eaDir" and the ".tmp" companion are opened without following links.
+// Appends {"event", "path", "data"} to the queue of the share holding the full path `path`, as
+// one whole line under the queue's exclusive lock; true without writing when the queue or its
+// ".tmp" companion already holds a reindex record for exactly `path`. The event lands whole or the
+// share is marked need-reindex and false is returned, never neither: a queue whose lock stays held
+// is retried with a growing back-off for about one second in all before it is given up, and a
+// short write is cut back and given up too, because an event that vanished while the call reported
+// success could never be reindexed. Lock: the queue's, and the status lock to mark the share.
+// Sets no error code. The queue, its "@eaDir" and the companion are opened without following
+// links.
 FILEINDEX_EXPORT bool AddCustomEvent(const int& event, const std::string& path, const Json::Value& data);
 
 // --- No-space notice and migration -----------------------------------------------------------

@@ -4,7 +4,9 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
+#include <chrono>
 #include <cstdlib>
 #include <vector>
 
@@ -23,57 +25,65 @@ namespace QIRA {
 namespace FILEINDEX {
 namespace {
 
-constexpr int kAppendAttempts = 3;
-// Bound on reopening a queue that the daemon took away while we waited for its lock.
-constexpr int kMaxReopen = 100;
+// How long an append waits in all for a queue whose lock another writer, or the daemon taking
+// the queue, holds; then the event is given up and the share marked for a full reindex.
+constexpr std::chrono::milliseconds kLockPatience{1000};
+constexpr useconds_t kFirstBackOffUs = 1000;
+constexpr useconds_t kLongestBackOffUs = 32000;
 
-enum class AppendResult { Written, Contended, Failed };
-
-// A queue the daemon unlinked while we waited for its lock is no longer the queue.
-bool StillLinked(int fd) {
-    struct stat st;
-    return fstat(fd, &st) == 0 && st.st_nlink > 0;
+// The descriptor still names the queue: the daemon neither renamed nor removed it while we
+// waited for its lock.
+bool IsStillTheQueue(int fd, const std::string& queuePath) {
+    struct stat held, named;
+    return fstat(fd, &held) == 0 && lstat(queuePath.c_str(), &named) == 0 && held.st_dev == named.st_dev &&
+           held.st_ino == named.st_ino;
 }
 
-// A short write (disk full) is cut off again while the lock is held, so the next record does
-// not join a partial line.
-void WriteWholeLineOrNothing(int fd, const std::string& line) {
+// Writes the whole line or, after a short write (disk full), cuts the file back to where it was
+// while the lock is still held, so that the next record does not join a partial line.
+bool WriteWholeLine(int fd, const std::string& line) {
     struct stat before;
     const bool sized = fstat(fd, &before) == 0;
     const ssize_t wrote = write(fd, line.data(), line.size());
-    if (wrote == static_cast<ssize_t>(line.size())) return;
+    if (wrote == static_cast<ssize_t>(line.size())) return true;
     FILEIDX_DEBUG_LOG("write fail, (%ld, %ld)", static_cast<long>(wrote), static_cast<long>(line.size()));
     if (sized && wrote > 0) ftruncate(fd, before.st_size);
+    return false;
 }
 
-AppendResult AppendLine(const std::string& queuePath, const std::string& line) {
-    int attempt = 0;
-    int reopened = 0;
-    while (attempt < kAppendAttempts) {
+void BackOff(useconds_t& delayUs) {
+    usleep(delayUs / 2 + static_cast<useconds_t>(rand()) % (delayUs / 2 + 1));
+    delayUs = std::min(delayUs * 2, kLongestBackOffUs);
+}
+
+// True when the line was appended whole under the queue's lock.
+bool AppendLine(const std::string& queuePath, const std::string& line) {
+    const auto deadline = std::chrono::steady_clock::now() + kLockPatience;
+    useconds_t delayUs = kFirstBackOffUs;
+    while (true) {
         const int fd = detail::OpenNoFollow(queuePath, O_WRONLY | O_CREAT | O_APPEND, 0644);
-        if (fd < 0) return AppendResult::Failed;
+        if (fd < 0) return false;
         if (flock(fd, LOCK_EX | LOCK_NB) == 0) {
-            if (!StillLinked(fd) && ++reopened <= kMaxReopen) {
+            if (IsStillTheQueue(fd, queuePath)) {
+                const bool written = WriteWholeLine(fd, line);
                 flock(fd, LOCK_UN);
                 close(fd);
-                continue;
+                return written;
             }
-            WriteWholeLineOrNothing(fd, line);
-            flock(fd, LOCK_UN);
-            close(fd);
-            return AppendResult::Written;
-        }
-        if (errno != EINTR && errno != EWOULDBLOCK) {
+            flock(fd, LOCK_UN);  // taken while we waited: open the new queue at once
+        } else if (errno != EINTR && errno != EWOULDBLOCK) {
             FILEIDX_DEBUG_LOG("flock fail, path=%s, reason=%m", queuePath.c_str());
             close(fd);
-            return AppendResult::Failed;
+            return false;
+        } else {
+            BackOff(delayUs);
         }
         close(fd);
-        usleep(static_cast<useconds_t>((rand() % 10) * 1000));
-        ++attempt;
+        if (std::chrono::steady_clock::now() >= deadline) break;
     }
+    errno = EWOULDBLOCK;
     FILEIDX_DEBUG_LOG("try lock too many times, path=%s, reason=%m", queuePath.c_str());
-    return AppendResult::Contended;
+    return false;
 }
 
 bool MarkShareForReindex(const std::string& shareName) {
@@ -110,14 +120,7 @@ bool AddCustomEvent(const int& event, const std::string& path, const Json::Value
     record["event"] = static_cast<Json::UInt>(event);
     record["path"] = path;
     record["data"] = data;
-    switch (AppendLine(queuePath, toString(record) + "\n")) {
-        case AppendResult::Written:
-        case AppendResult::Contended:
-            return true;
-        case AppendResult::Failed:
-            break;
-    }
-    return MarkShareForReindex(share);
+    return AppendLine(queuePath, toString(record) + "\n") || MarkShareForReindex(share);
 }
 
 }  // namespace detail

@@ -27,9 +27,9 @@ int Stop(pid_t pid);
 template <typename F>
 int RunBounded(unsigned seconds, F call);
 
-// Polls `done` every 2 ms, at most `attempts` times.
+// Polls `done` every 2 ms, at most `attempts` times (a guard against a hang, not a deadline).
 template <typename F>
-bool WaitFor(F done, int attempts = 2500);
+bool WaitFor(F done, int attempts = 30000);
 
 }  // namespace testkit
 

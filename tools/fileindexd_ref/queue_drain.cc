@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <ftw.h>
 #include <sys/file.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -74,18 +75,23 @@ int TakeQueue(const std::string& queuePath) {
         close(fd);
         return 0;
     }
-    std::string text;
-    char buffer[65536];
-    ssize_t got;
-    while ((got = read(fd, buffer, sizeof buffer)) > 0) text.append(buffer, static_cast<size_t>(got));
-    int moved = 0;
-    if (AppendAll(queuePath + ".tmp", text)) {
-        moved = static_cast<int>(std::count(text.begin(), text.end(), '\n'));
-        unlink(queuePath.c_str());
+    // The lock is held only for the rename (or, when records taken earlier still wait in the
+    // companion, for the copy): writers wait as briefly as possible.
+    const std::string taken = queuePath + ".tmp";
+    struct stat st;
+    bool moved = false;
+    if (lstat(taken.c_str(), &st) != 0) {
+        moved = rename(queuePath.c_str(), taken.c_str()) == 0;
+    } else {
+        std::string text;
+        char buffer[65536];
+        ssize_t got;
+        while ((got = read(fd, buffer, sizeof buffer)) > 0) text.append(buffer, static_cast<size_t>(got));
+        moved = AppendAll(taken, text) && unlink(queuePath.c_str()) == 0;
     }
     flock(fd, LOCK_UN);
     close(fd);
-    return moved;
+    return moved ? 1 : 0;
 }
 
 int ProcessTaken(const std::string& queuePath) {

@@ -5,8 +5,9 @@
 
 namespace fileindexd_ref {
 
-// Moves the queue's records to its ".tmp" companion under the queue's lock and removes the
-// queue, so that writers waiting for the lock open a new one. Returns the records moved.
+// Moves the queue to its ".tmp" companion under the queue's lock (renamed, or appended when the
+// companion still holds records), so that writers waiting for the lock open a new queue. Returns
+// 1 when the queue was taken, 0 when there was none or it could not be moved.
 int TakeQueue(const std::string& queuePath);
 
 // Processes every record of the ".tmp" companion (counting the files under each event's path by
