@@ -235,7 +235,8 @@ protected:
         daemon_.reset();
         log_ = Path("/daemon.log");
         pid_ = testkit::Start({FILEINDEXD_REF, "--interval", "5"}, log_);
-        ASSERT_TRUE(testkit::WaitFor([this] { return testkit::Exists(Path("/var/run/fileindexd.sock")); }));
+        // The socket file appears at bind, before the daemon listens: wait for its own word.
+        ASSERT_TRUE(testkit::WaitFor([this] { return testkit::ReadFile(log_).find("listening on") != std::string::npos; }));
     }
     void TearDown() override {
         if (pid_ > 0) {
