@@ -63,7 +63,7 @@ TEST_F(ExplainTest, TellsTheGoverningFolderByTheLastMatchAndWhatIsPending) {
                                               "video": false, "photo": true})"));
     EXPECT_TRUE(inner["inside_indexed_folder"].asBool());
     EXPECT_FALSE(inner["contains_indexed_folder"].asBool());
-    EXPECT_EQ(inner["pending"], J(R"({"queue": 1, "companion": 1})"));
+    EXPECT_EQ(inner["pending"], J(R"({"queue": 1, "companion": 1, "unread": []})"));
     EXPECT_EQ(inner["status"].asString(), "processing");
     EXPECT_EQ(Explain("/music/c")["governing_folder"]["name"].asString(), "all");
     EXPECT_TRUE(Explain("/music")["contains_indexed_folder"].asBool());
@@ -84,7 +84,7 @@ TEST_F(ExplainTest, ProgressCountsLinesPerShareAndRecordsPerFolder) {
     ASSERT_TRUE(GetProgress(out));
     EXPECT_EQ(out["pause"], J(R"({"paused": false, "resume_time": -1})"));
     ASSERT_EQ(out["shares"].size(), 2u);
-    EXPECT_EQ(out["shares"][0], J(R"({"share": "music", "queue": 6, "companion": 2, "pending": 8, "folders": [
+    EXPECT_EQ(out["shares"][0], J(R"({"share": "music", "queue": 6, "companion": 2, "pending": 8, "unread": [], "folders": [
         {"path": "/music/a", "pending": 3}, {"path": "/music/a/b", "pending": 1}, {"path": "/music/c", "pending": 2}]})"));
     EXPECT_EQ(out["shares"][1]["pending"].asUInt(), 0u);
     EXPECT_TRUE(testkit::LogLines().empty());  // no malformed line is logged

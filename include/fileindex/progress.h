@@ -11,7 +11,9 @@ namespace FILEINDEX {
 // Fills `out` with {"pause": {"paused", "resume_time"}, "shares": [...]}: one entry per share
 // holding indexed folders, in name order, with "share", "queue" and "companion" (the lines
 // pending in its queue file and in the ".tmp" companion, counted without parsing; a malformed
-// line is work for the daemon too), "pending" (their sum) and "folders" (per indexed folder of
+// line is work for the daemon too), "unread" (which of "queue" and "companion" were not read
+// because they are sparse or larger than 1 GiB: their share is marked need-reindex and they count
+// 0 here), "pending" (their sum) and "folders" (per indexed folder of
 // the share: "path" and "pending", the well-formed records whose path, or old path for event 256,
 // is the folder or beneath it, as the folder status counts them). Takes no lock and logs no
 // malformed line. False, with the error code of the load, when folder.conf or status.conf

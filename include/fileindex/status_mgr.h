@@ -48,7 +48,11 @@ public:
     static bool GetStatus(std::string& status);
     // "finished", "processing", "paused" (also: the folder cannot be indexed) or "err_no_space".
     // Never fails: problems are logged and answer "finished". Reads the whole queue and its
-    // companion, logging each malformed line.
+    // companion, logging each malformed line. Any queue content costs bounded memory and time,
+    // since a share's users can write there: a line longer than 64 KiB is malformed and logged by
+    // its offset and length, never held; a queue file that is sparse or larger than 1 GiB is not
+    // read at all (logged, its share marked need-reindex) and counts as pending.
+    // Lock: none, except the status lock briefly to mark a share.
     static std::string GetFolderStatus(const std::string& path);
 };
 

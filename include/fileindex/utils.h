@@ -65,7 +65,8 @@ constexpr int kEventFolderSettingChanged = 0x20000;
 // share is marked need-reindex and false is returned, never neither: a queue whose lock stays held
 // is retried with a growing back-off for about one second in all before it is given up, and a
 // short write is cut back and given up too, because an event that vanished while the call reported
-// success could never be reindexed. Lock: the queue's, and the status lock to mark the share.
+// success could never be reindexed. A record longer than the queue's readers take (64 KiB) is
+// given up the same way. Lock: the queue's, and the status lock to mark the share.
 // Sets no error code. The queue, its "@eaDir" and the companion are opened without following
 // links.
 FILEINDEX_EXPORT bool AddCustomEvent(const int& event, const std::string& path, const Json::Value& data);

@@ -53,11 +53,15 @@ Json::Value Pending(const std::string& share, const std::string& fullPath) {
     Json::Value pending(Json::objectValue);
     pending["queue"] = 0;
     pending["companion"] = 0;
+    pending["unread"] = Json::Value(Json::arrayValue);
     std::string queuePath;
     if (fullPath.empty() || !detail::ShareQueuePath(share, queuePath)) return pending;
     const std::string prefix = fullPath + "/";
-    pending["queue"] = static_cast<Json::Int64>(detail::CountRecordsUnder(queuePath, {prefix})[prefix]);
-    pending["companion"] = static_cast<Json::Int64>(detail::CountRecordsUnder(queuePath + ".tmp", {prefix})[prefix]);
+    for (const auto& [role, file] : {std::pair{"queue", queuePath}, std::pair{"companion", queuePath + ".tmp"}}) {
+        bool refused = false;
+        pending[role] = static_cast<Json::Int64>(detail::CountRecordsUnder(file, {prefix}, &refused)[prefix]);
+        if (refused) pending["unread"].append(role);
+    }
     return pending;
 }
 

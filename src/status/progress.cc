@@ -29,8 +29,14 @@ Json::Value ShareProgress(const std::string& share, const std::vector<std::strin
     entry["share"] = share;
     std::string queuePath;
     if (!detail::ShareQueuePath(share, queuePath)) queuePath.clear();
-    const unsigned long long queue = queuePath.empty() ? 0 : detail::CountLines(queuePath);
-    const unsigned long long companion = queuePath.empty() ? 0 : detail::CountLines(queuePath + ".tmp");
+    const detail::LineCount queueLines = queuePath.empty() ? detail::LineCount() : detail::CountLines(queuePath);
+    const detail::LineCount companionLines =
+        queuePath.empty() ? detail::LineCount() : detail::CountLines(queuePath + ".tmp");
+    const unsigned long long queue = queueLines.lines;
+    const unsigned long long companion = companionLines.lines;
+    entry["unread"] = Json::Value(Json::arrayValue);
+    if (queueLines.refused) entry["unread"].append("queue");
+    if (companionLines.refused) entry["unread"].append("companion");
     entry["queue"] = static_cast<Json::Int64>(queue);
     entry["companion"] = static_cast<Json::Int64>(companion);
     entry["pending"] = static_cast<Json::Int64>(queue + companion);

@@ -7,32 +7,34 @@
 #include <string_view>
 #include <unordered_map>
 
-#include "ea_dir.h"
 #include "queue_file.h"
 
 namespace QIRA {
 namespace FILEINDEX {
 namespace detail {
 
-unsigned long long CountLines(const std::string& file) {
-    const int fd = OpenNoFollow(file, O_RDONLY);
-    if (fd < 0) return 0;
+LineCount CountLines(const std::string& file) {
+    LineCount count;
+    int fd = -1;
+    const QueueOpen opened = OpenQueueForReading(file, fd);
+    count.refused = opened == QueueOpen::Refused;
+    if (opened != QueueOpen::Opened) return count;
     static thread_local char buffer[1 << 20];
-    unsigned long long lines = 0;
     char last = '\n';
     ssize_t got;
     while ((got = read(fd, buffer, sizeof buffer)) > 0) {
         for (const char* p = buffer; (p = static_cast<const char*>(std::memchr(p, '\n', buffer + got - p))) != nullptr; ++p) {
-            ++lines;
+            ++count.lines;
         }
         last = buffer[got - 1];
     }
     close(fd);
-    return lines + (last != '\n' ? 1 : 0);
+    if (last != '\n') ++count.lines;
+    return count;
 }
 
 std::map<std::string, unsigned long long> CountRecordsUnder(const std::string& file,
-                                                            const std::vector<std::string>& prefixes) {
+                                                            const std::vector<std::string>& prefixes, bool* refused) {
     std::unordered_map<std::string_view, unsigned long long> counts;
     for (const auto& prefix : prefixes) counts.emplace(prefix, 0);
     // Each prefix a record lies in counts it once, by its path or else its old path.
@@ -49,14 +51,15 @@ std::map<std::string, unsigned long long> CountRecordsUnder(const std::string& f
             }
         }
     };
-    ScanQueue(
+    const QueueOpen opened = ScanQueue(
         file,
         [&](const QueueRecord& record) {
             std::vector<std::string_view> seen;
             countAncestors(record.path, seen);
             if (record.event == kEventRename && !record.path_old.empty()) countAncestors(record.path_old, seen);
         },
-        [](const std::string&, off_t) {});
+        [](const MalformedLine&) {});
+    if (refused != nullptr) *refused = opened == QueueOpen::Refused;
     std::map<std::string, unsigned long long> result;
     for (const auto& [prefix, count] : counts) result.emplace(std::string(prefix), count);
     return result;

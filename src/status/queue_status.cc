@@ -19,9 +19,19 @@ namespace {
 
 thread_local FolderStatusBatch* currentBatch = nullptr;
 
+// "Malformed command: <line>", or for an overlong line its offset and length, never its text.
+void LogMalformedLine(const std::string& queueFile, const MalformedLine& line) {
+    if (line.overlong) {
+        FILEIDX_LOG("Malformed command: too long, queue=%s, offset=%lld, length=%zu", queueFile.c_str(),
+                    static_cast<long long>(line.offset), line.length);
+    } else {
+        FILEIDX_LOG("Malformed command: %.*s", static_cast<int>(line.text.size()), line.text.data());
+    }
+}
+
 bool ScanForFolder(const std::string& folderFullPath, const std::string& queuePath) {
     bool found = false;
-    const bool opened = ScanQueue(
+    const QueueOpen opened = ScanQueue(
         queuePath,
         [&](const QueueRecord& record) {
             if (IsWithin(record.path, folderFullPath) ||
@@ -29,12 +39,12 @@ bool ScanForFolder(const std::string& folderFullPath, const std::string& queuePa
                 found = true;
             }
         },
-        [](const std::string& line, off_t) { FILEIDX_LOG("Malformed command: %s", line.c_str()); });
-    if (!opened) {
+        [&](const MalformedLine& line) { LogMalformedLine(queuePath, line); });
+    if (opened == QueueOpen::Failed) {
         FILEIDX_LOG("Failed to open queue=%s, reason=%m", queuePath.c_str());
         return false;
     }
-    return found;
+    return found || opened == QueueOpen::Refused;  // a refused queue counts as pending
 }
 
 }  // namespace
@@ -95,10 +105,11 @@ FolderStatusBatch::QueueReading& FolderStatusBatch::Read(const std::string& queu
         return found->second;
     }
     QueueReading reading;
-    reading.fd = OpenNoFollow(queuePath, O_RDONLY);
-    if (reading.fd < 0) {
+    const QueueOpen opened = OpenQueueForReading(queuePath, reading.fd);
+    reading.refused = opened == QueueOpen::Refused;
+    if (opened == QueueOpen::Failed) {
         reading.openErrno = errno;
-    } else if (fstat(reading.fd, &st) == 0) {
+    } else if (opened == QueueOpen::Opened && fstat(reading.fd, &st) == 0) {
         reading.dev = st.st_dev;
         reading.ino = st.st_ino;
         reading.size = st.st_size;
@@ -108,7 +119,7 @@ FolderStatusBatch::QueueReading& FolderStatusBatch::Read(const std::string& queu
                 Match(record.path, reading);
                 if (record.event == kEventRename) Match(record.path_old, reading);
             },
-            [&](const std::string& line, off_t offset) { reading.malformed.emplace_back(offset, line.size()); });
+            [&](const MalformedLine& line) { reading.malformed.push_back({line.offset, line.length, {}, line.overlong}); });
     }
     if (found != readings_.end() && found->second.fd >= 0) close(found->second.fd);
     return readings_[queuePath] = std::move(reading);
@@ -117,16 +128,22 @@ FolderStatusBatch::QueueReading& FolderStatusBatch::Read(const std::string& queu
 bool FolderStatusBatch::Answer(const std::string& prefix, const std::string& queuePath, bool& inQueue) {
     if (byFolder_.count(std::string_view(prefix).substr(0, prefix.size() - 1)) == 0) return false;
     const QueueReading& reading = Read(queuePath);
+    if (reading.refused) {
+        inQueue = true;
+        return true;
+    }
     if (reading.fd < 0) {
         errno = reading.openErrno;
         FILEIDX_LOG("Failed to open queue=%s, reason=%m", queuePath.c_str());
         inQueue = false;
         return true;
     }
-    for (const auto& [offset, length] : reading.malformed) {
-        std::string line(length, '\0');
-        if (pread(reading.fd, &line[0], length, offset) != static_cast<ssize_t>(length)) line.clear();
-        FILEIDX_LOG("Malformed command: %s", line.c_str());
+    for (const auto& malformed : reading.malformed) {
+        std::string text(malformed.overlong ? 0 : malformed.length, '\0');
+        if (pread(reading.fd, &text[0], text.size(), malformed.offset) != static_cast<ssize_t>(text.size())) text.clear();
+        MalformedLine line = malformed;
+        line.text = text;
+        LogMalformedLine(queuePath, line);
     }
     inQueue = reading.matched.count(prefix) != 0;
     return true;

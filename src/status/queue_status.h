@@ -14,13 +14,15 @@
 #include <vector>
 
 #include "fileindex/folder.h"
+#include "queue_file.h"
 
 namespace QIRA {
 namespace FILEINDEX {
 namespace detail {
 
 // True when `queuePath` holds a well-formed record whose path (or, for event 256, old path) is
-// the folder or lies beneath it. Malformed lines are logged and skipped. Inside a
+// the folder or lies beneath it, or when the queue is refused for reading (sparse or oversized).
+// Malformed lines are logged and skipped. Inside a
 // FolderStatusBatch of the calling thread the answer and the log lines come from the batch.
 bool IsFolderInQueue(const std::string& folderPath, const std::string& queuePath);
 
@@ -43,7 +45,8 @@ private:
         off_t size = 0;  // when read; a file that has changed since is read again
         int fd = -1;     // kept open to read malformed lines again for their log lines
         int openErrno = 0;
-        std::vector<std::pair<off_t, size_t>> malformed;
+        bool refused = false;  // sparse or oversized: every folder counts as pending
+        std::vector<MalformedLine> malformed;  // without their text
         std::unordered_set<std::string_view> matched;  // prefixes with a record
     };
 

@@ -86,13 +86,6 @@ bool AppendLine(const std::string& queuePath, const std::string& line) {
     return false;
 }
 
-bool MarkShareForReindex(const std::string& shareName) {
-    if (!StatusMgr::ShareSetNeedReindex(shareName, true)) {
-        FILEIDX_LOG("ShareSetNeedReindex failed, share=%s", shareName.c_str());
-    }
-    return false;
-}
-
 }  // namespace
 
 namespace detail {
@@ -120,7 +113,12 @@ bool AddCustomEvent(const int& event, const std::string& path, const Json::Value
     record["event"] = static_cast<Json::UInt>(event);
     record["path"] = path;
     record["data"] = data;
-    return AppendLine(queuePath, toString(record) + "\n") || MarkShareForReindex(share);
+    const std::string line = toString(record) + "\n";
+    if (line.size() - 1 > kMaxQueueLine) {
+        FILEIDX_LOG("Event too long for the queue, path=%s, length=%zu", path.c_str(), line.size() - 1);
+        return MarkShareForReindex(share);
+    }
+    return AppendLine(queuePath, line) || MarkShareForReindex(share);
 }
 
 }  // namespace detail

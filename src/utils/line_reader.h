@@ -1,4 +1,6 @@
-// Reading a file line by line in large blocks, keeping no more than the longest line in memory.
+// Reading a file line by line in large blocks. A line longer than the reader's limit is never
+// held in memory: it is skipped to its newline and reported by its offset and length only, so
+// memory stays bounded by the limit and one block whatever the file holds.
 #pragma once
 
 #include <sys/types.h>
@@ -15,23 +17,34 @@ public:
     // Readable bytes that always follow a returned line (simdjson reads past the end it is given).
     static constexpr size_t kPadding = 64;
 
-    // Reads `fd` from its current offset; the descriptor stays the caller's.
-    explicit LineReader(int fd) : fd_(fd) {}
+    struct Line {
+        const char* begin = nullptr;  // the bytes without the "\n"; null for an overlong line
+        const char* end = nullptr;
+        off_t offset = 0;             // of the first byte, from where reading began
+        size_t length = 0;            // without the "\n"
+        bool overlong = false;        // longer than the limit: skipped, not held
+    };
 
-    // The next line without its "\n" (a last line without one counts too); false at the end of
-    // the file or on a read error. The bytes stay valid until the next call.
-    bool Next(const char*& begin, const char*& end);
+    // Reads `fd` from its current offset; the descriptor stays the caller's.
+    LineReader(int fd, size_t maxLine) : fd_(fd), maxLine_(maxLine) {}
+
+    // The next line (a last line without "\n" counts too); false at the end of the file or on a
+    // read error. The bytes stay valid until the next call.
+    bool Next(Line& line);
 
     // Bytes of the file up to and including the last "\n" returned so far.
     off_t TerminatedBytes() const { return terminated_; }
 
 private:
     bool Fill();
+    bool Take(size_t end, bool terminated, Line& line);
+    bool SkipOverlong(Line& line);
 
     int fd_;
+    size_t maxLine_;
     std::vector<char> buffer_;
-    size_t start_ = 0;     // first unread byte in buffer_
-    size_t filled_ = 0;    // bytes of buffer_ holding file data
+    size_t start_ = 0;        // first unread byte in buffer_
+    size_t filled_ = 0;       // bytes of buffer_ holding file data
     off_t bufferOffset_ = 0;  // file offset of buffer_[0], relative to where reading began
     off_t terminated_ = 0;
     bool eof_ = false;

@@ -10,6 +10,7 @@
 #include "fileindex/utils.h"
 #include "line_reader.h"
 #include "log.h"
+#include "queue_file.h"
 #include "queue_record.h"
 
 namespace QIRA {
@@ -88,13 +89,14 @@ void PendingReindex::CatchUp(int fd, FileState& state) {
         fd = state.fd;
     }
     if (lseek(fd, state.scanned, SEEK_SET) != state.scanned) return;
-    LineReader lines(fd);
+    LineReader lines(fd, kMaxQueueLine);
     QueueRecordReader reader;
     QueueRecord record;
-    const char* begin;
-    const char* end;
-    while (lines.Next(begin, end)) {
-        if (!MayCarryWantedPath(begin, end) || !reader.Read(begin, end, record)) continue;
+    LineReader::Line line;
+    while (lines.Next(line)) {
+        if (line.overlong || !MayCarryWantedPath(line.begin, line.end) || !reader.Read(line.begin, line.end, record)) {
+            continue;
+        }
         if (record.event == static_cast<unsigned>(kEventReindex) && wanted_.count(record.path) != 0) {
             state.queued.insert(record.path);
         }
@@ -106,10 +108,15 @@ void PendingReindex::CatchUp(int fd, FileState& state) {
 bool PendingReindex::IsQueued(const std::string& path, const std::string& queueFile) {
     if (!IsFileExist(queueFile)) return false;
     Watch(path);
-    const int fd = OpenNoFollow(queueFile, O_RDONLY);
-    if (fd < 0) {
-        FILEIDX_LOG("Failed to open queue=%s, reason=%m", queueFile.c_str());
-        return false;
+    int fd = -1;
+    switch (OpenQueueForReading(queueFile, fd)) {
+        case QueueOpen::Opened:
+            break;
+        case QueueOpen::Refused:
+            return false;  // the share is marked for a full reindex instead
+        case QueueOpen::Failed:
+            FILEIDX_LOG("Failed to open queue=%s, reason=%m", queueFile.c_str());
+            return false;
     }
     FileState& state = files_[queueFile];
     CatchUp(fd, state);

@@ -25,7 +25,8 @@ public:
     PendingReindex& operator=(const PendingReindex&) = delete;
 
     // True when `queueFile` holds a reindex record for exactly the full path `path`. A file that
-    // exists but cannot be opened logs "Failed to open queue=%s, reason=%m" and answers false.
+    // exists but cannot be opened logs "Failed to open queue=%s, reason=%m" and answers false; so
+    // does one that is refused for reading (sparse or oversized), whose share is then marked.
     bool IsQueued(const std::string& path, const std::string& queueFile);
 
 private:
