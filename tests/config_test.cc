@@ -16,6 +16,27 @@ TEST(ErrorHandlerTest, CodesAndLogLevelKeepTheirValues) {
     EXPECT_EQ(LOG_LEVEL, 3);
 }
 
+// A host's sink gets every line with its parts; beside the system log or instead of it.
+TEST_F(ConfigTest, ALogSinkReceivesEveryLineBesideOrInsteadOfTheSystemLog) {
+    static std::vector<std::string> received;
+    const auto keep = [](const QIRA::FILEINDEX::LogLine& line, void* context) {
+        received.push_back(*static_cast<std::string*>(context) + " " + std::to_string(line.priority) + " " + line.file +
+                           " " + line.message + (line.line > 0 ? "" : " (no line)"));
+    };
+    std::string tag = "sink";
+    for (const auto mode : {LogSinkMode::BesidesSyslog, LogSinkMode::InsteadOfSyslog}) {
+        received.clear();
+        testkit::ClearLog();
+        SetLogSink(keep, &tag, mode);
+        testkit::WriteFile(StatusConf(), "not json");
+        Status().Load();
+        SetLogSink(nullptr, nullptr, mode);
+        Status().Load();
+        EXPECT_EQ(received, std::vector<std::string>{"sink 3 config.cc Failed to load json from " + StatusConf()});
+        EXPECT_EQ(testkit::LogMessages().size(), mode == LogSinkMode::BesidesSyslog ? 2u : 1u);
+    }
+}
+
 TEST_F(ConfigTest, UnparsableFilesFailWithErrorSixAndTheirPath) {
     const std::string nested(100000, '[');
     for (const std::string& content : std::vector<std::string>{"", "{\"a\": ", "not json", "{} {}", "{/*c*/}", nested}) {

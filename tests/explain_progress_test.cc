@@ -129,8 +129,16 @@ TEST_F(InsightToolTest, WatchWritesJsonLinesOffATerminalAndBarsOnOne) {
     ASSERT_EQ(screen.status, 0) << screen.err;
     EXPECT_NE(screen.out.find("\033[H\033[J"), std::string::npos);
     EXPECT_NE(screen.out.find("music [------------------------------] 1 pending"), std::string::npos) << screen.out;
-    const auto explain = Ctl({"explain", "/nosuch/x"});
-    EXPECT_EQ(explain.out.rfind("/nosuch/x: cannot be indexed, refused by share_path\n", 0), 0u) << explain.out;
+}
+
+// The first problem in words, and a folder without a name called so.
+TEST_F(InsightToolTest, ExplainSaysWhatIsWrongInWords) {
+    testkit::WriteFile(FolderConf(), R"({"/music/gone": {}})");
+    const auto explain = Ctl({"explain", "/music/gone"}).out;
+    EXPECT_EQ(explain.rfind("/music/gone: cannot be indexed: the directory does not exist (refused by canonical_path)\n", 0), 0u)
+        << explain;
+    EXPECT_NE(explain.find("governing folder: /music/gone (unnamed; document no, audio no, video no, photo no)"),
+              std::string::npos);
 }
 
 }  // namespace

@@ -41,8 +41,8 @@ public:
     bool SaveJson();
     // Three non-blocking attempts 0-9 ms apart; error 9 when the lock stays held or the lock file
     // cannot be opened. The lock file is opened without following a symbolic link and must be a
-    // regular file. Unlike the original design, which kept them open, the descriptor of each
-    // failed attempt is closed, so contention leaks nothing.
+    // regular file. The descriptor of each failed attempt is closed, so that a process meeting
+    // contention many times runs out of nothing.
     bool Lock(bool exclusive);
     // Releases the lock and closes its descriptor.
     // REQUIRES: only after a successful Lock, once; after a failed Lock it does nothing.

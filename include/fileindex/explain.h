@@ -1,4 +1,4 @@
-// Why a share path is or is not indexed. An addition to the specified interface.
+// Why a share path is or is not indexed, for administrators and support.
 #pragma once
 
 #include <string>
@@ -12,7 +12,8 @@ namespace FILEINDEX {
 
 // Fills `out` with the explanation of `path` (a share path):
 //   "path", "share", "full_path" (null when it cannot be resolved), "indexable", "refused_by"
-//   (the first refusing rule, null when none), "rules" (every rule in its order: "rule",
+//   (the first refusing rule, null when none), "problem" (what that rule found, in words, e.g.
+//   "the directory does not exist"; null when none), "rules" (every rule in its order: "rule",
 //   "description", "verdict" = "pass" | "refuse" | "not_evaluated", "facts"), "governing_folder"
 //   (the folder whose settings govern the path: "path", "name" and the four flags, or null),
 //   "inside_indexed_folder", "contains_indexed_folder", "share_flags" ("no_space",

@@ -41,8 +41,10 @@ public:
     // Adds or updates one folder in memory; `changed` = which media switches changed, judged by
     // the folder that governed the path before. A request without a string "path", with a path
     // that is not a canonical share path or does not resolve: error 1 ("Bad param"), map
-    // unchanged; unlike the original design, which took any path that resolved, a path with an
-    // empty, "." or ".." component, a trailing "/" or beyond PATH_MAX is refused. A 1001st folder: error 5, the record stays in memory (do not save).
+    // unchanged. A path with an empty, "." or ".." component, a trailing "/" or beyond PATH_MAX
+    // is refused too, since a folder stored in another spelling of its path would never match the
+    // paths that queries and events compare it with. A 1001st folder: error 5, the record stays
+    // in memory (do not save).
     bool Upsert(Json::Value& changed, const Json::Value& request);
     // Removes one folder in memory (an unknown path is no error); `changed` = {path: which media
     // switches changed}, left untouched when the path does not resolve.

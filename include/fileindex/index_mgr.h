@@ -51,7 +51,8 @@ public:
     // --- Folder changes (writers, see above) ---
     // `folders`: an array of {"path", "name", "document", "audio", "video", "photo"}. A path must
     // be a canonical share path (no empty, "." or ".." component, no trailing "/", within
-    // PATH_MAX): unlike the original design, which stored any path, others fail with error 1.
+    // PATH_MAX); others fail with error 1, since a path stored in another spelling would never
+    // match the paths that queries and events compare it with.
     // Errors: 1 (bad request, nothing saved), 5 (too many folders, nothing saved), 6/8/9 (before
     // anything changes), 7 (save failed), 2 (a path stopped resolving after the save); a
     // registration, service or daemon failure sets none (folder.conf already saved), and so does
@@ -87,8 +88,9 @@ public:
     static bool ShareResume(const std::string& share);
     // Removes the share's queue files and index database through a handle on the share's own
     // "@eaDir", opened without following a link; nothing outside that directory can be touched.
-    // Unlike the original design, which ran "/bin/rm -rf" on each path, no path is resolved again
-    // and no program is run. A database tree deeper than 64 levels is removed only to that depth.
+    // No path is resolved again and no program is run, so a link a share's user plants in
+    // "@eaDir" cannot turn the removal elsewhere. A database tree deeper than 64 levels is removed
+    // only to that depth.
     // No lock; false only when the share's storage paths cannot be formed.
     static bool CleanShareIndexData(const std::string& share);
 

@@ -1,4 +1,4 @@
-// How far indexing has got. An addition to the specified interface.
+// How far indexing has got, for progress displays and scripts that wait for indexing.
 #pragma once
 
 #include <json/value.h>

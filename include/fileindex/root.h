@@ -1,6 +1,6 @@
 // Where the library's fixed paths (folder.conf, status.conf, the lock files, the daemon socket,
-// the notifier) lie. An addition to the specified interface, for the simulated appliance: a root
-// prefix put in front of every fixed path. The appliance build has none and uses the fixed paths.
+// the notifier) lie: under a root prefix, so that a simulated appliance can live in any directory
+// and several can run side by side. The appliance build has none and uses the fixed paths.
 #pragma once
 
 #include <string>

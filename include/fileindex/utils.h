@@ -52,8 +52,8 @@ FILEINDEX_EXPORT Json::Value GetMostSuitableCfg(std::vector<Folder> folders, con
 
 // --- Daemon command channel ------------------------------------------------------------------
 // Sends {"type": type, "data": data} to fileindexd; true when the whole frame was written.
-// Unlike the original design, which set it after connecting, the 1-second send time-out is set
-// before the connect, so a daemon that listens but never accepts fails the call within a second.
+// The 1-second send time-out is set before the connect, so a daemon that listens but never
+// accepts fails the call within a second instead of holding the caller and its lock.
 FILEINDEX_EXPORT bool SendCammandToDaemon(const std::string& type, const Json::Value& data);
 
 // --- Custom event queue ----------------------------------------------------------------------

@@ -1,4 +1,5 @@
-// The log-line convention: LOG_ERR, "%s:%d " with the source file's name and line.
+// The log-line convention: LOG_ERR, "%s:%d " with the source file's name and line, through the
+// one logging path of log.cc.
 #pragma once
 
 #include <syslog.h>
@@ -18,12 +19,15 @@ constexpr const char* SourceName(const char* path) {
     return name;
 }
 
+// Formats one line and hands it to the system log and/or the host's sink (fileindex/log_sink.h).
+void Log(int priority, const char* file, int line, const char* format, ...) __attribute__((format(printf, 4, 5)));
+
 }  // namespace detail
 }  // namespace FILEINDEX
 }  // namespace QIRA
 
 #define FILEIDX_LOG(fmt, ...) \
-    syslog(LOG_ERR, "%s:%d " fmt, ::QIRA::FILEINDEX::detail::SourceName(__FILE__), __LINE__, ##__VA_ARGS__)
+    ::QIRA::FILEINDEX::detail::Log(LOG_ERR, ::QIRA::FILEINDEX::detail::SourceName(__FILE__), __LINE__, fmt, ##__VA_ARGS__)
 
 // Only when LOG_LEVEL is 7 (contention and short-write lines of the event queue).
 #define FILEIDX_DEBUG_LOG(fmt, ...)                                                   \

@@ -17,9 +17,41 @@ namespace {
 
 constexpr char kSharePathRule[] = "share_path";
 
-Json::Value RulesJson(const std::vector<detail::RuleVerdict>& verdicts, Json::Value& refusedBy) {
+std::string Quoted(const Json::Value& value) { return "\"" + value.asString() + "\""; }
+
+// What the refusing rule found, in words.
+std::string ProblemOf(const detail::RuleVerdict& verdict) {
+    const Json::Value& facts = verdict.facts;
+    const std::string& rule = verdict.rule;
+    const std::string share = Quoted(facts["share"]);
+    if (rule == kSharePathRule) return "no share is named " + share;
+    if (rule == "recycle_bin") return "the path lies in the share's recycle bin";
+    if (rule == "snapshot") return "the path lies in a snapshot";
+    if (rule == "file_system") {
+        return "its file system is " + facts["class"].asString() + " (type " + std::to_string(facts["type"].asInt()) + ")";
+    }
+    if (rule == "share_of_path") return "no share holds the full path";
+    if (rule == "share_record") return "the platform does not know share " + share;
+    if (rule == "skipped_share_name") return "share " + share + " is never indexed";
+    if (rule == "encrypted_share") {
+        return facts.isMember("encrypted") ? "share " + share + " is encrypted"
+                                           : "the encryption flag of share " + share + " cannot be read";
+    }
+    if (rule == "read_only_share") {
+        return facts["readable"].asBool() ? "share " + share + " is read-only"
+                                          : "the read-only flag of share " + share + " cannot be read";
+    }
+    if (rule == "mount_point") return "the path is a mount point in a share without encryption";
+    if (facts.isMember("exists")) return "the directory does not exist";
+    if (facts["real_path"].isNull()) return "its real path cannot be worked out: " + facts["error"].asString();
+    return "it is not its own real path, " + facts["real_path"].asString() +
+           ": a symbolic link, \"..\", or a doubled or trailing slash";
+}
+
+Json::Value RulesJson(const std::vector<detail::RuleVerdict>& verdicts, Json::Value& refusedBy, Json::Value& problem) {
     Json::Value rules(Json::arrayValue);
     refusedBy = Json::Value();
+    problem = Json::Value();
     for (const auto& verdict : verdicts) {
         Json::Value rule(Json::objectValue);
         rule["rule"] = verdict.rule;
@@ -27,7 +59,10 @@ Json::Value RulesJson(const std::vector<detail::RuleVerdict>& verdicts, Json::Va
         rule["verdict"] = verdict.verdict;
         rule["facts"] = verdict.facts;
         rules.append(rule);
-        if (refusedBy.isNull() && verdict.verdict == "refuse") refusedBy = verdict.rule;
+        if (refusedBy.isNull() && verdict.verdict == "refuse") {
+            refusedBy = verdict.rule;
+            problem = ProblemOf(verdict);
+        }
     }
     return rules;
 }
@@ -81,7 +116,7 @@ bool ExplainPath(const std::string& path, Json::Value& out) {
     out["path"] = path;
     out["share"] = share;
     out["full_path"] = resolved ? Json::Value(fullPath) : Json::Value();
-    out["rules"] = RulesJson(Verdicts(share, fullPath, resolved), out["refused_by"]);
+    out["rules"] = RulesJson(Verdicts(share, fullPath, resolved), out["refused_by"], out["problem"]);
     out["indexable"] = out["refused_by"].isNull();
     const Json::Value governing = resolved ? GetMostSuitableCfg(all, fullPath) : Json::Value(Json::objectValue);
     out["governing_folder"] = governing.isMember("path") ? governing : Json::Value();

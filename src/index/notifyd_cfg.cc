@@ -5,6 +5,7 @@
 #include "fileindex/folders.h"
 #include "fileindex/index_mgr.h"
 #include "fileindex/json.h"
+#include "fileindex/service_state.h"
 #include "fileindex/utils.h"
 #include "index_support.h"
 #include "qiranotifyd/monitor_queue.h"
@@ -41,6 +42,16 @@ bool BuildMonitorConfig(const std::vector<Folder>& folders, Json::Value& config)
     return true;
 }
 
+// {"queue", "config"} for the share's folders in `folders`.
+bool DescribeShare(Folders& folders, const std::string& share, const std::string& queuePath, Json::Value& description) {
+    std::vector<Folder> list;
+    if (!folders.List(list, share)) return false;
+    description = Json::Value(Json::objectValue);
+    if (!BuildMonitorConfig(list, description["config"])) return false;
+    description["queue"] = queuePath;
+    return true;
+}
+
 std::unique_ptr<MonitorQueue> CreateMonitorQueue(const Json::Value& description) {
     try {
         return std::make_unique<MonitorQueue>(description);
@@ -50,6 +61,12 @@ std::unique_ptr<MonitorQueue> CreateMonitorQueue(const Json::Value& description)
 }
 
 }  // namespace
+
+bool DescribeMonitorQueue(const std::string& share, Json::Value& out) {
+    std::string queuePath;
+    Folders folders;
+    return detail::ShareQueuePath(share, queuePath) && folders.Load() && DescribeShare(folders, share, queuePath, out);
+}
 
 bool IndexMgr::UpsertQIRANotifydCfg(const std::string& share) {
     std::string queuePath;
@@ -61,11 +78,8 @@ bool IndexMgr::UpsertQIRANotifydCfg(const std::string& share) {
 namespace detail {
 
 bool RegisterShareMonitor(Folders& folders, const std::string& share, const std::string& queuePath) {
-    std::vector<Folder> list;
-    if (!folders.List(list, share)) return false;
-    Json::Value description(Json::objectValue);
-    if (!BuildMonitorConfig(list, description["config"])) return false;
-    description["queue"] = queuePath;
+    Json::Value description;
+    if (!DescribeShare(folders, share, queuePath, description)) return false;
     const auto queue = CreateMonitorQueue(description);
     if (!queue) {
         FILEIDX_LOG("Failed to create MonitorQueue, jsQueue=%s", toString(description).c_str());

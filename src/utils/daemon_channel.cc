@@ -13,6 +13,7 @@
 
 #include "fileindex/json.h"
 #include "fileindex/root.h"
+#include "fileindex/service_state.h"
 #include "fileindex/utils.h"
 #include "root.h"
 
@@ -27,7 +28,10 @@ int ConnectToDaemon() {
     const std::string path = DaemonSocketPath();
     sockaddr_un address;
     std::memset(&address, 0, sizeof address);
-    if (path.size() + 1 > sizeof address.sun_path) return -1;
+    if (path.size() + 1 > sizeof address.sun_path) {
+        errno = ENAMETOOLONG;
+        return -1;
+    }
     const int fd = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
     if (fd < 0) return -1;
     address.sun_family = AF_UNIX;
@@ -37,7 +41,9 @@ int ConnectToDaemon() {
     const timeval timeout{1, 0};
     if (setsockopt(fd, SOL_SOCKET, SO_SNDTIMEO, &timeout, sizeof timeout) != 0 ||
         connect(fd, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
+        const int reason = errno;
         close(fd);
+        errno = reason;
         return -1;
     }
     return fd;
@@ -77,6 +83,13 @@ bool WriteChunked(int fd, const char* data, size_t size) {
 }
 
 }  // namespace detail
+
+bool DaemonAnswers() {
+    const int fd = detail::ConnectToDaemon();
+    if (fd < 0) return false;
+    close(fd);
+    return true;
+}
 
 bool SendCammandToDaemon(const std::string& type, const Json::Value& data) {
     signal(SIGPIPE, SIG_IGN);

@@ -1,7 +1,9 @@
 #include "indexability_rules.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <climits>
+#include <cstring>
 #include <cstdlib>
 #include <memory>
 
@@ -170,8 +172,11 @@ bool EvaluateFullPath(const std::string& fullPath, std::vector<RuleVerdict>* tra
 
     char resolved[4096];
     const bool real = realpath(fullPath.c_str(), resolved) != nullptr;
+    const int reason = errno;
     facts = Json::Value(Json::objectValue);
     facts["real_path"] = real ? Json::Value(resolved) : Json::Value();
+    if (!real) facts["error"] = std::strerror(reason);
+    if (!real && reason == ENOENT) facts["exists"] = false;
     const bool canonical = real && fullPath == resolved;
     if (!canonical) FILEIDX_LOG("check realpath failed, path=%s", fullPath.c_str());
     verdicts.Stop("canonical_path", !canonical, facts);
