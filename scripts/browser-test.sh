@@ -5,7 +5,7 @@ set -euo pipefail
 cd "$(dirname "$0")/.."
 scripts/install-deps.sh chromium chromium-driver python3-selenium
 cmake -S . -B build-browser -DCMAKE_BUILD_TYPE=Release -DFILEINDEX_BUILD_TESTS=OFF >/dev/null
-cmake --build build-browser -j "$(nproc)" --target fileindex-web qira-sim fileindexd-ref >/dev/null
+cmake --build build-browser -j "$(nproc)" --target fileindex-web qira-sim fileindexd-ref fileindexctl >/dev/null
 tools="$PWD/build-browser/tools"
 output="$PWD/build-browser/browser-test"
 mkdir -p "$output"
@@ -20,17 +20,19 @@ cleanup() {
 trap cleanup EXIT
 "$tools/qira-sim" init
 music="$QIRA_ROOT/volume1/music"
-mkdir -p "$music/#recycle/old" "$music/added"
+mkdir -p "$music/#recycle/old" "$music/added" "$music/other" "$QIRA_ROOT/volume1/photo/2024"
 "$tools/qira-sim" share add music "$music"
+"$tools/qira-sim" share add photo "$QIRA_ROOT/volume1/photo"
 conf="{"
 for i in $(seq -w 0 14); do
   mkdir -p "$music/f$i"
   conf+="\"/music/f$i\": {\"path\": \"/music/f$i\", \"name\": \"Folder $i\", \"document\": true, \"audio\": false, \"video\": false, \"photo\": false},"
 done
-echo "${conf%,}}" >"$QIRA_ROOT/usr/qira/etc/fileindex/folder.conf"
+conf+="\"/photo/2024\": {\"path\": \"/photo/2024\", \"name\": \"Photos\", \"document\": false, \"audio\": false, \"video\": false, \"photo\": true}"
+echo "${conf}}" >"$QIRA_ROOT/usr/qira/etc/fileindex/folder.conf"
 "$tools/fileindexd-ref" >"$output/daemon.log" 2>&1 & pids+=($!)
 "$tools/fileindex-web" --listen 127.0.0.1:0 >"$output/web.log" 2>&1 & pids+=($!)
 for _ in $(seq 100); do grep -q "listening on" "$output/web.log" && break; sleep 0.05; done
 url=$(grep -o 'http://127.0.0.1:[0-9]*/' "$output/web.log")
-/usr/bin/python3 tests/browser/console_test.py "$url" "$QIRA_ROOT/usr/qira/etc/fileindex/web.token" "$output"
-echo "browser-test: screenshot in $output/console.png"
+/usr/bin/python3 tests/browser/console_test.py "$url" "$QIRA_ROOT/usr/qira/etc/fileindex/web.token" "$output" "$tools"
+echo "browser-test: screenshots in $output (console.png, console-400.png)"

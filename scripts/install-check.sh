@@ -42,8 +42,12 @@ echo "install-check: consumers"
 cmake -S tests/consumers -B "$work/consumer-cmake" -DCMAKE_PREFIX_PATH="$prefix" >/dev/null
 cmake --build "$work/consumer-cmake" >/dev/null
 # shellcheck disable=SC2046
+# The .pc file adds no run path: a consumer of a prefix outside the loader's path sets its own.
 g++ -std=c++17 tests/consumers/consumer.cc -o "$work/consumer-pkgconfig" \
-  $(PKG_CONFIG_PATH="$prefix/lib/pkgconfig" pkg-config --cflags --libs fileindex)
+  $(PKG_CONFIG_PATH="$prefix/lib/pkgconfig" pkg-config --cflags --libs fileindex) -Wl,-rpath,"$prefix/lib"
+grep -q -- '-Wl' "$prefix"/lib/pkgconfig/fileindex.pc && { echo "install-check: fileindex.pc injects linker flags"; exit 1; }
+grep -q '^prefix=${pcfiledir}/../..$' "$prefix"/lib/pkgconfig/fileindex.pc ||
+  { echo "install-check: fileindex.pc does not find its prefix from where it lies"; exit 1; }
 export QIRA_ROOT="$work/appliance"
 mkdir -p "$QIRA_ROOT/volume1/music"
 qira-sim init
@@ -57,7 +61,14 @@ done
 
 echo "install-check: exported symbols, manual pages, completion"
 scripts/check-exports.sh "$prefix"/lib*/libfileindex.so.1
-for file in share/man/man1/fileindexctl.1 share/man/man1/qira-sim.1 share/man/man1/fileindexd-ref.1 \
+for page in fileindexctl fileindex-web qira-sim fileindexd-ref; do
+  warnings=$(groff -man -z -ww "$prefix/share/man/man1/$page.1" 2>&1)
+  [ -z "$warnings" ] || { echo "install-check: the manual page of $page has faults: $warnings"; exit 1; }
+  for section in NAME SYNOPSIS DESCRIPTION "EXIT STATUS" ENVIRONMENT; do
+    grep -q "^\.SH $section" "$prefix/share/man/man1/$page.1" || { echo "install-check: $page.1 has no $section"; exit 1; }
+  done
+done
+for file in \
   share/bash-completion/completions/fileindexctl share/doc/fileindex/LICENSE include/qira_sim/appliance.h; do
   [ -f "$prefix/$file" ] || { echo "install-check: $file is not installed"; exit 1; }
 done

@@ -47,6 +47,7 @@ TEST_F(ToolTest, QuestionsAnswerByExitStatus) {
         {{"is", "indexable", "/music/a"}, 0},          {{"is", "indexable", "/music/none"}, 1},
         {{"is", "indexable", "/nosuch/a"}, 2},         {{"is", "skipped", music_ + "/.DS_Store"}, 0},
         {{"is", "roomy", "music"}, 0},                 {{"is", "roomy", "nosuch"}, 2},
+        {{"is", "share-indexed", "nosuch"}, 2},        {{"is", "path-indexed", "/nosuch/a"}, 2},
     };
     for (const auto& [args, status] : cases) {
         SCOPED_TRACE(args[1] + " " + args[2]);
@@ -65,71 +66,113 @@ std::vector<std::string> Lines(const std::string& text) {
     return lines;
 }
 
-// The error code of the operation, the library's log lines and what was saved before the failure.
-TEST_F(ToolTest, FailuresTellTheirCauseOnStderr) {
-    Folders holder;
-    ASSERT_TRUE(holder.Lock(true));
-    auto result = Ctl({"--lock-wait", "0", "folder", "delete", "/music/a"});
-    holder.Unlock();
-    EXPECT_EQ(result.status, 1);
-    EXPECT_EQ(result.out, "");
-    auto lines = Lines(result.err);
-    ASSERT_EQ(lines.size(), 2u) << result.err;
-    EXPECT_EQ(lines[0], "fileindexctl: folder delete failed: FILEINDEX_ERR_LOCK (9): the configuration lock is held "
-                        "by another process; try again");
-    EXPECT_EQ(lines[1].rfind("fileindexctl: log: config.cc:", 0), 0u);
-    EXPECT_NE(lines[1].find(" Failed to lock folder"), std::string::npos);
-
-    qira_sim::InjectFault("QLIBServiceStart", 0x1234);
-    result = Ctl({"folder", "add", "/music/a"});
-    lines = Lines(result.err);
-    ASSERT_EQ(lines.size(), 3u) << result.err;
-    EXPECT_EQ(lines[0], "fileindexctl: folder add failed: FILEINDEX_ERR_NONE (0): the library set no error code; the "
-                        "cause is in its log");
-    EXPECT_NE(lines[1].find("QLIBServiceStart failed: err=[0x1234 sim/QLIBServiceStart:1]"), std::string::npos);
-    EXPECT_EQ(lines[2], "fileindexctl: " + FolderConf() +
-                            " was already saved with the change; the steps after it did not all succeed");
-    EXPECT_EQ(Lines(Ctl({"-q", "folder", "add", "/music/a"}).err).size(), 2u);  // no log lines
-
-    qira_sim::ClearFaults();
-    daemon_.reset();
-    result = Ctl({"service", "pause"});
-    EXPECT_NE(result.err.find("SendCammandToDaemon failed"), std::string::npos) << result.err;
-    EXPECT_NE(result.err.find(StatusConf() + " was already saved"), std::string::npos);
-    result = Ctl({"share", "paths", "nosuch"});
-    EXPECT_NE(result.err.find("QIRAShareGet failed, name=nosuch"), std::string::npos) << result.err;
+// Every failure names its cause, never the code of success: the library's error code, or the step
+// that failed. A change saved before a later step failed exits 4 and says so. The text on stderr
+// is the JSON answer's message; the library's log lines carry their source only under -v.
+TEST_F(ToolTest, EveryFailureNamesItsCauseInTextAndJsonAlike) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
+    using Guard = std::shared_ptr<void>;
+    struct Case {
+        std::vector<std::string> args;
+        int status;
+        std::string error;
+        std::string message;
+        std::function<Guard()> before;
+    };
+    const auto fault = [](const char* op, int err) {
+        return [op, err] {
+            qira_sim::InjectFault(op, err);
+            return Guard(nullptr, [](void*) { qira_sim::ClearFaults(); });
+        };
+    };
+    const auto lockHeld = [] { return std::make_shared<testkit::ChildHolding>([] { return Folders().Lock(true); }); };
+    const auto daemonDown = [this] {
+        daemon_.reset();
+        return Guard();
+    };
+    const std::string noDaemon = "the indexing daemon does not answer at " + DaemonSocketPath() + " (No such file or directory)";
+    const std::vector<Case> cases = {
+        {{"folder", "get", "/music/none"}, 1, "FILEINDEX_ERR_NO_SUCH_FOLDER",
+         "folder get failed: FILEINDEX_ERR_NO_SUCH_FOLDER (4): no indexed folder has that path", nullptr},
+        {{"--lock-wait", "0", "folder", "delete", "/music/a"}, 1, "FILEINDEX_ERR_LOCK",
+         "folder delete failed: FILEINDEX_ERR_LOCK (9): the configuration lock is held by another process; try again", lockHeld},
+        {{"folder", "add", "/music/b/"}, 1, "BAD_PATH", "folder add failed: BAD_PATH: drop the trailing \"/\": /music/b", nullptr},
+        {{"folder", "add", "/music/../b"}, 1, "BAD_PATH",
+         "folder add failed: BAD_PATH: \"/music/../b\" has an empty, \".\" or \"..\" component; give the folder's own path", nullptr},
+        {{"folder", "add", music_ + "/b"}, 1, "BAD_PATH",
+         "folder add failed: BAD_PATH: " + music_ + "/b is a full path on the volume; give the share path /music/b", nullptr},
+        {{"folder", "add", "/outside/x"}, 1, "SHARE_UNKNOWN", "folder add failed: SHARE_UNKNOWN: no share is named \"outside\"", nullptr},
+        {{"reindex", "/photo/a"}, 1, "SHARE_NOT_INDEXED", "reindex failed: SHARE_NOT_INDEXED: share \"photo\" holds no indexed folder", nullptr},
+        {{"is", "roomy", "nosuch"}, 2, "SHARE_UNKNOWN", "is roomy failed: SHARE_UNKNOWN: no share is named \"nosuch\"", nullptr},
+        {{"share", "paths", "nosuch"}, 1, "SHARE_UNKNOWN", "share paths failed: SHARE_UNKNOWN: no share is named \"nosuch\"", nullptr},
+        {{"explain", "/outside/x"}, 1, "SHARE_UNKNOWN", "explain failed: SHARE_UNKNOWN: no share is named \"outside\"", nullptr},
+        {{"folder", "add", "/music/b"}, 4, "PLATFORM_CALL_FAILED",
+         "folder add: saved; not applied: PLATFORM_CALL_FAILED: the platform call QLIBServiceStart failed with error 0x1234",
+         fault("QLIBServiceStart", 0x1234)},
+        {{"folder", "add", "/music/c"}, 4, "NOTIFIER_REFUSED",
+         "folder add: saved; not applied: NOTIFIER_REFUSED: the notification daemon refused the change of what it watches",
+         fault("MonitorQueue::Upsert", 0x0500)},
+        {{"folder"}, 2, "USAGE", "A subcommand is required", nullptr},
+        {{"service", "pause"}, 4, "DAEMON_UNREACHABLE", "service pause: saved; not applied: DAEMON_UNREACHABLE: " + noDaemon,
+         daemonDown},
+        {{"wait", "--timeout", "60"}, 2, "DAEMON_UNREACHABLE",
+         "wait failed: DAEMON_UNREACHABLE: folders are indexed and the indexing daemon does not answer at " + DaemonSocketPath() +
+             " (No such file or directory)",
+         nullptr},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.message);
+        const Guard guard = c.before ? c.before() : Guard();
+        std::vector<std::string> args = c.args;
+        args.push_back("--json");
+        const auto json = Ctl(args);
+        const auto text = Ctl(c.args);
+        EXPECT_EQ(json.status, c.status);
+        EXPECT_EQ(text.status, c.status);
+        const Json::Value answer = testkit::ParseJson(json.out);
+        EXPECT_FALSE(answer["ok"].asBool());
+        EXPECT_EQ(answer["error"]["name"].asString(), c.error);
+        EXPECT_EQ(answer["message"].asString(), c.message);
+        EXPECT_EQ(answer["saved"].empty(), c.status != 4);
+        EXPECT_EQ(text.out, "");
+        EXPECT_EQ(Lines(text.err).at(0), "fileindexctl: " + c.message);
+        EXPECT_EQ(text.err.find(".cc:"), std::string::npos) << text.err;
+        EXPECT_EQ(testkit::CountOf(text.err, "was saved with the change"), c.status == 4 ? 1u : 0u);
+    }
+    const auto verbose = Ctl({"-v", "service", "resume"});
+    EXPECT_NE(verbose.err.find("fileindexctl: log: status_mgr.cc:"), std::string::npos) << verbose.err;
+    EXPECT_EQ(Ctl({"-q", "service", "resume"}).err.find("log:"), std::string::npos);
 }
 
-// With --json every command family prints one object of the same shape, success or failure.
-TEST_F(ToolTest, JsonHasOneShapeForSuccessAndFailure) {
-    testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
-    const std::vector<std::pair<std::vector<std::string>, bool>> cases = {
-        {{"folder", "list"}, true},          {{"folder", "get", "/music/none"}, false},
-        {{"folder", "add", "/music/b"}, true}, {{"reindex", "/photo/a"}, false},
-        {{"service", "status"}, true},       {{"service", "pause", "--hours", "2"}, true},
-        {{"share", "need-reindex", "music", "off"}, true}, {{"share", "paths", "nosuch"}, false},
-        {{"is", "share-indexed", "music"}, true}, {{"migrate"}, true},
-    };
+// With --json every command family prints one object of the same shape; a success carries no
+// log lines, even when the library logged some on the way (here a folder whose directory is gone).
+TEST_F(ToolTest, JsonHasOneShapeAndSuccessCarriesNoLog) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/gone": {}})");
+    const std::vector<std::vector<std::string>> commands = {
+        {"folder", "list", "--additional", "status"}, {"folder", "add", "/music/b"}, {"service", "status"},
+        {"service", "pause", "--hours", "2"}, {"share", "need-reindex", "music", "off"}, {"is", "share-indexed", "music"},
+        {"migrate"}, {"progress", "--interval", "0.05"}, {"explain", "/music/gone"}};
     const std::vector<std::string> members = {"error", "log", "message", "ok", "result", "saved"};
-    for (auto [args, ok] : cases) {
-        SCOPED_TRACE(args[0] + (args.size() > 1 ? " " + args[1] : ""));
+    for (auto args : commands) {
+        SCOPED_TRACE(args[0] + " " + args[1]);
         args.push_back("--json");
         const auto result = Ctl(args);
-        EXPECT_EQ(result.status == 0, ok);
+        EXPECT_EQ(result.status, 0) << result.out;
         const Json::Value out = testkit::ParseJson(result.out);
         EXPECT_EQ(out.getMemberNames(), members);
-        EXPECT_EQ(out["ok"].asBool(), ok);
-        EXPECT_EQ(out["message"].asString().empty(), ok);
-        EXPECT_EQ(out["error"]["number"].asInt() == 0, ok || args[0] == "share" || args[0] == "reindex");
+        EXPECT_EQ(out["error"], J(R"({"name": "FILEINDEX_ERR_NONE", "number": 0})"));
+        EXPECT_EQ(out["log"], J("[]"));
     }
-    const Json::Value pause = testkit::ParseJson(Ctl({"--json", "service", "status"}).out)["result"]["pause"];
-    EXPECT_TRUE(pause["paused"].asBool());
-    const time_t end = static_cast<time_t>(pause["resume_time"].asInt64());
-    char utc[32];
-    strftime(utc, sizeof utc, "%Y-%m-%dT%H:%M:%SZ", gmtime(&end));
-    EXPECT_EQ(pause["resume_time_utc"].asString(), utc);
-    EXPECT_EQ(testkit::ParseJson(Ctl({"--json", "is", "share-indexed", "photo"}).out)["result"],
-              J(R"({"answer": false})"));
+    for (const auto& args : std::vector<std::vector<std::string>>{{"service", "status"}, {"progress", "--interval", "0.05"}}) {
+        auto withJson = args;
+        withJson.push_back("--json");
+        const Json::Value pause = testkit::ParseJson(Ctl(withJson).out)["result"]["pause"];
+        EXPECT_TRUE(pause["paused"].asBool());
+        const time_t end = static_cast<time_t>(pause["resume_time"].asInt64());
+        char utc[32];
+        strftime(utc, sizeof utc, "%Y-%m-%dT%H:%M:%SZ", gmtime(&end));
+        EXPECT_EQ(pause["resume_time_utc"].asString(), utc);
+    }
 }
 
 TEST_F(ToolTest, ArgumentsTheLibraryWouldReadOtherwiseAreRefused) {
@@ -186,6 +229,8 @@ TEST_F(ToolTest, UsageErrorsExitTwoAndEveryToolTellsItsVersion) {
     }
     EXPECT_NE(testkit::Run({FILEINDEXCTL, "--root", Path("/none"), "folder", "list"}).err.find("no such directory: " + Path("/none")),
               std::string::npos);
+    const auto json = testkit::Run({FILEINDEXCTL, "folder", "list", "--sort", "size", "--json"});
+    EXPECT_EQ(testkit::ParseJson(json.out)["error"]["name"].asString(), "USAGE");
     for (const char* tool : {FILEINDEXCTL, QIRA_SIM, FILEINDEXD_REF}) {
         const auto result = testkit::Run({tool, "--version"});
         EXPECT_EQ(result.status, 0);
@@ -207,15 +252,30 @@ TEST_F(ToolTest, RootOptionStandsInForTheEnvironment) {
     EXPECT_EQ(envelope["result"]["music"]["path"].asString(), music_);
 }
 
-TEST_F(ToolTest, BashCompletionOffersTheSubcommands) {
-    const auto complete = [](const std::string& words, int index) {
-        return testkit::Run({"/bin/bash", "-c", "source " + std::string(COMPLETION) + "; COMP_WORDS=(" + words +
-                                                    "); COMP_CWORD=" + std::to_string(index) +
+TEST_F(ToolTest, BashCompletionOffersCommandsOptionsAndIndexedFolders) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/b": {}, "/photo/a": {}})");
+    const std::string tools = std::string(FILEINDEXCTL).substr(0, std::string(FILEINDEXCTL).rfind('/'));
+    const auto complete = [&](const std::string& words, int index) {
+        return testkit::Run({"/bin/bash", "-c", "PATH=" + tools + ":$PATH; source " + std::string(COMPLETION) +
+                                                    "; COMP_WORDS=(" + words + "); COMP_CWORD=" + std::to_string(index) +
                                                     "; _fileindexctl; echo ${COMPREPLY[*]}"}).out;
     };
-    EXPECT_EQ(complete("fileindexctl sh", 1), "share\n");
-    EXPECT_EQ(complete("fileindexctl share re", 2), "remove rename resume revive\n");
-    EXPECT_EQ(complete("fileindexctl is ro", 2), "roomy\n");
+    const std::vector<std::tuple<std::string, int, std::string>> cases = {
+        {"fileindexctl sh", 1, "share\n"},
+        {"fileindexctl share re", 2, "remove rename resume revive\n"},
+        {"fileindexctl share revive m", 3, "music\n"},
+        {"fileindexctl is ro", 2, "roomy\n"},
+        {"fileindexctl folder list ''", 3, "\n"},  // no subcommand again
+        {"fileindexctl folder list --d", 3, "--desc\n"},
+        {"fileindexctl --root /x folder list --l", 5, "--limit --lock-wait\n"},
+        {"fileindexctl folder delete /music/", 3, "/music/a /music/b\n"},
+        {"fileindexctl explain /p", 2, "/photo/a\n"},
+        {"fileindexctl progress --", 2, "--watch --interval --samples --root --json --quiet --verbose --lock-wait --help --version\n"},
+    };
+    for (const auto& [words, index, offered] : cases) {
+        SCOPED_TRACE(words);
+        EXPECT_EQ(complete(words, index), offered);
+    }
 }
 
 TEST_F(ToolTest, ServiceStatusShowsPauseAndFlags) {
@@ -225,8 +285,42 @@ TEST_F(ToolTest, ServiceStatusShowsPauseAndFlags) {
     ASSERT_EQ(result.status, 0) << result.err;
     EXPECT_EQ(testkit::ParseJson(result.out)["result"],
               J(R"({"status": "finished", "pause": {"paused": true, "resume_time": 0, "resume_time_utc": null},
+                    "daemon": {"socket": ")" + DaemonSocketPath() + R"(", "answers": true, "reason": null},
+                    "watched": [{"share": "music", "queue": ")" + QueueOf("music") + R"(", "folders": [")" + music_ + R"(/a"]}],
                     "no_space": ["music"], "need_reindex": []})"));
-    EXPECT_NE(Ctl({"service", "status"}).out.find("paused until resumed"), std::string::npos);
+    const auto text = Ctl({"service", "status"}).out;
+    EXPECT_NE(text.find("pause             paused until resumed"), std::string::npos) << text;
+    EXPECT_NE(text.find("daemon            answers at " + DaemonSocketPath()), std::string::npos);
+    EXPECT_NE(text.find("watched in music  " + music_ + "/a"), std::string::npos);
+    daemon_.reset();
+    EXPECT_NE(Ctl({"service", "status"}).out.find("does not answer at " + DaemonSocketPath() + " (No such file or directory)"),
+              std::string::npos);
+}
+
+// Descending pages follow each other as ascending ones do; a folder that cannot be indexed says
+// why, in the listing, in its status and when it is added.
+TEST_F(ToolTest, ListingPagesDescendingAndTellsWhyAFolderIsNotIndexable) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/b": {}, "/music/c": {}, "/photo/a": {}, "/music/gone": {}})");
+    const auto page = [&](std::vector<std::string> args) {
+        args.insert(args.begin(), {"--json", "folder", "list", "--desc", "--limit", "2"});
+        const Json::Value answer = testkit::ParseJson(Ctl(args).out);
+        std::vector<std::string> paths;
+        for (const auto& folder : answer["result"]["folder"]) paths.push_back(folder["path"].asString());
+        return paths;
+    };
+    EXPECT_EQ(page({}), (std::vector<std::string>{"/photo/a", "/music/gone"}));
+    EXPECT_EQ(page({"--offset", "2"}), (std::vector<std::string>{"/music/c", "/music/b"}));
+    EXPECT_EQ(page({"--offset", "4"}), (std::vector<std::string>{"/music/a"}));
+    const auto listed = Lines(Ctl({"folder", "list", "--additional", "status"}).out);
+    EXPECT_EQ(listed.at(3), "/music/c           no        no     no     no     finished");
+    EXPECT_EQ(listed.at(4), "/music/gone        no        no     no     no     not indexable: canonical_path");
+    EXPECT_EQ(Ctl({"folder", "status", "/music/gone"}).out, "not indexable: canonical_path\n");
+    EXPECT_EQ(testkit::ParseJson(Ctl({"--json", "folder", "status", "/music/a"}).out)["result"],
+              J(R"({"path": "/music/a", "status": "finished", "indexable": true})"));
+    const auto added = Ctl({"folder", "add", "/music/ghost"});
+    EXPECT_EQ(added.status, 0);
+    EXPECT_EQ(added.err, "fileindexctl: warning: /music/ghost cannot be indexed now: the directory does not exist "
+                         "(canonical_path); it stays listed as not valid until that changes\n");
 }
 
 class DaemonStandInTest : public testkit::IndexFixture {
@@ -294,8 +388,7 @@ TEST_F(DaemonStandInTest, PauseHoldsWorkBack) {
     ASSERT_TRUE(StatusMgr::Pause(0));
     const auto pauses = [this] { return testkit::CountOf(testkit::ReadFile(log_), "\"type\":\"pause\""); };
     ASSERT_TRUE(testkit::WaitFor([&] { return pauses() == 2; }));
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "paused");
-    EXPECT_TRUE(testkit::Exists(QueueOf("music")));
+    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "paused") << testkit::ReadFile(log_);
     ASSERT_TRUE(StatusMgr::Resume());
     EXPECT_TRUE(testkit::WaitFor([] { return StatusMgr::GetFolderStatus("/music/a") == "finished"; }));
 }

@@ -77,12 +77,14 @@ TEST_F(WebApiTest, EveryRouteAnswersWithTheLibrarysResultOrFailure) {
         {"POST", "/api/folders/delete", R"(["/music/b"])", 200},
         {"POST", "/api/folders/delete", R"([5])", 400},
         {"POST", "/api/reindex", R"(["/music/a"])", 200},
-        {"POST", "/api/reindex", R"(["/nosuch/a"])", 502},
+        {"POST", "/api/reindex", R"(["/nosuch/a"])", 404},
+        {"POST", "/api/reindex", R"(["/music/a/../../x"])", 400},
         {"GET", "/api/status", "", 200},
         {"POST", "/api/pause", R"({"hours": 2})", 200},
         {"POST", "/api/pause", R"({"hours": -1})", 400},
         {"POST", "/api/resume", "", 200},
         {"GET", "/api/explain?path=/music/a", "", 200},
+        {"GET", "/api/explain?path=/nosuch/a", "", 404},
         {"GET", "/api/progress", "", 200},
         {"POST", "/api/shares/revive", R"({"share": "music"})", 200},
         {"POST", "/api/shares/revive", R"({})", 400},
@@ -99,9 +101,34 @@ TEST_F(WebApiTest, EveryRouteAnswersWithTheLibrarysResultOrFailure) {
     EXPECT_EQ(Get("/api/folders?offset=1&limit=1&sort_by=name&sort_direction=DESC").body["result"]["folder"][0]["name"].asString(),
               "A");
     EXPECT_EQ(Get("/api/explain?path=/music/a").body["result"]["governing_folder"]["name"].asString(), "A");
-    const Answer failed = Post("/api/reindex", R"(["/music/a/../../x"])");
+    const Answer failed = Post("/api/folders/delete", R"([5])");
     EXPECT_EQ(failed.body["error"], J(R"({"name": "FILEINDEX_ERR_BAD_PARAM", "number": 1})"));
-    EXPECT_EQ(failed.body["log"][0].asString().find("Malformed jsArrPath"), failed.body["log"][0].asString().find(' ') + 1);
+    EXPECT_EQ(failed.body["log"], J(R"(["Bad param: 5"])"));
+    const Answer refused = Post("/api/reindex", R"(["/music/a/../../x"])");
+    EXPECT_EQ(refused.body["error"], J(R"({"name": "BAD_PATH", "number": 0})"));
+    EXPECT_EQ(refused.body["message"].asString(),
+              "reindex failed: BAD_PATH: \"/music/a/../../x\" has an empty, \".\" or \"..\" component; give the folder's own path");
+}
+
+// What the console shows beside the library's answers: the daemon's state, why indexing is not
+// done, why a folder cannot be indexed, and a warning for such a folder when it is added.
+TEST_F(WebApiTest, StatusAndListingTellTheDaemonsStateAndWhyAFolderIsNotIndexable) {
+    Json::Value status = Get("/api/status").body["result"];
+    EXPECT_EQ(status["daemon"], J(R"({"socket": ")" + DaemonSocketPath() + R"(", "answers": true, "reason": null})"));
+    EXPECT_TRUE(status["not_done"].isNull());
+    EXPECT_EQ(status["pause"]["resume_time_utc"], status["progress"]["pause"]["resume_time_utc"]);
+    const Answer added = Post("/api/folders", R"([{"path": "/music/ghost"}])");
+    EXPECT_EQ(added.body["result"]["warnings"][0].asString(),
+              "/music/ghost cannot be indexed now: the directory does not exist (canonical_path); it stays listed as not "
+              "valid until that changes");
+    const Json::Value listing = Get("/api/folders?additional=status").body["result"];
+    EXPECT_EQ(listing["folder"][0]["additional"], J(R"({"status": "finished"})"));
+    EXPECT_EQ(listing["folder"][1]["additional"], J(R"({"status": "paused", "refused_by": "canonical_path"})"));
+    daemon_.reset();
+    status = Get("/api/status").body["result"];
+    EXPECT_FALSE(status["daemon"]["answers"].asBool());
+    EXPECT_EQ(status["not_done"].asString(), "indexing is processing and the indexing daemon does not answer at " +
+                                                 DaemonSocketPath() + " (No such file or directory)");
 }
 
 TEST_F(WebApiTest, WritesNeedTheTokenTheSameOriginAndAJsonBody) {

@@ -1,7 +1,10 @@
 #!/usr/bin/python3
 """The management console in a real browser: headless Chromium driven by Selenium against a
-fileindex-web on a seeded simulated appliance. Arguments: the console's URL, the token file and
-the directory for the screenshot."""
+fileindex-web on a seeded simulated appliance, with fileindexctl changing things beside it.
+Arguments: the console's URL, the token file, the directory for the screenshots and the directory
+of the tools."""
+import os
+import subprocess
 import sys
 import unittest
 
@@ -13,7 +16,12 @@ from selenium.webdriver.common.by import By
 from selenium.webdriver.support import expected_conditions as EC
 from selenium.webdriver.support.ui import Select, WebDriverWait
 
-URL, TOKEN_FILE, OUTPUT = sys.argv[1:4]
+URL, TOKEN_FILE, OUTPUT, TOOLS = sys.argv[1:5]
+
+
+def ctl(*args):
+    """fileindexctl on the same appliance, as another administrator would run it."""
+    subprocess.run([os.path.join(TOOLS, "fileindexctl"), *args], check=True, capture_output=True)
 
 
 class ConsoleTest(unittest.TestCase):
@@ -21,10 +29,12 @@ class ConsoleTest(unittest.TestCase):
     def setUpClass(cls):
         options = Options()
         options.binary_location = "/usr/bin/chromium"
-        for argument in ("--headless=new", "--no-sandbox", "--disable-gpu", "--window-size=1280,1000"):
+        for argument in ("--headless=new", "--no-sandbox", "--disable-gpu", "--window-size=1280,1000",
+                         "--disable-background-networking", "--disable-component-update", "--no-first-run"):
             options.add_argument(argument)
         cls.browser = webdriver.Chrome(service=Service("/usr/bin/chromedriver"), options=options)
-        cls.wait = WebDriverWait(cls.browser, 15, ignored_exceptions=(StaleElementReferenceException,))
+        # The page polls every 3 s: a change made elsewhere shows within a few polls.
+        cls.wait = WebDriverWait(cls.browser, 20, ignored_exceptions=(StaleElementReferenceException,))
 
     @classmethod
     def tearDownClass(cls):
@@ -39,11 +49,28 @@ class ConsoleTest(unittest.TestCase):
     def click(self, selector):
         self.browser.find_element(By.CSS_SELECTOR, selector).click()
 
+    def text(self, element_id):
+        return self.browser.find_element(By.ID, element_id).text
+
+    def wait_text(self, element_id, text):
+        self.wait.until(EC.text_to_be_present_in_element((By.ID, element_id), text))
+
+    def row_of(self, path):
+        for row in self.rows():
+            if row.find_elements(By.TAG_NAME, "td")[0].text == path:
+                return row
+        return None
+
+    def status_of(self, path):
+        row = self.row_of(path)
+        return row.find_element(By.CSS_SELECTOR, 'td[data-label="Status"]').text if row else None
+
     def test_an_administrator_works_through_the_page(self):
         b = self.browser
         b.get(URL)
         self.wait.until(lambda _: len(self.rows()) == 10)
-        self.assertIn("(15 folders)", b.find_element(By.ID, "page-info").text)
+        self.assertIn("(16 folders)", self.text("page-info"))
+        self.wait_text("daemon", "Indexing daemon: answers.")
 
         with open(TOKEN_FILE, encoding="ascii") as token:
             b.find_element(By.ID, "token").send_keys(token.read().strip())
@@ -52,33 +79,85 @@ class ConsoleTest(unittest.TestCase):
         self.click('button.sort[data-key="name"]')  # ascending
         self.wait.until(lambda _: self.first_cell(1) == "Folder 00")
         self.click('button.sort[data-key="name"]')  # descending
-        self.wait.until(lambda _: self.first_cell(1) == "Folder 14")
-
+        self.wait.until(lambda _: self.first_cell(1) == "Photos")
         self.click("#next")
-        self.wait.until(EC.text_to_be_present_in_element((By.ID, "page-info"), "Page 2 of 2"))
-        self.assertEqual(len(self.rows()), 5)
+        self.wait_text("page-info", "Page 2 of 2")
+        self.assertEqual(len(self.rows()), 6)
+        self.assertEqual(self.first_cell(1), "Folder 05")  # the page after the first, not its repeat
 
+        # Saving adds the row and empties the form for the next folder.
         Select(b.find_element(By.ID, "per-page")).select_by_visible_text("50")
         b.find_element(By.ID, "folder-path").send_keys("/music/added")
         b.find_element(By.ID, "folder-name").send_keys("Added by hand")
         self.click("#folder-audio")
         self.click("#save-folder")
-        self.wait.until(EC.text_to_be_present_in_element((By.ID, "folders"), "Added by hand"))
-        self.assertIn("(16 folders)", b.find_element(By.ID, "page-info").text)
+        self.wait_text("folders", "Added by hand")
+        self.assertIn("(17 folders)", self.text("page-info"))
+        self.assertEqual(b.find_element(By.ID, "folder-path").get_attribute("value"), "")
+        self.assertFalse(b.find_element(By.ID, "folder-audio").is_selected())
 
+        # A folder that cannot be indexed is added with a warning and says why in its row.
+        b.find_element(By.ID, "folder-path").send_keys("/music/ghost")
+        self.click("#save-folder")
+        self.wait_text("message", "cannot be indexed now: the directory does not exist")
+        self.wait.until(lambda _: self.status_of("/music/ghost") == "not indexable: canonical_path")
+
+        # A path the library would only call malformed gets a reason.
+        b.find_element(By.ID, "folder-path").send_keys("/music/added/")
+        self.click("#save-folder")
+        self.wait_text("message", 'drop the trailing "/": /music/added')
+
+        # Changes made by another tool appear without a reload.
+        ctl("folder", "add", "/music/other", "--name", "From the command line")
+        self.wait_text("folders", "From the command line")
+        ctl("share", "no-space", "music", "on")
+        self.wait_text("shares", "Share music: out of space")
+        self.wait.until(lambda _: self.status_of("/music/f00") == "err_no_space")
+        self.click("#shares button")
+        self.wait.until(lambda _: "out of space" not in self.text("shares"))
+        self.wait.until(lambda _: self.status_of("/music/f00") != "err_no_space")
+
+        # Paused with work held back; the idle share's bar is drawn empty, never full.
         hours = b.find_element(By.ID, "pause-hours")
         hours.clear()
         hours.send_keys("0")
         self.click("#pause")
-        self.wait.until(EC.text_to_be_present_in_element((By.ID, "pause-text"), "paused until resumed"))
+        self.wait_text("pause-text", "paused until resumed")
+        ctl("reindex", "/music/f01", "/music/f02")
+        self.wait_text("progress", "music")
+        self.wait.until(lambda _: "2 pending" in self.text("progress"))
+        photo = [p for p in b.find_elements(By.CSS_SELECTOR, ".share-progress") if p.text.startswith("photo")][0]
+        self.assertIn("0 pending, 0.0/s, done", photo.text)
+        self.assertEqual(photo.find_element(By.CSS_SELECTOR, ".bar").get_attribute("aria-valuenow"), "0")
+        self.assertRegex(self.text("progress"), r"music\s+2 pending, 0\.0/s, time left unknown")
 
+        # An explanation in words: the problem, the rules with their facts as text.
         b.find_element(By.ID, "explain-path").send_keys("/music/#recycle/old")
         self.click("#explain-form button")
-        self.wait.until(EC.text_to_be_present_in_element((By.ID, "explain-verdict"), "refused by recycle_bin"))
+        self.wait_text("explain-verdict", "the path lies in the share's recycle bin (refused by recycle_bin)")
+        explanation = self.text("explanation")
+        self.assertIn("refuse: recycle bin", explanation)
+        self.assertIn("marked yes, recycle bin yes", explanation)
+        self.assertNotIn("{", explanation)
+        self.assertNotIn("null", explanation)
 
         self.click("#resume")
-        self.wait.until(EC.text_to_be_present_in_element((By.ID, "pause-text"), "running"))
+        self.wait_text("pause-text", "running")
+        self.wait.until(lambda _: "done" in self.text("progress") and "2 pending" not in self.text("progress"))
+        self.assertLessEqual(b.execute_script("return document.documentElement.scrollWidth"), 1280)
+        b.execute_script("window.scrollTo(0, 0)")
         b.save_screenshot(OUTPUT + "/console.png")
+
+        # At 400 px wide nothing needs a horizontal scroll and every row shows its status and actions.
+        b.set_window_size(400, 1000)
+        self.wait.until(lambda _: b.execute_script("return document.documentElement.scrollWidth") <= 400)
+        row = self.row_of("/music/f00")
+        for label in ("Status", "Actions"):
+            cell = row.find_element(By.CSS_SELECTOR, 'td[data-label="%s"]' % label)
+            self.assertTrue(cell.is_displayed())
+            self.assertLessEqual(cell.rect["x"] + cell.rect["width"], 400)
+        b.execute_script("window.scrollTo(0, 0)")
+        b.save_screenshot(OUTPUT + "/console-400.png")
 
 
 if __name__ == "__main__":

@@ -1,36 +1,31 @@
 #include "captured_log.h"
 
-#include <syslog.h>
-
-#include <cstdarg>
-#include <cstdio>
+#include "fileindex/log_sink.h"
 
 namespace tools {
 namespace {
 
-std::vector<std::string>& Lines() {
-    static std::vector<std::string> lines;
+std::vector<CapturedLine>& Lines() {
+    static std::vector<CapturedLine> lines;
     return lines;
 }
 
+void Keep(const QIRA::FILEINDEX::LogLine& line, void*) { Lines().push_back({line.file, line.line, line.message}); }
+
 }  // namespace
 
-const std::vector<std::string>& CapturedLog() { return Lines(); }
+void CaptureLibraryLog() { QIRA::FILEINDEX::SetLogSink(Keep, nullptr, QIRA::FILEINDEX::LogSinkMode::BesidesSyslog); }
+
+const std::vector<CapturedLine>& CapturedLog() { return Lines(); }
 
 void ClearCapturedLog() { Lines().clear(); }
 
-}  // namespace tools
-
-// Takes the place of libc's syslog for the library loaded into this process.
-extern "C" void syslog(int priority, const char* format, ...) {
-    va_list args;
-    va_start(args, format);
-    va_list copy;
-    va_copy(copy, args);
-    char line[8192];
-    vsnprintf(line, sizeof line, format, args);
-    tools::Lines().push_back(line);
-    vsyslog(priority, format, copy);
-    va_end(copy);
-    va_end(args);
+std::vector<std::string> CapturedMessages(bool withSource) {
+    std::vector<std::string> messages;
+    for (const auto& line : Lines()) {
+        messages.push_back(withSource ? line.file + ":" + std::to_string(line.line) + " " + line.message : line.message);
+    }
+    return messages;
 }
+
+}  // namespace tools

@@ -1,6 +1,5 @@
-// The library's log lines of the running operation. the tool is the host process, so it takes
-// the library's syslog calls: each line still goes to the system log and is kept here as well,
-// to be shown with the failure it explains.
+// The library's log lines of the running operation, kept through the library's log sink to be
+// shown with the failure they explain; each line still goes to the system log too.
 #pragma once
 
 #include <string>
@@ -8,7 +7,19 @@
 
 namespace tools {
 
-const std::vector<std::string>& CapturedLog();
+struct CapturedLine {
+    std::string file;  // e.g. "config.cc"
+    int line = 0;
+    std::string message;
+};
+
+// Installs the sink; once, at the start of a tool.
+void CaptureLibraryLog();
+
+const std::vector<CapturedLine>& CapturedLog();
 void ClearCapturedLog();
+
+// The messages; with `withSource` each as "file.cc:line message".
+std::vector<std::string> CapturedMessages(bool withSource);
 
 }  // namespace tools

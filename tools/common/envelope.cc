@@ -38,23 +38,32 @@ ErrorText DescribeError(QIRA::FILEINDEX::_tag_fileindex_err_ code) {
     return {"FILEINDEX_ERR_UNKNOWN", "unknown error code"};
 }
 
-std::string FailureMessage(const std::string& operation) {
-    const auto code = QIRA::FILEINDEX::ErrorHandler::GetError();
-    const ErrorText text = DescribeError(code);
-    return operation + " failed: " + text.name + " (" + std::to_string(static_cast<int>(code)) + "): " +
-           text.explanation;
+std::string FailureMessage(const std::string& operation, const Cause& cause, const std::vector<std::string>& saved) {
+    const std::string what = cause.name + (cause.number != 0 ? " (" + std::to_string(cause.number) + ")" : "") + ": " + cause.text;
+    return saved.empty() ? operation + " failed: " + what : operation + ": saved; not applied: " + what;
 }
 
-Json::Value Envelope(bool ok, const Json::Value& result, const std::string& message,
-                     const std::vector<std::string>& saved) {
-    const auto code = QIRA::FILEINDEX::ErrorHandler::GetError();
+Json::Value SuccessEnvelope(const Json::Value& result, bool verbose) {
     Json::Value envelope(Json::objectValue);
-    envelope["ok"] = ok;
+    envelope["ok"] = true;
     envelope["result"] = result;
-    envelope["error"]["name"] = DescribeError(code).name;
-    envelope["error"]["number"] = static_cast<int>(code);
+    envelope["error"]["name"] = DescribeError(QIRA::FILEINDEX::FILEINDEX_ERR_NONE).name;
+    envelope["error"]["number"] = 0;
+    envelope["message"] = "";
+    envelope["log"] = Strings(verbose ? CapturedMessages(true) : std::vector<std::string>());
+    envelope["saved"] = Json::Value(Json::arrayValue);
+    return envelope;
+}
+
+Json::Value FailureEnvelope(const Cause& cause, const std::string& message, const std::vector<std::string>& saved,
+                            bool verbose) {
+    Json::Value envelope(Json::objectValue);
+    envelope["ok"] = false;
+    envelope["result"] = Json::Value();
+    envelope["error"]["name"] = cause.name;
+    envelope["error"]["number"] = cause.number;
     envelope["message"] = message;
-    envelope["log"] = Strings(CapturedLog());
+    envelope["log"] = Strings(CapturedMessages(verbose));
     envelope["saved"] = Strings(saved);
     return envelope;
 }

@@ -11,13 +11,11 @@
 
 namespace tools {
 
-void Output::EmitEnvelope(bool ok, const Json::Value& result, const std::string& message,
-                          const std::vector<std::string>& saved) const {
-    std::cout << QIRA::FILEINDEX::toString(Envelope(ok, result, message, saved)) << "\n";
-}
-
 void Output::Emit(const Json::Value& result, const Table& table) const {
-    if (json) return EmitEnvelope(true, result, "", {});
+    if (json) {
+        std::cout << QIRA::FILEINDEX::toString(SuccessEnvelope(result, verbose)) << "\n";
+        return;
+    }
     std::vector<size_t> widths;
     for (const auto& row : table) {
         widths.resize(std::max(widths.size(), row.size()), 0);
@@ -34,25 +32,38 @@ void Output::Emit(const Json::Value& result, const Table& table) const {
 }
 
 void Output::Emit(const Json::Value& result, const std::string& text) const {
-    if (json) return EmitEnvelope(true, result, "", {});
+    if (json) {
+        std::cout << QIRA::FILEINDEX::toString(SuccessEnvelope(result, verbose)) << "\n";
+        return;
+    }
     std::cout << text << "\n";
 }
 
+void Output::Warn(const std::string& text) const {
+    if (!json) std::cerr << tool << ": warning: " << text << "\n";
+}
+
 int Output::Fail(const std::string& operation, const std::vector<std::string>& saved) const {
-    const std::string message = FailureMessage(operation);
+    return Tell(operation, CauseOfFailure(), saved, saved.empty() ? kExitFailure : kExitNotApplied);
+}
+
+int Output::Fail(const std::string& operation, const Cause& cause, int status) const {
+    return Tell(operation, cause, {}, status);
+}
+
+int Output::Tell(const std::string& operation, const Cause& cause, const std::vector<std::string>& saved,
+                 int status) const {
+    const std::string message = FailureMessage(operation, cause, saved);
     if (json) {
-        EmitEnvelope(false, Json::Value(), message, saved);
-        return kExitFailure;
+        std::cout << QIRA::FILEINDEX::toString(FailureEnvelope(cause, message, saved, verbose)) << "\n";
+        return status;
     }
     std::cerr << tool << ": " << message << "\n";
     if (!quiet) {
-        for (const auto& line : CapturedLog()) std::cerr << tool << ": log: " << line << "\n";
+        for (const auto& line : CapturedMessages(verbose)) std::cerr << tool << ": log: " << line << "\n";
     }
-    for (const auto& file : saved) {
-        std::cerr << tool << ": " << file << " was already saved with the change; the steps after it did "
-                     "not all succeed\n";
-    }
-    return kExitFailure;
+    for (const auto& file : saved) std::cerr << tool << ": " << file << " was saved with the change\n";
+    return status;
 }
 
 namespace {

@@ -2,13 +2,16 @@
 
 #include <functional>
 #include <mutex>
-#include <set>
+#include <optional>
 
 #include "captured_log.h"
 #include "envelope.h"
-#include "pause.h"
 #include "fileindex/fileindex.h"
+#include "folder_view.h"
+#include "pause.h"
 #include "saved_files.h"
+#include "service_view.h"
+#include "share_path_check.h"
 
 namespace web {
 namespace {
@@ -20,44 +23,37 @@ using QIRA::FILEINDEX::StatusMgr;
 // The library keeps one error code per process: requests enter it one at a time.
 std::mutex g_library;
 
-int StatusFor(QIRA::FILEINDEX::_tag_fileindex_err_ code) {
-    using namespace QIRA::FILEINDEX;
-    switch (code) {
-        case FILEINDEX_ERR_BAD_PARAM: return 400;
-        case FILEINDEX_ERR_PATH:
-        case FILEINDEX_ERR_NO_SUCH_FOLDER: return 404;
-        case FILEINDEX_ERR_EXCEED_MAX_FOLDER: return 422;
-        case FILEINDEX_ERR_LOCK: return 409;
-        case FILEINDEX_ERR_NONE: return 502;  // a platform step or the daemon failed
-        default: return 500;
-    }
-}
-
 void Send(httplib::Response& res, int status, const Json::Value& body) {
     res.status = status;
     res.set_content(QIRA::FILEINDEX::toString(body), "application/json");
 }
 
-// A request refused before the library is called.
-void Refuse(httplib::Response& res, int status, const std::string& message) {
+// A request refused before the library is called, with the cause the console found.
+void Refuse(httplib::Response& res, const tools::Cause& cause, const std::string& message) {
     std::lock_guard<std::mutex> lock(g_library);
-    ErrorHandler::SetError(QIRA::FILEINDEX::FILEINDEX_ERR_NONE);
     tools::ClearCapturedLog();
-    Send(res, status, tools::Envelope(false, Json::Value(), message, {}));
+    Send(res, cause.httpStatus, tools::FailureEnvelope(cause, message, {}, false));
 }
 
-// Runs one library operation and answers with the envelope: on failure the error code decides the
+void Refuse(httplib::Response& res, int status, const std::string& message) {
+    Refuse(res, tools::Cause{"REFUSED", 0, message, status}, message);
+}
+
+// Runs one library operation and answers with the envelope: on failure its cause decides the
 // status, a held lock answers 409 with Retry-After, and files saved before the failure are named.
-void Run(httplib::Response& res, const std::string& operation, const std::function<bool(Json::Value&)>& call) {
+// `found` is a cause the call itself may set before it fails.
+void Run(httplib::Response& res, const std::string& operation, const std::function<bool(Json::Value&)>& call,
+         const std::optional<tools::Cause>& found = std::nullopt) {
     std::lock_guard<std::mutex> lock(g_library);
     const tools::SavedFiles before;
     ErrorHandler::SetError(QIRA::FILEINDEX::FILEINDEX_ERR_NONE);
     tools::ClearCapturedLog();
     Json::Value result(Json::objectValue);
-    if (call(result)) return Send(res, 200, tools::Envelope(true, result, "", {}));
-    const auto code = ErrorHandler::GetError();
-    if (code == QIRA::FILEINDEX::FILEINDEX_ERR_LOCK) res.set_header("Retry-After", "1");
-    Send(res, StatusFor(code), tools::Envelope(false, Json::Value(), tools::FailureMessage(operation), before.Changed()));
+    if (call(result)) return Send(res, 200, tools::SuccessEnvelope(result, false));
+    const tools::Cause cause = found ? *found : tools::CauseOfFailure();
+    if (cause.number == QIRA::FILEINDEX::FILEINDEX_ERR_LOCK) res.set_header("Retry-After", "1");
+    const auto saved = before.Changed();
+    Send(res, cause.httpStatus, tools::FailureEnvelope(cause, tools::FailureMessage(operation, cause, saved), saved, false));
 }
 
 // Writes: the token, the same origin and a JSON body. False after answering the refusal.
@@ -131,13 +127,13 @@ bool ServiceStatus(Json::Value& result) {
     }
     result["status"] = word;
     result["pause"] = tools::PauseState(resumeTime);
-    std::set<std::string> shares;
-    for (const auto& folder : folders) {
-        std::string share;
-        if (QIRA::FILEINDEX::GetShareNameByPath(share, folder.path)) shares.insert(share);
-    }
+    result["progress"]["pause"] = result["pause"];
+    result["daemon"] = tools::DaemonState();
+    bool stuck = false;
+    const std::string reason = tools::NotDoneReason(word, folders, result["daemon"], stuck);
+    result["not_done"] = reason.empty() ? Json::Value() : Json::Value(reason);
     result["shares"] = Json::Value(Json::arrayValue);
-    for (const auto& share : shares) {
+    for (const auto& share : tools::SharesOf(folders)) {
         Json::Value flags(Json::objectValue);
         flags["share"] = share;
         flags["no_space"] = StatusMgr::ShareIsNoSpace(share);
@@ -145,6 +141,27 @@ bool ServiceStatus(Json::Value& result) {
         result["shares"].append(flags);
     }
     return true;
+}
+
+// The first path of an upsert or reindex request that is no share path of a known share; false
+// after answering the refusal.
+bool AcceptPaths(httplib::Response& res, const Json::Value& paths, const std::string& operation) {
+    for (const auto& path : paths) {
+        tools::Cause cause;
+        if (path.isString() && !tools::CheckSharePath(path.asString(), cause)) {
+            Refuse(res, cause, tools::FailureMessage(operation, cause, {}));
+            return false;
+        }
+    }
+    return true;
+}
+
+Json::Value PathsOf(const Json::Value& folders) {
+    Json::Value paths(Json::arrayValue);
+    for (const auto& folder : folders) {
+        if (folder.isObject()) paths.append(folder["path"]);
+    }
+    return paths;
 }
 
 // Hours of an acceptable pause; -1 when not a whole number, negative, or ending past 2038.
@@ -167,26 +184,50 @@ void AddApiRoutes(httplib::Server& server, const std::string& token) {
             }
         }
         Run(res, "list folders", [&](Json::Value& result) {
-            return IndexMgr::List(result, Number(req, "offset", 0), Number(req, "limit", 50), Param(req, "sort_by", "path"),
-                                  Param(req, "sort_direction", "ASC"), Additional(Param(req, "additional")));
+            if (!IndexMgr::List(result, Number(req, "offset", 0), Number(req, "limit", 50), Param(req, "sort_by", "path"),
+                                Param(req, "sort_direction", "ASC"), Additional(Param(req, "additional")))) {
+                return false;
+            }
+            tools::AddRefusingRules(result);
+            return true;
         });
     });
     server.Get("/api/folder", [](const httplib::Request& req, httplib::Response& res) {
         Run(res, "get folder", [&](Json::Value& result) { return IndexMgr::Get(result, Param(req, "path")); });
     });
     server.Get("/api/explain", [](const httplib::Request& req, httplib::Response& res) {
-        Run(res, "explain", [&](Json::Value& result) { return QIRA::FILEINDEX::ExplainPath(Param(req, "path"), result); });
+        std::optional<tools::Cause> unknownShare;
+        Run(
+            res, "explain",
+            [&](Json::Value& result) {
+                if (!QIRA::FILEINDEX::ExplainPath(Param(req, "path"), result)) return false;
+                if (result["refused_by"] != "share_path") return true;
+                unknownShare = tools::Cause{"SHARE_UNKNOWN", 0, result["problem"].asString(), 404};
+                return false;
+            },
+            unknownShare);
     });
     server.Get("/api/progress", [](const httplib::Request&, httplib::Response& res) {
         Run(res, "progress", [](Json::Value& result) { return QIRA::FILEINDEX::GetProgress(result); });
     });
     server.Get("/api/status", [](const httplib::Request&, httplib::Response& res) { Run(res, "status", ServiceStatus); });
 
-    Post(server, token, "/api/folders", "add or change folders",
-         [](const Json::Value& body, Json::Value&) { return IndexMgr::Upsert(body); });
+    server.Post("/api/folders", [token](const httplib::Request& req, httplib::Response& res) {
+        Json::Value body;
+        if (!AcceptWrite(req, res, token, body) || !AcceptPaths(res, PathsOf(body), "add or change folders")) return;
+        Run(res, "add or change folders", [&](Json::Value& result) {
+            if (!IndexMgr::Upsert(body)) return false;
+            result["warnings"] = tools::IndexabilityWarnings(body);
+            return true;
+        });
+    });
     Post(server, token, "/api/folders/delete", "delete folders",
          [](const Json::Value& body, Json::Value&) { return IndexMgr::Delete(body); });
-    Post(server, token, "/api/reindex", "reindex", [](const Json::Value& body, Json::Value&) { return IndexMgr::Reindex(body); });
+    server.Post("/api/reindex", [token](const httplib::Request& req, httplib::Response& res) {
+        Json::Value body;
+        if (!AcceptWrite(req, res, token, body) || !AcceptPaths(res, body, "reindex")) return;
+        Run(res, "reindex", [&](Json::Value&) { return IndexMgr::Reindex(body); });
+    });
     Post(server, token, "/api/resume", "resume", [](const Json::Value&, Json::Value& result) {
         result["pause"] = tools::PauseState(-1);
         return StatusMgr::Resume();

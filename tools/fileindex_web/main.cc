@@ -10,6 +10,8 @@
 #include <httplib.h>
 
 #include "api.h"
+#include "appliance_root.h"
+#include "captured_log.h"
 #include "cli.h"
 #include "fileindex/fileindex.h"
 #include "token.h"
@@ -45,6 +47,7 @@ bool SplitListen(const std::string& listen, std::string& host, int& port) {
 }  // namespace
 
 int main(int argc, char** argv) {
+    tools::CaptureLibraryLog();
     CLI::App app{"Management console of the file-indexing service: a web page and JSON API", "fileindex-web"};
     app.set_version_flag("--version", "fileindex-web " FILEINDEX_VERSION);
     std::string listen = "127.0.0.1:8080";
@@ -62,6 +65,7 @@ int main(int argc, char** argv) {
         std::cerr << "fileindex-web: --root: this build uses the appliance's own paths\n";
         return tools::kExitUsage;
     }
+    if (root.empty()) tools::WarnWithoutAppliance("fileindex-web");
 
     const std::string configDir = QIRA::FILEINDEX::Folders().GetPath().substr(0, QIRA::FILEINDEX::Folders().GetPath().rfind('/'));
     const std::string tokenFile = configDir + "/web.token";
@@ -98,7 +102,11 @@ int main(int argc, char** argv) {
         std::cerr << "fileindex-web: cannot listen on " << listen << "\n";
         return 1;
     }
-    if (created) std::cout << "fileindex-web: token for writes (kept in " << tokenFile << "): " << token << "\n";
+    if (created) {
+        std::cout << "fileindex-web: made a token for writes (kept in " << tokenFile << "): " << token << "\n";
+    } else {
+        std::cout << "fileindex-web: the token for writes is in " << tokenFile << "\n";
+    }
     std::cout << "fileindex-web: listening on http://" << host << ":" << bound << "/" << std::endl;
     std::thread stopper([&] {
         int signal = 0;

@@ -17,6 +17,7 @@ using tools::Table;
 using tools::FormatLocalTime;
 
 constexpr int kExitUnknown = 2;  // a question whose answer could not be worked out
+constexpr int kExitTimeOut = 3;  // wait: the time ran out first
 
 struct Context {
     Output out;
@@ -28,6 +29,10 @@ struct Context {
     bool Attempt(const std::function<bool()>& operation);
     // Tells the failure of the last attempt; returns the exit status.
     int Fail(const std::string& operation) const;
+    // Tells a failure the tool found before asking the library.
+    int Fail(const std::string& operation, const tools::Cause& cause, int status = tools::kExitFailure) const {
+        return out.Fail(operation, cause, status);
+    }
 
 private:
     std::optional<tools::SavedFiles> before_;

@@ -1,4 +1,5 @@
 // folder list | get | add | set | delete | status, and reindex.
+#include <algorithm>
 #include <fstream>
 #include <iostream>
 #include <iterator>
@@ -6,6 +7,8 @@
 
 #include "commands.h"
 #include "fileindex/fileindex.h"
+#include "folder_view.h"
+#include "share_path_check.h"
 
 namespace fileindexctl {
 namespace {
@@ -29,27 +32,58 @@ Json::Value ResultOf(const Json::Value& request) {
     return result;
 }
 
+// The library pages DESC as its first records reversed; a descending page here is the ascending
+// page that ends `offset` records before the end, reversed, so that pages follow each other.
+bool FetchPage(Json::Value& out, unsigned long offset, unsigned long limit, const std::string& sortBy, bool descending,
+               const Json::Value& additional) {
+    if (!descending) return IndexMgr::List(out, offset, limit, sortBy, "ASC", additional);
+    Json::Value all;
+    if (!IndexMgr::List(all, 0, 0, sortBy, "ASC", additional)) return false;
+    const unsigned long total = all["total"].asUInt64();
+    const unsigned long end = offset < total ? total - offset : 0;
+    const unsigned long count = std::min(limit, end);
+    if (!IndexMgr::List(out, end - count, count, sortBy, "ASC", additional)) return false;
+    Json::Value reversed(Json::arrayValue);
+    for (auto i = out["folder"].size(); i-- > 0;) reversed.append(out["folder"][i]);
+    out["folder"] = reversed;
+    out["offset"] = static_cast<Json::UInt64>(offset);
+    return true;
+}
+
 int List(Context& ctx, unsigned long offset, unsigned long limit, const std::string& sortBy, bool descending,
          const std::vector<std::string>& additional) {
     Json::Value out;
-    if (!ctx.Attempt([&] {
-            return IndexMgr::List(out, offset, limit, sortBy, descending ? "DESC" : "ASC", StringArray(additional));
-        })) {
+    if (!ctx.Attempt([&] { return FetchPage(out, offset, limit, sortBy, descending, StringArray(additional)); })) {
         return ctx.Fail("folder list");
     }
+    tools::AddRefusingRules(out);
     Table table;
     std::vector<std::string> header = {"PATH", "NAME", "DOCUMENT", "AUDIO", "VIDEO", "PHOTO"};
     for (const auto& key : additional) header.push_back(key == "is_valid" ? "VALID" : key == "status" ? "STATUS" : key);
     table.push_back(header);
-    for (const auto& folder : out["folder"]) {
+    for (auto& folder : out["folder"]) {
         std::vector<std::string> row = {folder["path"].asString(), folder["name"].asString(), YesNo(folder["document"]),
                                         YesNo(folder["audio"]),     YesNo(folder["video"]),    YesNo(folder["photo"])};
-        for (const auto& key : additional) row.push_back(YesNo(folder["additional"][key]));
+        for (const auto& key : additional) {
+            row.push_back(key == "status" ? tools::StatusText(folder["additional"]) : YesNo(folder["additional"][key]));
+        }
         table.push_back(row);
     }
     table.push_back({"(" + std::to_string(out["folder"].size()) + " of " + out["total"].asString() + ")"});
     ctx.out.Emit(out, table);
     return 0;
+}
+
+// False, after telling the failure, when a path of the request is no share path of a known share.
+bool CheckPaths(Context& ctx, const std::string& operation, const std::vector<std::string>& paths) {
+    for (const auto& path : paths) {
+        tools::Cause cause;
+        if (!tools::CheckSharePath(path, cause)) {
+            ctx.status = ctx.Fail(operation, cause);
+            return false;
+        }
+    }
+    return true;
 }
 
 bool ReadRequest(const std::string& source, Json::Value& request) {
@@ -110,21 +144,46 @@ void AddUpsertCommand(CLI::App& folder, Context& ctx, const char* verb, const ch
         } else {
             request = BuildRequest(*settings, *cmd);
         }
+        const std::string operation = std::string("folder ") + verb;
+        std::vector<std::string> paths;
+        for (const auto& folder : request) {
+            if (folder.isObject() && folder["path"].isString()) paths.push_back(folder["path"].asString());
+        }
+        if (!CheckPaths(ctx, operation, paths)) return;
         if (!ctx.Attempt([&] { return IndexMgr::Upsert(request); })) {
-            ctx.status = ctx.Fail(std::string("folder ") + verb);
+            ctx.status = ctx.Fail(operation);
             return;
         }
-        ctx.out.Emit(ResultOf(request), "ok");
+        Json::Value result = ResultOf(request);
+        result["warnings"] = tools::IndexabilityWarnings(request);
+        for (const auto& warning : result["warnings"]) ctx.out.Warn(warning.asString());
+        ctx.out.Emit(result, "ok");
     });
 }
 
-// A command that hands its share paths to one operation as a JSON array.
+// Reindex asks for paths in shares that hold indexed folders; the library refuses others without
+// a word.
+bool CheckReindexPaths(Context& ctx, const std::vector<std::string>& paths) {
+    if (!CheckPaths(ctx, "reindex", paths)) return false;
+    for (const auto& path : paths) {
+        std::string share;
+        QIRA::FILEINDEX::GetShareNameByPath(share, path);
+        if (!IndexMgr::IsShareIndexed(share)) {
+            ctx.status = ctx.Fail("reindex", {"SHARE_NOT_INDEXED", 0, "share \"" + share + "\" holds no indexed folder", 404});
+            return false;
+        }
+    }
+    return true;
+}
+
+// A command that hands its share paths to one operation as a JSON array, after `check`.
 void AddPathsCommand(CLI::App& parent, Context& ctx, const char* verb, const char* help, const char* operation,
-                     bool (*action)(const Json::Value&)) {
+                     bool (*action)(const Json::Value&), bool (*check)(Context&, const std::vector<std::string>&)) {
     auto paths = std::make_shared<std::vector<std::string>>();
     auto* cmd = parent.add_subcommand(verb, help);
     cmd->add_option("paths", *paths, "Share paths")->required();
-    cmd->callback([&ctx, paths, operation, action] {
+    cmd->callback([&ctx, paths, operation, action, check] {
+        if (check != nullptr && !check(ctx, *paths)) return;
         if (!ctx.Attempt([&] { return action(StringArray(*paths)); })) {
             ctx.status = ctx.Fail(operation);
             return;
@@ -176,7 +235,7 @@ void AddFolderCommands(CLI::App& app, Context& ctx) {
     AddUpsertCommand(*folder, ctx, "add", "Index folders (adds or updates)");
     AddUpsertCommand(*folder, ctx, "set", "Change folder settings (adds or updates)");
 
-    AddPathsCommand(*folder, ctx, "delete", "Stop indexing folders", "folder delete", &IndexMgr::Delete);
+    AddPathsCommand(*folder, ctx, "delete", "Stop indexing folders", "folder delete", &IndexMgr::Delete, nullptr);
 
     auto* status = folder->add_subcommand("status", "Indexing status word of one folder");
     status->add_option("path", *path, "Share path")->required();
@@ -189,10 +248,13 @@ void AddFolderCommands(CLI::App& app, Context& ctx) {
         Json::Value result(Json::objectValue);
         result["path"] = *path;
         result["status"] = word;
-        ctx.out.Emit(result, word);
+        tools::AddRefusingRule(result, *path);
+        result["indexable"] = !result.isMember("refused_by");
+        ctx.out.Emit(result, tools::StatusText(result));
     });
 
-    AddPathsCommand(app, ctx, "reindex", "Index paths again from scratch", "reindex", &IndexMgr::Reindex);
+    AddPathsCommand(app, ctx, "reindex", "Index paths again from scratch", "reindex", &IndexMgr::Reindex,
+                    &CheckReindexPaths);
 }
 
 }  // namespace fileindexctl

@@ -10,6 +10,8 @@
 
 #include "commands.h"
 #include "fileindex/fileindex.h"
+#include "pause.h"
+#include "service_view.h"
 
 namespace fileindexctl {
 namespace {
@@ -29,9 +31,17 @@ std::string Facts(const Json::Value& facts) {
 
 std::string YesNo(bool yes) { return yes ? "yes" : "no"; }
 
+std::string Join(const Json::Value& items) {
+    std::string text;
+    for (const auto& item : items) text += (text.empty() ? "" : ", ") + item.asString();
+    return text;
+}
+
 void PrintExplanation(const Json::Value& e) {
     std::cout << e["path"].asString() << ": "
-              << (e["indexable"].asBool() ? "can be indexed" : "cannot be indexed, refused by " + e["refused_by"].asString())
+              << (e["indexable"].asBool() ? "can be indexed"
+                                          : "cannot be indexed: " + e["problem"].asString() + " (refused by " +
+                                                e["refused_by"].asString() + ")")
               << "\n";
     std::cout << "  share " << e["share"].asString() << ", full path "
               << (e["full_path"].isNull() ? "(not resolved)" : e["full_path"].asString()) << "\n\n";
@@ -52,7 +62,8 @@ void PrintExplanation(const Json::Value& e) {
     if (folder.isNull()) {
         std::cout << "none\n";
     } else {
-        std::cout << folder["path"].asString() << " (" << folder["name"].asString() << "; document "
+        const std::string name = folder["name"].asString().empty() ? "unnamed" : "\"" + folder["name"].asString() + "\"";
+        std::cout << folder["path"].asString() << " (" << name << "; document "
                   << YesNo(folder["document"].asBool()) << ", audio " << YesNo(folder["audio"].asBool()) << ", video "
                   << YesNo(folder["video"].asBool()) << ", photo " << YesNo(folder["photo"].asBool()) << ")\n";
     }
@@ -61,7 +72,9 @@ void PrintExplanation(const Json::Value& e) {
               << "share flags: out of space " << YesNo(e["share_flags"]["no_space"].asBool()) << ", need reindex "
               << YesNo(e["share_flags"]["need_reindex"].asBool()) << "\n"
               << "status: " << e["status"].asString() << "; pending for the path: " << e["pending"]["queue"].asUInt64()
-              << " in the queue, " << e["pending"]["companion"].asUInt64() << " in its companion\n";
+              << " in the queue, " << e["pending"]["companion"].asUInt64() << " in its companion"
+              << (e["pending"]["unread"].empty() ? "" : " (not read, sparse or too large: " + Join(e["pending"]["unread"]) + ")")
+              << "\n";
 }
 
 // Adds to `now` the drain rate (records per second) and the estimated seconds left of every share
@@ -88,10 +101,15 @@ void AddRates(Json::Value& now, const Json::Value& before, double seconds) {
 
 std::string Eta(const Json::Value& eta) { return eta.isNull() ? "-" : std::to_string(eta.asLargestInt()) + "s"; }
 
+std::string PendingText(const Json::Value& share) {
+    const std::string pending = std::to_string(share["pending"].asUInt64());
+    return share["unread"].empty() ? pending : pending + " + " + Join(share["unread"]) + " not read";
+}
+
 Table ProgressTable(const Json::Value& sample) {
     Table table = {{"SHARE / FOLDER", "PENDING", "RATE/S", "LEFT"}};
     for (const auto& share : sample["shares"]) {
-        table.push_back({share["share"].asString(), std::to_string(share["pending"].asUInt64()),
+        table.push_back({share["share"].asString(), PendingText(share),
                          QIRA::FILEINDEX::toString(share["rate"]), Eta(share["eta_seconds"])});
         for (const auto& folder : share["folders"]) {
             table.push_back({"  " + folder["path"].asString(), std::to_string(folder["pending"].asUInt64()),
@@ -103,13 +121,16 @@ Table ProgressTable(const Json::Value& sample) {
 
 // One screen of the watch: a bar per share against the largest backlog seen since the start.
 void DrawScreen(const Json::Value& sample, std::map<std::string, unsigned long long>& largest) {
-    std::cout << "\033[H\033[J" << (sample["pause"]["paused"].asBool() ? "indexing paused\n\n" : "indexing\n\n");
+    std::cout << "\033[H\033[J" << (sample["pause"]["paused"].asBool() ? "indexing paused" : "indexing")
+              << (sample["daemon"]["answers"].asBool() ? "" : "; the indexing daemon does not answer at " +
+                                                                 sample["daemon"]["socket"].asString())
+              << "\n\n";
     for (const auto& share : sample["shares"]) {
         const std::string name = share["share"].asString();
         const unsigned long long pending = share["pending"].asUInt64();
         largest[name] = std::max(largest[name], pending);
         const int width = 30;
-        const int done = largest[name] == 0 ? width : static_cast<int>(width * (largest[name] - pending) / largest[name]);
+        const int done = largest[name] == 0 ? 0 : static_cast<int>(width * (largest[name] - pending) / largest[name]);
         std::cout << name << " [" << std::string(done, '#') << std::string(width - done, '-') << "] " << pending
                   << " pending, " << QIRA::FILEINDEX::toString(share["rate"]) << "/s, left " << Eta(share["eta_seconds"])
                   << "\n";
@@ -117,18 +138,43 @@ void DrawScreen(const Json::Value& sample, std::map<std::string, unsigned long l
     std::cout.flush();
 }
 
+// One sample: the library's progress with the pause's UTC twin and the daemon's state, and why
+// indexing cannot get done by waiting, when it cannot.
+bool Sample(Context& ctx, Json::Value& sample, std::string& stuckReason) {
+    std::string word;
+    std::vector<QIRA::FILEINDEX::Folder> folders;
+    if (!ctx.Attempt([&] {
+            return QIRA::FILEINDEX::GetProgress(sample) && QIRA::FILEINDEX::StatusMgr::GetStatus(word) &&
+                   QIRA::FILEINDEX::IndexMgr::List(folders);
+        })) {
+        return false;
+    }
+    sample["pause"] = tools::PauseState(sample["pause"]["resume_time"].asInt64());
+    sample["daemon"] = tools::DaemonState();
+    bool stuck = false;
+    const std::string reason = tools::NotDoneReason(word, folders, sample["daemon"], stuck);
+    stuckReason = stuck ? reason : "";
+    return true;
+}
+
+int Stuck(Context& ctx, const std::string& operation, const std::string& reason) {
+    return ctx.Fail(operation, {"DAEMON_UNREACHABLE", 0, reason, 502}, kExitUnknown);
+}
+
 int Progress(Context& ctx, bool watch, double interval, int samples) {
     Json::Value before, now;
-    if (!ctx.Attempt([&] { return QIRA::FILEINDEX::GetProgress(before); })) return ctx.Fail("progress");
+    std::string stuck;
+    if (!Sample(ctx, before, stuck)) return ctx.Fail("progress");
     auto taken = Clock::now();
     const bool screen = watch && !ctx.out.json && isatty(STDOUT_FILENO);
     std::map<std::string, unsigned long long> largest;
     for (int sample = 1; samples == 0 || sample <= samples; ++sample) {
         std::this_thread::sleep_for(std::chrono::duration<double>(interval));
-        if (!ctx.Attempt([&] { return QIRA::FILEINDEX::GetProgress(now); })) return ctx.Fail("progress");
+        if (!Sample(ctx, now, stuck)) return ctx.Fail("progress");
         const auto at = Clock::now();
         AddRates(now, before, std::chrono::duration<double>(at - taken).count());
         if (!watch) {
+            if (!stuck.empty()) return Stuck(ctx, "progress", stuck);
             ctx.out.Emit(now, ProgressTable(now));
             return 0;
         }
@@ -143,26 +189,32 @@ int Progress(Context& ctx, bool watch, double interval, int samples) {
     return 0;
 }
 
-// 0 once the service word is "finished", 3 when the time runs out first.
+// 0 once indexing is done, 3 when the time runs out first, 2 when it cannot get done because no
+// daemon answers.
 int Wait(Context& ctx, double timeout) {
     const auto deadline = Clock::now() + std::chrono::duration<double>(timeout);
     while (true) {
         std::string word;
-        if (!ctx.Attempt([&] { return QIRA::FILEINDEX::StatusMgr::GetStatus(word); })) {
+        std::vector<QIRA::FILEINDEX::Folder> folders;
+        if (!ctx.Attempt([&] {
+                return QIRA::FILEINDEX::StatusMgr::GetStatus(word) && QIRA::FILEINDEX::IndexMgr::List(folders);
+            })) {
             ctx.Fail("wait");
             return kExitUnknown;
         }
-        if (word == "finished") {
-            Json::Value result(Json::objectValue);
-            result["status"] = word;
+        bool stuck = false;
+        const std::string reason = tools::NotDoneReason(word, folders, tools::DaemonState(), stuck);
+        Json::Value result(Json::objectValue);
+        result["status"] = word;
+        if (reason.empty()) {
             ctx.out.Emit(result, word);
             return 0;
         }
+        if (stuck) return Stuck(ctx, "wait", reason);
         if (Clock::now() >= deadline) {
-            Json::Value result(Json::objectValue);
-            result["status"] = word;
-            ctx.out.Emit(result, "still " + word + " after " + std::to_string(static_cast<long>(timeout)) + "s");
-            return 3;
+            result["reason"] = reason;
+            ctx.out.Emit(result, "not done after " + std::to_string(static_cast<long>(timeout)) + "s: " + reason);
+            return kExitTimeOut;
         }
         std::this_thread::sleep_for(std::chrono::milliseconds(100));
     }
@@ -178,6 +230,10 @@ void AddInsightCommands(CLI::App& app, Context& ctx) {
         Json::Value out;
         if (!ctx.Attempt([&] { return QIRA::FILEINDEX::ExplainPath(*path, out); })) {
             ctx.status = ctx.Fail("explain");
+            return;
+        }
+        if (out["refused_by"] == "share_path") {
+            ctx.status = ctx.Fail("explain", {"SHARE_UNKNOWN", 0, out["problem"].asString(), 404});
             return;
         }
         if (ctx.out.json) {

@@ -4,6 +4,8 @@
 
 #include <cstdlib>
 
+#include "appliance_root.h"
+#include "captured_log.h"
 #include "cli.h"
 #include "commands.h"
 #include "fileindex/root.h"
@@ -20,11 +22,13 @@ void UseRoot(const std::string& option) {
     if (!root.empty() && (stat(root.c_str(), &st) != 0 || !S_ISDIR(st.st_mode))) {
         throw CLI::ValidationError(option.empty() ? "the root prefix" : "--root", "no such directory: " + root);
     }
+    if (option.empty()) tools::WarnWithoutAppliance("fileindexctl");
 }
 
 }  // namespace
 
 int main(int argc, char** argv) {
+    tools::CaptureLibraryLog();
     fileindexctl::Context ctx;
     CLI::App app{"Configure and control the file-indexing service", "fileindexctl"};
     app.require_subcommand(1);
@@ -34,6 +38,7 @@ int main(int argc, char** argv) {
     app.add_option("--root", root, "Root prefix of the appliance (instead of QIRA_ROOT)");
     app.add_flag("--json", ctx.out.json, "One JSON object on stdout, for success and failure alike");
     app.add_flag("-q,--quiet", ctx.out.quiet, "Do not show the library's log lines with a failure");
+    app.add_flag("-v,--verbose", ctx.out.verbose, "Show the library's log lines with their source file and line");
     app.add_option("--lock-wait", ctx.lockWait, "Seconds to retry a held configuration lock (0 = fail at once)")
         ->check(CLI::NonNegativeNumber);
     app.parse_complete_callback([&root] { UseRoot(root); });

@@ -1,10 +1,10 @@
 // service status | pause | resume, and the migration step.
 #include <ctime>
-#include <set>
 
 #include "commands.h"
-#include "pause.h"
 #include "fileindex/fileindex.h"
+#include "pause.h"
+#include "service_view.h"
 
 namespace fileindexctl {
 namespace {
@@ -18,15 +18,8 @@ std::string PauseText(long long resumeTime) {
 }
 
 // The shares of the indexed folders, with their flags.
-void ShareFlags(Json::Value& noSpace, Json::Value& needReindex) {
-    std::vector<QIRA::FILEINDEX::Folder> folders;
-    QIRA::FILEINDEX::IndexMgr::List(folders);
-    std::set<std::string> shares;
-    for (const auto& folder : folders) {
-        std::string share;
-        if (QIRA::FILEINDEX::GetShareNameByPath(share, folder.path)) shares.insert(share);
-    }
-    for (const auto& share : shares) {
+void ShareFlags(const std::vector<QIRA::FILEINDEX::Folder>& folders, Json::Value& noSpace, Json::Value& needReindex) {
+    for (const auto& share : tools::SharesOf(folders)) {
         if (StatusMgr::ShareIsNoSpace(share)) noSpace.append(share);
         if (StatusMgr::ShareIsNeedReindex(share)) needReindex.append(share);
     }
@@ -38,22 +31,44 @@ std::string Join(const Json::Value& items) {
     return text.empty() ? "-" : text;
 }
 
+std::string DaemonText(const Json::Value& daemon) {
+    return daemon["answers"].asBool() ? "answers at " + daemon["socket"].asString()
+                                      : "does not answer at " + daemon["socket"].asString() + " (" +
+                                            daemon["reason"].asString() + ")";
+}
+
+void AddWatchedRows(const Json::Value& watched, Table& table) {
+    for (const auto& share : watched) {
+        std::string folders = share.isMember("error") ? share["error"].asString() : Join(share["folders"]);
+        table.push_back({"watched in " + share["share"].asString(), folders});
+    }
+}
+
 int Status(Context& ctx) {
     std::string word;
     long long resumeTime = -1;
-    if (!ctx.Attempt([&] { return StatusMgr::GetStatus(word) && StatusMgr::GetPauseInfo(resumeTime); })) {
+    std::vector<QIRA::FILEINDEX::Folder> folders;
+    if (!ctx.Attempt([&] {
+            return StatusMgr::GetStatus(word) && StatusMgr::GetPauseInfo(resumeTime) &&
+                   QIRA::FILEINDEX::IndexMgr::List(folders);
+        })) {
         return ctx.Fail("service status");
     }
     Json::Value out(Json::objectValue);
     out["status"] = word;
+    out["daemon"] = tools::DaemonState();
     out["pause"] = tools::PauseState(resumeTime);
     out["no_space"] = Json::Value(Json::arrayValue);
     out["need_reindex"] = Json::Value(Json::arrayValue);
-    ShareFlags(out["no_space"], out["need_reindex"]);
-    ctx.out.Emit(out, Table{{"status", word},
-                            {"pause", PauseText(resumeTime)},
-                            {"out of space", Join(out["no_space"])},
-                            {"need reindex", Join(out["need_reindex"])}});
+    ShareFlags(folders, out["no_space"], out["need_reindex"]);
+    out["watched"] = tools::WatchedShares(folders);
+    Table table = {{"status", word},
+                   {"daemon", DaemonText(out["daemon"])},
+                   {"pause", PauseText(resumeTime)},
+                   {"out of space", Join(out["no_space"])},
+                   {"need reindex", Join(out["need_reindex"])}};
+    AddWatchedRows(out["watched"], table);
+    ctx.out.Emit(out, table);
     return 0;
 }
 

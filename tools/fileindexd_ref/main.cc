@@ -17,6 +17,7 @@
 
 #include <CLI/CLI.hpp>
 
+#include "appliance_root.h"
 #include "cli.h"
 #include "daemon_frame.h"
 #include "fileindex/fileindex.h"
@@ -62,7 +63,7 @@ public:
             pollfd pfd{listener_, POLLIN, 0};
             if (poll(&pfd, 1, std::max<int>(0, static_cast<int>(wait.count()))) > 0) Accept();
             if (std::chrono::steady_clock::now() < nextDrain) continue;
-            AcceptPending();  // a pause sent before an event was queued is obeyed first
+            AcceptPending();
             if (!Paused()) DrainAll();
             nextDrain = std::chrono::steady_clock::now() + std::chrono::milliseconds(intervalMs);
         }
@@ -88,6 +89,7 @@ private:
             if (!ReadExactly(client, &text[0], length)) text.clear();
         }
         close(client);
+        if (text.empty() && length == 0) return;  // a probe: connected and closed without a command
         const tools::DaemonFrame frame =
             tools::DecodeDaemonFrame(std::string(reinterpret_cast<const char*>(&length), sizeof length) + text);
         if (!frame.message.isObject()) {
@@ -116,6 +118,10 @@ private:
             char queue[4096];
             if (FILEIDXQueuePathGet(share.c_str(), queue, sizeof queue) < 0) continue;
             fileindexd_ref::TakeQueue(queue);
+            // A pause sent before a taken record was queued is in the backlog by now: obey it
+            // first, and leave the taken records waiting in the companion.
+            AcceptPending();
+            if (Paused()) return;
             fileindexd_ref::ProcessTaken(queue);
         }
     }
@@ -135,6 +141,7 @@ int main(int argc, char** argv) {
     app.add_option("--interval", intervalMs, "Milliseconds between passes over the queues")->check(CLI::Range(1, 60000));
     if (const auto ended = tools::Parse(app, argc, argv)) return *ended;
     if (!root.empty()) QIRA::FILEINDEX::UseRootPrefix(root);
+    if (root.empty()) tools::WarnWithoutAppliance("fileindexd-ref");
     signal(SIGTERM, OnTerm);
     signal(SIGINT, OnTerm);
     signal(SIGPIPE, SIG_IGN);

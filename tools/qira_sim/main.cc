@@ -2,6 +2,7 @@
 #include <CLI/CLI.hpp>
 
 #include "fileindex/json.h"
+#include "appliance_root.h"
 #include "cli.h"
 #include "output.h"
 #include "fileindex/root.h"
@@ -140,8 +141,9 @@ int main(int argc, char** argv) {
     Options options;
     app.add_option("--root", options.root, "Root of the simulated appliance (instead of QIRA_ROOT)");
     app.add_flag("--json", options.out.json, "Print one JSON object: {\"ok\", \"result\", ...}");
-    app.parse_complete_callback([&options] {
+    app.parse_complete_callback([&options, &app] {
         if (!options.root.empty()) QIRA::FILEINDEX::UseRootPrefix(options.root);
+        if (options.root.empty() && !app.got_subcommand("init")) tools::WarnWithoutAppliance("qira-sim");
     });
     app.add_subcommand("init", "Create the appliance's directories, notifier and default services")->callback([] {
         // A simulated appliance never goes into the real root.

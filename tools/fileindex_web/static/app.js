@@ -1,16 +1,35 @@
-// The management console: the folder listing, changes, pause and resume, explanations and
-// progress, through the JSON API of fileindex-web.
+// The management console: the folder listing, changes, pause and resume, explanations, share
+// flags and progress, through the JSON API of fileindex-web. Everything shown is refreshed every
+// few seconds, so changes made by other tools appear without a reload.
 'use strict';
 
-const state = { offset: 0, limit: 10, sortBy: 'path', direction: 'ASC', total: 0, largest: {} };
+const POLL_MS = 3000;
+const KINDS = ['document', 'audio', 'video', 'photo'];
+const KIND_LABELS = { document: 'Documents', audio: 'Audio', video: 'Video', photo: 'Photos' };
+const state = { offset: 0, limit: 10, sortBy: 'path', direction: 'ASC', total: 0, largest: {}, previous: null };
 const $ = (id) => document.getElementById(id);
 
-function show(text, kind) {
+function show(text, kind, details) {
   $('message').textContent = text;
   $('message').className = kind || '';
+  const list = $('message-details');
+  list.replaceChildren();
+  for (const line of details || []) {
+    const item = document.createElement('li');
+    item.textContent = line;
+    list.appendChild(item);
+  }
+  $('message-more').hidden = !(details && details.length);
 }
 
 const sleep = (ms) => new Promise((done) => setTimeout(done, ms));
+
+class ApiError extends Error {
+  constructor(answer) {
+    super(answer.message || 'the request failed');
+    this.log = answer.log || [];
+  }
+}
 
 // One API call; a held lock (409) is retried after Retry-After, a few times.
 async function api(method, url, body) {
@@ -28,25 +47,27 @@ async function api(method, url, body) {
       await sleep(1000 * (Number(response.headers.get('Retry-After')) || 1));
       continue;
     }
-    if (!answer.ok) {
-      const log = answer.log && answer.log.length ? ' (' + answer.log.join('; ') + ')' : '';
-      throw new Error(answer.message + log);
-    }
+    if (!answer.ok) throw new ApiError(answer);
     return answer.result;
   }
 }
 
+// Runs a change and tells how it went; the library's log lines stay one click away.
 async function act(description, work) {
   try {
-    await work();
-    show(description + ': done.');
+    const warnings = await work();
+    if (warnings && warnings.length) show(description + ': done, but ' + warnings.join('; '), 'warning');
+    else show(description + ': done.');
+    return true;
   } catch (error) {
-    show(description + ' failed: ' + error.message, 'error');
+    show(description + ' failed: ' + error.message, 'error', error.log);
+    return false;
   }
 }
 
-function cell(row, text, className) {
+function cell(row, text, label, className) {
   const td = row.insertCell();
+  td.dataset.label = label;
   if (className) {
     const badge = document.createElement('span');
     badge.className = className;
@@ -60,9 +81,11 @@ function cell(row, text, className) {
 
 function button(parent, label, onClick) {
   const b = document.createElement('button');
+  b.type = 'button';
   b.textContent = label;
   b.addEventListener('click', onClick);
   parent.appendChild(b);
+  return b;
 }
 
 // The library's descending page is its first records reversed; a descending page here is the
@@ -78,6 +101,12 @@ async function fetchPage() {
   return listing;
 }
 
+// A folder that cannot be indexed carries the word "paused"; the console says why instead.
+function statusOf(additional) {
+  return additional.refused_by ? ['not indexable: ' + additional.refused_by, 'badge refused']
+    : [additional.status, 'badge ' + additional.status];
+}
+
 async function loadFolders() {
   const listing = await fetchPage();
   state.total = listing.total;
@@ -85,12 +114,14 @@ async function loadFolders() {
   body.replaceChildren();
   for (const folder of listing.folder) {
     const row = body.insertRow();
-    cell(row, folder.path);
-    cell(row, folder.name);
-    for (const kind of ['document', 'audio', 'video', 'photo']) cell(row, folder[kind] ? 'yes' : 'no');
-    cell(row, folder.additional.status, 'badge ' + folder.additional.status);
-    cell(row, folder.additional.is_valid ? 'valid' : 'not valid');
+    cell(row, folder.path, 'Path');
+    cell(row, folder.name, 'Name');
+    for (const kind of KINDS) cell(row, folder[kind] ? 'yes' : 'no', KIND_LABELS[kind]);
+    const [word, badge] = statusOf(folder.additional);
+    cell(row, word, 'Status', badge);
+    cell(row, folder.additional.is_valid ? 'valid' : 'not valid', 'Valid');
     const actions = row.insertCell();
+    actions.dataset.label = 'Actions';
     button(actions, 'Edit', () => edit(folder));
     button(actions, 'Reindex', () => act('Reindex ' + folder.path, async () => {
       await api('POST', '/api/reindex', [folder.path]);
@@ -118,36 +149,101 @@ async function loadFolders() {
 function edit(folder) {
   $('folder-path').value = folder.path;
   $('folder-name').value = folder.name;
-  for (const kind of ['document', 'audio', 'video', 'photo']) $('folder-' + kind).checked = folder[kind];
+  for (const kind of KINDS) $('folder-' + kind).checked = folder[kind];
   $('folder-path').focus();
+}
+
+function pauseText(pause) {
+  if (!pause.paused) return 'running';
+  return pause.resume_time === 0 ? 'paused until resumed'
+    : 'paused until ' + new Date(pause.resume_time * 1000).toLocaleString();
 }
 
 async function loadStatus() {
   const status = await api('GET', '/api/status');
   $('service-word').textContent = status.status;
-  const pause = status.pause;
-  $('pause-text').textContent = !pause.paused ? '(running)'
-    : pause.resume_time === 0 ? '(paused until resumed)'
-    : '(paused until ' + new Date(pause.resume_time * 1000).toLocaleString() + ')';
+  $('pause-text').textContent = '(' + pauseText(status.pause) + ')';
+  const daemon = status.daemon;
+  $('daemon').textContent = daemon.answers ? 'Indexing daemon: answers.'
+    : 'Indexing daemon: does not answer at ' + daemon.socket + ' (' + daemon.reason + ').';
+  $('daemon').className = daemon.answers ? '' : 'problem';
+  $('not-done').textContent = status.not_done ? 'Not done: ' + status.not_done + '.' : '';
+  renderShares(status.shares);
   renderProgress(status.progress);
 }
 
+function renderShares(shares) {
+  const target = $('shares');
+  target.replaceChildren();
+  for (const share of shares.filter((s) => s.no_space || s.need_reindex)) {
+    const line = document.createElement('p');
+    line.append('Share ' + share.share + ': ');
+    if (share.no_space) {
+      line.append('out of space, indexing stopped. ');
+      button(line, 'Revive', () => act('Revive ' + share.share, async () => {
+        await api('POST', '/api/shares/revive', { share: share.share });
+        await loadStatus();
+      }));
+    }
+    if (share.need_reindex) {
+      line.append(' Needs a full reindex (events were lost). ');
+      button(line, 'Clear the flag', () => act('Clear the flag of ' + share.share, async () => {
+        await api('POST', '/api/shares/need-reindex', { share: share.share, need_reindex: false });
+        await loadStatus();
+      }));
+    }
+    target.appendChild(line);
+  }
+}
+
+// Records per second drained since the previous poll, and the time left at that rate.
+function drain(name, pending, seconds) {
+  const before = state.previous && state.previous[name];
+  const rate = before !== undefined && seconds > 0 && before > pending ? (before - pending) / seconds : 0;
+  const left = pending === 0 ? 'done' : rate > 0 ? 'about ' + Math.ceil(pending / rate) + ' s left' : 'time left unknown';
+  return { rate, left };
+}
+
 function renderProgress(progress) {
+  const now = Date.now();
+  const seconds = state.previousAt ? (now - state.previousAt) / 1000 : 0;
   const target = $('progress');
   target.replaceChildren();
+  const pendings = {};
   for (const share of progress.shares) {
+    pendings[share.share] = share.pending;
     state.largest[share.share] = Math.max(state.largest[share.share] || 0, share.pending);
+    const largest = state.largest[share.share];
     const line = document.createElement('p');
+    line.className = 'share-progress';
     const bar = document.createElement('span');
     bar.className = 'bar';
+    bar.setAttribute('role', 'progressbar');
     const done = document.createElement('span');
-    const largest = state.largest[share.share];
-    done.style.width = (largest === 0 ? 100 : Math.round(100 * (largest - share.pending) / largest)) + '%';
+    const percent = largest === 0 ? 0 : Math.round(100 * (largest - share.pending) / largest);
+    done.style.width = percent + '%';
+    bar.setAttribute('aria-valuenow', String(percent));
     bar.appendChild(done);
-    line.append(share.share + ' ', bar, ' ' + share.pending + ' pending');
+    const { rate, left } = drain(share.share, share.pending, seconds);
+    const unread = share.unread.length ? ' (' + share.unread.join(', ') + ' not read: sparse or too large)' : '';
+    line.append(share.share + ' ', bar, ' ' + share.pending + ' pending' + unread + ', ' + rate.toFixed(1) + '/s, ' + left);
     target.appendChild(line);
   }
   if (!progress.shares.length) target.textContent = 'Nothing is indexed.';
+  state.previous = pendings;
+  state.previousAt = now;
+}
+
+// A fact as a person reads it: yes / no for flags, "none" for a missing value.
+function factText(value) {
+  if (value === null || value === undefined) return 'none';
+  if (typeof value === 'boolean') return value ? 'yes' : 'no';
+  return String(value);
+}
+
+function factsText(facts) {
+  if (!facts) return '';
+  return Object.entries(facts).map(([name, value]) => name.replace(/_/g, ' ') + ' ' + factText(value)).join(', ');
 }
 
 async function explain(path) {
@@ -157,7 +253,8 @@ async function explain(path) {
     const target = $('explanation');
     target.replaceChildren();
     const verdict = document.createElement('p');
-    verdict.textContent = e.indexable ? path + ' can be indexed.' : path + ' cannot be indexed: refused by ' + e.refused_by + '.';
+    verdict.textContent = e.indexable ? path + ' can be indexed.'
+      : path + ' cannot be indexed: ' + e.problem + ' (refused by ' + e.refused_by + ').';
     verdict.className = e.indexable ? '' : 'refuse';
     verdict.id = 'explain-verdict';
     target.appendChild(verdict);
@@ -165,14 +262,17 @@ async function explain(path) {
     const rules = e.rules.filter((r) => r.rule === e.refused_by).concat(e.rules.filter((r) => r.rule !== e.refused_by));
     for (const rule of rules) {
       const item = document.createElement('li');
-      item.textContent = rule.verdict + ' — ' + rule.rule + ': ' + rule.description + ' ' + JSON.stringify(rule.facts);
+      const facts = factsText(rule.facts);
+      item.textContent = rule.verdict.replace('_', ' ') + ': ' + rule.rule.replace(/_/g, ' ') + ' (refuses ' + rule.description + ')' +
+        (facts ? '; ' + facts : '');
       if (rule.verdict === 'refuse') item.className = 'refuse';
       list.appendChild(item);
     }
     target.appendChild(list);
     const governing = document.createElement('p');
-    governing.textContent = 'Governing folder: ' + (e.governing_folder ? e.governing_folder.path : 'none') +
-      '; status ' + e.status + '; pending ' + (e.pending.queue + e.pending.companion) + '.';
+    const folder = e.governing_folder;
+    governing.textContent = 'Governing folder: ' + (folder ? folder.path + (folder.name ? ' (' + folder.name + ')' : '') : 'none') +
+      '; status ' + e.status + '; ' + (e.pending.queue + e.pending.companion) + ' records pending for the path.';
     target.appendChild(governing);
   });
 }
@@ -180,6 +280,10 @@ async function explain(path) {
 async function refresh() {
   await loadFolders();
   await loadStatus();
+}
+
+function resetForm() {
+  $('folder-form').reset();
 }
 
 function wire() {
@@ -199,11 +303,16 @@ function wire() {
   $('previous').addEventListener('click', () => { state.offset = Math.max(0, state.offset - state.limit); act('Page', loadFolders); });
   $('next').addEventListener('click', () => { state.offset += state.limit; act('Page', loadFolders); });
   $('per-page').addEventListener('change', () => { state.limit = Number($('per-page').value); state.offset = 0; act('Page', loadFolders); });
-  $('folder-form').addEventListener('submit', (event) => {
+  $('folder-form').addEventListener('submit', async (event) => {
     event.preventDefault();
     const folder = { path: $('folder-path').value.trim(), name: $('folder-name').value };
-    for (const kind of ['document', 'audio', 'video', 'photo']) folder[kind] = $('folder-' + kind).checked;
-    act('Save ' + folder.path, async () => { await api('POST', '/api/folders', [folder]); await refresh(); });
+    for (const kind of KINDS) folder[kind] = $('folder-' + kind).checked;
+    const saved = await act('Save ' + folder.path, async () => {
+      const result = await api('POST', '/api/folders', [folder]);
+      await refresh();
+      return result.warnings;
+    });
+    if (saved) resetForm();
   });
   $('pause-form').addEventListener('submit', (event) => {
     event.preventDefault();
@@ -212,7 +321,7 @@ function wire() {
   $('resume').addEventListener('click', () => act('Resume', async () => { await api('POST', '/api/resume'); await loadStatus(); }));
   $('explain-form').addEventListener('submit', (event) => { event.preventDefault(); explain($('explain-path').value.trim()); });
   act('Load', refresh);
-  setInterval(() => loadStatus().catch((error) => show('Status failed: ' + error.message, 'error')), 3000);
+  setInterval(() => refresh().catch((error) => show('Refresh failed: ' + error.message, 'error', error.log)), POLL_MS);
 }
 
 document.addEventListener('DOMContentLoaded', wire);
