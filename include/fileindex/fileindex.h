@@ -11,6 +11,7 @@
 #include "fileindex/json.h"
 #include "fileindex/log_sink.h"
 #include "fileindex/progress.h"
+#include "fileindex/queue_reader.h"
 #include "fileindex/root.h"
 #include "fileindex/service_state.h"
 #include "fileindex/status.h"

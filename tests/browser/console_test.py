@@ -143,6 +143,22 @@ class ConsoleTest(unittest.TestCase):
 
         self.click("#resume")
         self.wait_text("pause-text", "running")
+
+        # A search finds a file by a word of its text, without its accent, the word marked.
+        with open(os.path.join(os.environ["QIRA_ROOT"], "volume1/music/f03/notes.txt"), "w", encoding="utf-8") as notes:
+            notes.write("An old manuscript from Crète")
+        ctl("reindex", "/music/f03")
+        query = b.find_element(By.ID, "search-query")
+        for _ in range(100):
+            query.clear()
+            query.send_keys("manus cret")
+            self.click("#search-form button")
+            self.wait_text("message", "Search for manus cret: done.")
+            if "/music/f03/notes.txt" in self.text("search-hits"):
+                break
+        self.assertIn("/music/f03/notes.txt", self.text("search-hits"))
+        marks = [m.text for m in b.find_elements(By.CSS_SELECTOR, "#search-hits mark")]
+        self.assertEqual(marks, ["manuscript", "Crète"])
         self.wait.until(lambda _: "done" in self.text("progress") and "2 pending" not in self.text("progress"))
         self.assertLessEqual(b.execute_script("return document.documentElement.scrollWidth"), 1280)
         b.execute_script("window.scrollTo(0, 0)")

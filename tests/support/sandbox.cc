@@ -111,6 +111,15 @@ std::vector<std::string> JournalOps() {
     return ops;
 }
 
+size_t RecordsApplied(const std::string& daemonLog, const std::string& share) {
+    const std::string marker = "fileindexd-ref: share " + share + ": ";
+    size_t applied = 0;
+    for (size_t at = daemonLog.find(marker); at != std::string::npos; at = daemonLog.find(marker, at + 1)) {
+        applied += std::strtoul(daemonLog.c_str() + at + marker.size(), nullptr, 10);
+    }
+    return applied;
+}
+
 }  // namespace testkit
 
 void Json::PrintTo(const Json::Value& value, std::ostream* os) { *os << QIRA::FILEINDEX::toString(value); }

@@ -1,5 +1,6 @@
 #include "api.h"
 
+#include <algorithm>
 #include <functional>
 #include <mutex>
 #include <optional>
@@ -10,6 +11,7 @@
 #include "folder_view.h"
 #include "pause.h"
 #include "saved_files.h"
+#include "search_view.h"
 #include "service_view.h"
 #include "share_path_check.h"
 
@@ -211,6 +213,23 @@ void AddApiRoutes(httplib::Server& server, const std::string& token) {
         Run(res, "progress", [](Json::Value& result) { return QIRA::FILEINDEX::GetProgress(result); });
     });
     server.Get("/api/status", [](const httplib::Request&, httplib::Response& res) { Run(res, "status", ServiceStatus); });
+    server.Get("/api/search", [](const httplib::Request& req, httplib::Response& res) {
+        tools::SearchRequest request;
+        request.query = Param(req, "q");
+        request.type = Param(req, "type");
+        request.share = Param(req, "share");
+        request.limit = static_cast<int>(std::min<unsigned long>(Number(req, "limit", 20), 200));
+        std::optional<tools::Cause> refused;
+        Run(
+            res, "search",
+            [&](Json::Value& result) {
+                std::string error;
+                if (tools::SearchShares(request, result, error)) return true;
+                refused = tools::Cause{"BAD_QUERY", 0, error, 400};
+                return false;
+            },
+            refused);
+    });
 
     server.Post("/api/folders", [token](const httplib::Request& req, httplib::Response& res) {
         Json::Value body;

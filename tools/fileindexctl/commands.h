@@ -43,5 +43,6 @@ void AddServiceCommands(CLI::App& app, Context& ctx);
 void AddShareCommands(CLI::App& app, Context& ctx);
 void AddQuestionCommands(CLI::App& app, Context& ctx);
 void AddInsightCommands(CLI::App& app, Context& ctx);
+void AddSearchCommand(CLI::App& app, Context& ctx);
 
 }  // namespace fileindexctl

@@ -47,6 +47,7 @@ int main(int argc, char** argv) {
     fileindexctl::AddShareCommands(app, ctx);
     fileindexctl::AddQuestionCommands(app, ctx);
     fileindexctl::AddInsightCommands(app, ctx);
+    fileindexctl::AddSearchCommand(app, ctx);
     if (const auto ended = tools::Parse(app, argc, argv)) return *ended;
     return ctx.status;
 }

@@ -1,6 +1,6 @@
 // fileindexd-ref: a stand-in for the indexing daemon, for development and demonstrations. It
-// listens on the daemon socket, logs every command, keeps the pause state it is told and drains
-// each indexed share's queue while not paused.
+// listens on the daemon socket, logs every command, keeps the pause state it is told and, while not
+// paused, takes each indexed share's queue and applies its records to the share's search index.
 #include <poll.h>
 #include <sys/socket.h>
 #include <sys/un.h>
@@ -13,7 +13,8 @@
 #include <cstring>
 #include <ctime>
 #include <iostream>
-#include <set>
+#include <map>
+#include <vector>
 
 #include <CLI/CLI.hpp>
 
@@ -21,11 +22,16 @@
 #include "cli.h"
 #include "daemon_frame.h"
 #include "fileindex/fileindex.h"
-#include "queue_drain.h"
+#include "queue_take.h"
+#include "service_view.h"
+#include "share_indexer.h"
 
 namespace {
 
 volatile sig_atomic_t g_stop = 0;
+
+// Records applied to a share's index in one transaction.
+constexpr size_t kBatchSize = 1000;
 
 void OnTerm(int) { g_stop = 1; }
 
@@ -106,15 +112,16 @@ private:
         if (type == "resume") resume_time_ = -1;
     }
 
+    // One pass over the shares holding indexed folders: take each queue, apply its records to the
+    // share's index, and walk the share again when it is marked need-reindex.
     void DrainAll() {
         std::vector<QIRA::FILEINDEX::Folder> folders;
         if (!QIRA::FILEINDEX::IndexMgr::List(folders)) return;
-        std::set<std::string> shares;
-        for (const auto& folder : folders) {
-            std::string share;
-            if (QIRA::FILEINDEX::GetShareNameByPath(share, folder.path)) shares.insert(share);
-        }
+        const std::vector<std::string> shares = tools::SharesOf(folders);
+        ForgetSharesNoLongerIndexed(shares);
         for (const auto& share : shares) {
+            auto& indexer = indexers_.try_emplace(share, share).first->second;
+            indexer.ForgetIfRemoved();
             char queue[4096];
             if (FILEIDXQueuePathGet(share.c_str(), queue, sizeof queue) < 0) continue;
             fileindexd_ref::TakeQueue(queue);
@@ -122,10 +129,34 @@ private:
             // first, and leave the taken records waiting in the companion.
             AcceptPending();
             if (Paused()) return;
-            fileindexd_ref::ProcessTaken(queue);
+            const size_t applied = fileindexd_ref::ProcessTaken(
+                queue, kBatchSize, [&](const fileindexd_ref::Batch& batch) { indexer.Apply(batch, folders); });
+            if (applied > 0) Report(share, std::to_string(applied) + " records applied", indexer);
+            if (QIRA::FILEINDEX::StatusMgr::ShareIsNeedReindex(share) &&
+                QIRA::FILEINDEX::StatusMgr::ShareSetNeedReindex(share, false)) {
+                indexer.Reindex(folders);  // a mark set meanwhile stays for the next pass
+                Report(share, "reindexed (it was marked need-reindex)", indexer);
+            }
         }
     }
 
+    void ForgetSharesNoLongerIndexed(const std::vector<std::string>& shares) {
+        for (auto it = indexers_.begin(); it != indexers_.end();) {
+            if (std::find(shares.begin(), shares.end(), it->first) == shares.end()) {
+                std::cout << "fileindexd-ref: share " << it->first << " holds no indexed folder; its index is closed" << std::endl;
+                it = indexers_.erase(it);
+            } else {
+                ++it;
+            }
+        }
+    }
+
+    static void Report(const std::string& share, const std::string& what, fileindexd_ref::ShareIndexer& indexer) {
+        std::cout << "fileindexd-ref: share " << share << ": " << what << ", " << indexer.Count() << " files in the index"
+                  << std::endl;
+    }
+
+    std::map<std::string, fileindexd_ref::ShareIndexer> indexers_;
     int listener_;
     long long resume_time_ = -1;
 };

@@ -277,6 +277,42 @@ async function explain(path) {
   });
 }
 
+function sizeText(bytes) {
+  const units = ['B', 'KiB', 'MiB', 'GiB'];
+  let size = bytes;
+  let unit = 0;
+  while (size >= 1024 && unit < units.length - 1) { size /= 1024; unit++; }
+  return (unit === 0 ? size : size.toFixed(1)) + ' ' + units[unit];
+}
+
+// The hits, best first, each with its matched words marked; the text is never read as HTML.
+async function search() {
+  const query = $('search-query').value.trim();
+  await act('Search for ' + query, async () => {
+    const result = await api('GET', '/api/search?' + new URLSearchParams({ q: query, type: $('search-type').value }));
+    const list = $('search-hits');
+    list.replaceChildren();
+    for (const hit of result.hits) {
+      const item = document.createElement('li');
+      const path = document.createElement('strong');
+      path.textContent = hit.path;
+      const facts = document.createElement('span');
+      facts.className = 'facts';
+      facts.textContent = ' ' + hit.type + ', ' + sizeText(hit.size) + ', ' + new Date(hit.mtime * 1000).toLocaleString();
+      const snippet = document.createElement('div');
+      snippet.className = 'snippet';
+      for (const piece of hit.snippet) {
+        const part = document.createElement(piece.match ? 'mark' : 'span');
+        part.textContent = piece.text;
+        snippet.appendChild(part);
+      }
+      item.append(path, facts, snippet);
+      list.appendChild(item);
+    }
+    if (!result.hits.length) list.textContent = 'Nothing found.';
+  });
+}
+
 async function refresh() {
   await loadFolders();
   await loadStatus();
@@ -320,6 +356,7 @@ function wire() {
   });
   $('resume').addEventListener('click', () => act('Resume', async () => { await api('POST', '/api/resume'); await loadStatus(); }));
   $('explain-form').addEventListener('submit', (event) => { event.preventDefault(); explain($('explain-path').value.trim()); });
+  $('search-form').addEventListener('submit', (event) => { event.preventDefault(); search(); });
   act('Load', refresh);
   setInterval(() => refresh().catch((error) => show('Refresh failed: ' + error.message, 'error', error.log)), POLL_MS);
 }

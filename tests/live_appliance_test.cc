@@ -1,0 +1,174 @@
+// The live appliance end to end: the notification stand-in watches what the library registers,
+// the daemon stand-in indexes what the queues report, and a search finds it. Every wait is for the
+// event itself; what must not happen is shown by a later change that did.
+#include "testkit.h"
+
+#include <httplib.h>
+
+#include <algorithm>
+#include <regex>
+
+namespace {
+
+class LiveApplianceTest : public testkit::IndexFixture {
+protected:
+    void SetUp() override {
+        IndexFixture::SetUp();
+        daemon_.reset();
+        notifierLog_ = Path("/notifier.log");
+        daemonLog_ = Path("/daemon.log");
+        notifier_ = testkit::Start({QIRANOTIFYD_SIM}, notifierLog_);
+        indexer_ = testkit::Start({FILEINDEXD_REF, "--interval", "20"}, daemonLog_);
+        ASSERT_TRUE(testkit::WaitFor([&] { return Logged(notifierLog_, "ready") && Logged(daemonLog_, "listening on"); }));
+    }
+    void TearDown() override {
+        EXPECT_EQ(testkit::Stop(notifier_), 0) << testkit::ReadFile(notifierLog_);
+        EXPECT_EQ(testkit::Stop(indexer_), 0) << testkit::ReadFile(daemonLog_);
+        IndexFixture::TearDown();
+    }
+    static bool Logged(const std::string& log, const std::string& text) {
+        return testkit::ReadFile(log).find(text) != std::string::npos;
+    }
+    // Adds the folder with the given switches and waits until the notifier watches it.
+    void Index(const std::string& path, const std::string& flags) {
+        ASSERT_TRUE(IndexMgr::Upsert(J(R"([{"path": ")" + path + R"(", )" + flags + "}]")));
+        std::string fullPath;
+        ASSERT_TRUE(GetFullPath(fullPath, path));
+        ASSERT_TRUE(testkit::WaitFor([&] { return Logged(notifierLog_, "watching " + fullPath + " ("); }));
+    }
+    std::vector<std::string> Search(const std::vector<std::string>& extra) {
+        std::vector<std::string> args = {FILEINDEXCTL, "--json", "search"};
+        args.insert(args.end(), extra.begin(), extra.end());
+        const Json::Value answer = testkit::ParseJson(testkit::Run(args).out);
+        std::vector<std::string> paths;
+        for (const auto& hit : answer["result"]["hits"]) paths.push_back(hit["path"].asString());
+        return paths;
+    }
+    // Waits until the search finds exactly `paths`, in any order.
+    bool Finds(const std::string& query, std::vector<std::string> paths) {
+        std::sort(paths.begin(), paths.end());
+        return testkit::WaitFor([&] {
+            std::vector<std::string> found = Search({query, "--limit", "100"});
+            std::sort(found.begin(), found.end());
+            return found == paths;
+        });
+    }
+
+    std::string notifierLog_;
+    std::string daemonLog_;
+    pid_t notifier_ = -1;
+    pid_t indexer_ = -1;
+};
+
+using Paths = std::vector<std::string>;
+
+TEST_F(LiveApplianceTest, AFileIsFoundUnderItsNameOnlyWhileItIsThere) {
+    Index("/music/a", R"("document": true)");
+    testkit::WriteFile(music_ + "/a/notes.txt", "the needle in the haystack");
+    EXPECT_TRUE(Finds("needle", Paths{"/music/a/notes.txt"}));
+    ASSERT_EQ(rename((music_ + "/a/notes.txt").c_str(), (music_ + "/a/moved.txt").c_str()), 0);
+    EXPECT_TRUE(Finds("needle", Paths{"/music/a/moved.txt"}));
+    EXPECT_TRUE(Finds("moved", Paths{"/music/a/moved.txt"}));
+    ASSERT_EQ(unlink((music_ + "/a/moved.txt").c_str()), 0);
+    EXPECT_TRUE(Finds("needle", Paths{}));
+}
+
+TEST_F(LiveApplianceTest, ADirectoryCreatedAndFilledLaterIsIndexedAndMovesWithItsTree) {
+    Index("/music/a", R"("document": true)");
+    MakeDir(music_ + "/a/new/deeper");
+    testkit::WriteFile(music_ + "/a/new/deeper/deep.md", "written after the registration");
+    EXPECT_TRUE(Finds("registration", Paths{"/music/a/new/deeper/deep.md"}));
+    ASSERT_EQ(rename((music_ + "/a/new").c_str(), (music_ + "/a/old").c_str()), 0);
+    EXPECT_TRUE(Finds("registration", Paths{"/music/a/old/deeper/deep.md"}));
+    testkit::WriteFile(music_ + "/a/old/deeper/later.txt", "registration again");  // the moved tree is still watched
+    EXPECT_TRUE(Finds("registration", (Paths{"/music/a/old/deeper/deep.md", "/music/a/old/deeper/later.txt"})));
+}
+
+// Files under "@eaDir", outside indexed folders, and of a kind the folder does not index never
+// reach the index: a later file that did shows that their changes were seen and passed over.
+TEST_F(LiveApplianceTest, EaDirOutsideFoldersAndSwitchedOffKindsStayOut) {
+    Index("/music/a", R"("document": true, "audio": false)");
+    MakeDir(music_ + "/a/@eaDir/inner");
+    testkit::WriteFile(music_ + "/a/@eaDir/inner/hidden.txt", "secret");
+    testkit::WriteFile(music_ + "/b/outside.txt", "secret");
+    testkit::WriteFile(music_ + "/a/secret.mp3", "");
+    testkit::WriteFile(music_ + "/a/sentinel.txt", "secret");
+    EXPECT_TRUE(Finds("secret", Paths{"/music/a/sentinel.txt"}));
+    ASSERT_TRUE(IndexMgr::Upsert(J(R"([{"path": "/music/a", "audio": true}])")));  // the switch turned on
+    EXPECT_TRUE(Finds("secret", (Paths{"/music/a/secret.mp3", "/music/a/sentinel.txt"})));
+}
+
+TEST_F(LiveApplianceTest, ADeletedFolderIsNoLongerWatchedNorInTheIndex) {
+    Index("/music/a", R"("document": true)");
+    Index("/music/b", R"("document": true)");
+    testkit::WriteFile(music_ + "/a/before.txt", "word");
+    EXPECT_TRUE(Finds("word", Paths{"/music/a/before.txt"}));
+    ASSERT_TRUE(IndexMgr::Delete(J(R"(["/music/a"])")));
+    ASSERT_TRUE(testkit::WaitFor([&] { return Logged(notifierLog_, "no longer watching " + music_ + "/a\n"); }));
+    EXPECT_TRUE(Finds("word", Paths{}));
+    testkit::WriteFile(music_ + "/a/after.txt", "word");
+    testkit::WriteFile(music_ + "/b/sentinel.txt", "word");
+    EXPECT_TRUE(Finds("word", Paths{"/music/b/sentinel.txt"}));
+}
+
+// Changes the kernel dropped are recovered by reindex records for every registered folder.
+TEST_F(LiveApplianceTest, AnOverflowLeadsToReindexRecordsAndACompleteIndexAgain) {
+    Index("/music/a", R"("document": true)");
+    ASSERT_EQ(kill(notifier_, SIGSTOP), 0);
+    int status = 0;
+    ASSERT_EQ(waitpid(notifier_, &status, WUNTRACED), notifier_);
+    Paths expected;
+    for (int i = 0; i < 20; ++i) {
+        const std::string name = "/a/lost" + std::to_string(100 + i) + ".txt";
+        testkit::WriteFile(music_ + name, "overflowed");
+        expected.push_back("/music" + name);
+    }
+    ASSERT_EQ(kill(notifier_, SIGUSR1), 0);  // throws the pending events away when it runs again
+    ASSERT_EQ(kill(notifier_, SIGCONT), 0);
+    ASSERT_TRUE(testkit::WaitFor([&] { return Logged(notifierLog_, "queued a reindex of " + music_ + "/a"); }));
+    EXPECT_TRUE(Logged(notifierLog_, "raise fs.inotify.max_queued_events"));
+    EXPECT_TRUE(Finds("overflowed", expected));
+}
+
+// Words are prefixes, accents and case do not matter, a name ranks above a text, and a search
+// can keep to one type or one share; the console's API answers the same.
+TEST_F(LiveApplianceTest, SearchFindsPrefixesWithoutAccentsBestFirst) {
+    testkit::WriteFile(music_ + "/a/Crète.txt", "holidays");
+    testkit::WriteFile(music_ + "/a/journal.txt", "a week in crete");
+    testkit::WriteFile(music_ + "/a/crete.mp3", "");
+    testkit::WriteFile(photo_ + "/a/crete.jpg", "");
+    Index("/music/a", R"("document": true, "audio": true)");
+    Index("/photo/a", R"("photo": true)");
+    ASSERT_TRUE(testkit::WaitFor([&] { return Search({"CRE"}).size() == 4; }));
+    Paths all = Search({"CRE"});
+    EXPECT_EQ(all.back(), "/music/a/journal.txt");  // a match in the text ranks below those in names
+    std::sort(all.begin(), all.end());
+    EXPECT_EQ(all, (Paths{"/music/a/Crète.txt", "/music/a/crete.mp3", "/music/a/journal.txt", "/photo/a/crete.jpg"}));
+    EXPECT_EQ(Search({"cret", "--type", "document"}), (Paths{"/music/a/Crète.txt", "/music/a/journal.txt"}));
+    EXPECT_EQ(Search({"cret", "--share", "photo"}), Paths{"/photo/a/crete.jpg"});
+    EXPECT_EQ(Search({"week", "cre"}), Paths{"/music/a/journal.txt"});
+    const auto text = testkit::Run({FILEINDEXCTL, "search", "week"});
+    EXPECT_NE(text.out.find("/music/a/journal.txt  document  15"), std::string::npos) << text.out;
+    EXPECT_NE(text.out.find("a [week] in crete\n(1 found)"), std::string::npos) << text.out;
+    EXPECT_EQ(testkit::Run({FILEINDEXCTL, "search", "\"\""}).status, 2);
+
+    const pid_t web = testkit::Start({FILEINDEX_WEB, "--listen", "127.0.0.1:0"}, Path("/web.log"));
+    std::smatch port;
+    ASSERT_TRUE(testkit::WaitFor([&] {
+        const std::string log = testkit::ReadFile(Path("/web.log"));
+        return std::regex_search(log, port, std::regex("listening on http://127.0.0.1:([0-9]+)/"));
+    }));
+    const std::string log = testkit::ReadFile(Path("/web.log"));
+    std::regex_search(log, port, std::regex("listening on http://127.0.0.1:([0-9]+)/"));
+    httplib::Client client("127.0.0.1", std::stoi(port[1]));
+    const auto found = client.Get("/api/search?q=week&type=document");
+    ASSERT_TRUE(found);
+    const Json::Value hit = testkit::ParseJson(found->body)["result"]["hits"][0];
+    EXPECT_EQ(hit["path"].asString(), "/music/a/journal.txt");
+    EXPECT_EQ(hit["snippet"], J(R"([{"text": "a ", "match": false}, {"text": "week", "match": true},
+                                    {"text": " in crete", "match": false}])"));
+    EXPECT_EQ(client.Get("/api/search?q=")->status, 400);
+    EXPECT_EQ(testkit::Stop(web), 0);
+}
+
+}  // namespace

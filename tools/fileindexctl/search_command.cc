@@ -1,0 +1,56 @@
+// search QUERY: the indexed files whose name, path or text hold the words, best first.
+#include <unistd.h>
+
+#include <algorithm>
+
+#include "commands.h"
+#include "cli.h"
+#include "search_view.h"
+
+namespace fileindexctl {
+namespace {
+
+// The snippet with its matches in brackets, or in bold on a terminal.
+std::string SnippetText(const Json::Value& snippet) {
+    const bool terminal = isatty(STDOUT_FILENO);
+    std::string text;
+    for (const auto& piece : snippet) {
+        std::string part = piece["text"].asString();
+        std::replace(part.begin(), part.end(), '\n', ' ');
+        if (!piece["match"].asBool()) text += part;
+        else text += terminal ? "\033[1m" + part + "\033[0m" : "[" + part + "]";
+    }
+    return text;
+}
+
+int Search(Context& ctx, const tools::SearchRequest& request) {
+    Json::Value out;
+    std::string error;
+    if (!tools::SearchShares(request, out, error)) return ctx.Fail("search", {"BAD_QUERY", 0, error, 400}, tools::kExitUsage);
+    Table table = {{"PATH", "TYPE", "SIZE", "MODIFIED", "MATCH"}};
+    for (const auto& hit : out["hits"]) {
+        table.push_back({hit["path"].asString(), hit["type"].asString(), std::to_string(hit["size"].asInt64()),
+                         FormatLocalTime(hit["mtime"].asInt64()), SnippetText(hit["snippet"])});
+    }
+    table.push_back({"(" + std::to_string(out["hits"].size()) + " found)"});
+    ctx.out.Emit(out, table);
+    return 0;
+}
+
+}  // namespace
+
+void AddSearchCommand(CLI::App& app, Context& ctx) {
+    auto request = std::make_shared<tools::SearchRequest>();
+    auto words = std::make_shared<std::vector<std::string>>();
+    auto* search = app.add_subcommand("search", "Find indexed files by name, path or text (each word a prefix)");
+    search->add_option("query", *words, "Words to find, e.g. holid beach")->required();
+    search->add_option("--type", request->type, "Only this type")->check(CLI::IsMember({"document", "audio", "video", "photo"}));
+    search->add_option("--share", request->share, "Only this share")->check(ShareName);
+    search->add_option("--limit", request->limit, "Hits at most")->check(CLI::Range(1, 1000));
+    search->callback([&ctx, request, words] {
+        for (const auto& word : *words) request->query += (request->query.empty() ? "" : " ") + word;
+        ctx.status = Search(ctx, *request);
+    });
+}
+
+}  // namespace fileindexctl
