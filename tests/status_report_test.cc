@@ -1,6 +1,8 @@
 // Status words of the service and of one folder.
 #include "testkit.h"
 
+#include <fstream>
+
 namespace {
 
 class StatusReportTest : public testkit::IndexFixture {
@@ -97,7 +99,13 @@ TEST_F(StatusReportTest, MalformedLinesAreLoggedAndSkipped) {
     std::vector<std::string> expected;
     for (const auto& line : bad) expected.push_back("Malformed command: " + line);
     EXPECT_EQ(testkit::LogMessages(), expected);
-    EXPECT_EQ(testkit::LogLines()[0].source, "queue_status.cc");
+    EXPECT_EQ(testkit::LogLines()[0].source, "queue_readings.cc");
+    testkit::ClearLog();  // once per process: asking again logs nothing, a new malformed line is logged
+    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "processing");
+    EXPECT_TRUE(testkit::LogMessages().empty());
+    std::ofstream(QueueOf("music"), std::ios::app) << "late garbage\n";
+    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "processing");
+    EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"Malformed command: late garbage"});
 }
 
 TEST_F(StatusReportTest, UnknownShareOrQueuePathFailsTheServiceWord) {

@@ -47,8 +47,11 @@ public:
     // read.
     static bool GetStatus(std::string& status);
     // "finished", "processing", "paused" (also: the folder cannot be indexed) or "err_no_space".
-    // Never fails: problems are logged and answer "finished". Reads the whole queue and its
-    // companion, logging each malformed line. Any queue content costs bounded memory and time,
+    // Never fails: problems are logged and answer "finished". The queue and its companion are read
+    // incrementally: the process keeps, per queue file, how far it has read and the records of the
+    // folders asked about, and a later call reads only what was appended since, so that hosts that
+    // ask every few seconds do not read the whole queue again; for the same reason a malformed line
+    // is logged once per process, when it is first read. Any queue content costs bounded memory and time,
     // since a share's users can write there: a line longer than 64 KiB is malformed and logged by
     // its offset and length, never held; a queue file that is sparse or larger than 1 GiB is not
     // read at all (logged, its share marked need-reindex) and counts as pending.

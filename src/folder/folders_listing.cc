@@ -1,9 +1,13 @@
 // The sorted, paged folder listing of the management interface.
 #include <algorithm>
 #include <functional>
+#include <map>
 
 #include "fileindex/folders.h"
-#include "queue_status.h"
+#include "fileindex/fileidx.h"
+#include "fileindex/utils.h"
+#include "path_rules.h"
+#include "queue_readings.h"
 #include "qira/qlib_core.h"
 
 namespace QIRA {
@@ -31,6 +35,24 @@ Comparator ChooseComparator(const std::string& sortBy) {
     };
 }
 
+// Announces the page's folders to the readings of their shares' queues.
+void ExpectPageFolders(const std::vector<Folder>& page) {
+    std::map<std::string, std::vector<std::string>> byShare;
+    for (const auto& folder : page) {
+        std::string share;
+        std::string fullPath;
+        if (GetShareNameByPath(share, folder.path) && detail::ShareFullPath(share, folder.path, fullPath)) {
+            byShare[share].push_back(fullPath + "/");
+        }
+    }
+    for (const auto& [share, prefixes] : byShare) {
+        char queue[4096];
+        if (FILEIDXQueuePathGet(share.c_str(), queue, sizeof queue) < 0) continue;
+        detail::ExpectFolders(queue, prefixes);
+        detail::ExpectFolders(std::string(queue) + ".tmp", prefixes);
+    }
+}
+
 }  // namespace
 
 bool Folders::List(Json::Value& out, unsigned long offset, unsigned long limit, const std::string& sort_by,
@@ -51,7 +73,7 @@ bool Folders::List(Json::Value& out, unsigned long offset, unsigned long limit, 
     std::vector<Folder> onPage(first, first + static_cast<long>(count));
     if (descending) std::reverse(onPage.begin(), onPage.end());
     // The statuses of the page come from one reading of each queue file.
-    detail::FolderStatusBatch batch(onPage);
+    ExpectPageFolders(onPage);
     Json::Value page(Json::arrayValue);
     for (const auto& folder : onPage) page.append(folder.asJson(additional));
     out["folder"] = page;

@@ -18,8 +18,8 @@ struct LineCount {
 LineCount CountLines(const std::string& file);
 
 // Per folder prefix ("<full path>/"), the well-formed records of the file whose path (or old
-// path, for event 256) lies in it. Malformed lines are skipped without a log line. A file refused
-// for reading counts nothing and sets `*refused`.
+// path, for event 256) lies in it. A file refused for reading counts nothing and sets `*refused`.
+// Both read incrementally (queue_readings.h).
 std::map<std::string, unsigned long long> CountRecordsUnder(const std::string& file,
                                                             const std::vector<std::string>& prefixes,
                                                             bool* refused = nullptr);

@@ -20,12 +20,6 @@ namespace FILEINDEX {
 namespace detail {
 namespace {
 
-const char* RefusalOf(const struct stat& st) {
-    if (st.st_size >= kSparseFloor && static_cast<off_t>(st.st_blocks) * 512 < st.st_size / 8) return "sparse";
-    if (st.st_size > kMaxQueueFileSize) return "oversized";
-    return nullptr;
-}
-
 // The share whose directory holds the queue file, as the platform finds it; "" when none does.
 std::string ShareOfQueue(const std::string& queueFile) {
     std::vector<char> name(QIRA_SHARE_NAME_LEN, '\0');
@@ -40,18 +34,28 @@ std::string ShareOfQueue(const std::string& queueFile) {
 
 }  // namespace
 
-QueueOpen OpenQueueForReading(const std::string& queueFile, int& fd) {
-    fd = OpenNoFollow(queueFile, O_RDONLY);
-    if (fd < 0) return QueueOpen::Failed;
-    struct stat st;
-    const char* refusal = fstat(fd, &st) == 0 ? RefusalOf(st) : nullptr;
-    if (refusal == nullptr) return QueueOpen::Opened;
-    close(fd);
-    fd = -1;
+const char* QueueRefusal(const struct stat& st) {
+    if (st.st_size >= kSparseFloor && static_cast<off_t>(st.st_blocks) * 512 < st.st_size / 8) return "sparse";
+    if (st.st_size > kMaxQueueFileSize) return "oversized";
+    return nullptr;
+}
+
+void ReportRefusedQueue(const std::string& queueFile, const struct stat& st, const char* refusal) {
     FILEIDX_LOG("Queue not read, queue=%s, reason=%s, size=%lld, allocated=%lld", queueFile.c_str(), refusal,
                 static_cast<long long>(st.st_size), static_cast<long long>(st.st_blocks) * 512);
     const std::string share = ShareOfQueue(queueFile);
     if (!share.empty() && !StatusMgr::ShareIsNeedReindex(share)) MarkShareForReindex(share);
+}
+
+QueueOpen OpenQueueForReading(const std::string& queueFile, int& fd) {
+    fd = OpenNoFollow(queueFile, O_RDONLY);
+    if (fd < 0) return QueueOpen::Failed;
+    struct stat st;
+    const char* refusal = fstat(fd, &st) == 0 ? QueueRefusal(st) : nullptr;
+    if (refusal == nullptr) return QueueOpen::Opened;
+    close(fd);
+    fd = -1;
+    ReportRefusedQueue(queueFile, st, refusal);
     return QueueOpen::Refused;
 }
 

@@ -6,6 +6,7 @@
 // takes a queue long before it holds a gigabyte.
 #pragma once
 
+#include <sys/stat.h>
 #include <sys/types.h>
 
 #include <functional>
@@ -28,6 +29,12 @@ constexpr off_t kMaxQueueFileSize = off_t{1} << 30;
 constexpr off_t kSparseFloor = off_t{1} << 20;
 
 enum class QueueOpen { Opened, Refused, Failed };
+
+// "sparse" or "oversized" for a queue file that is not read line by line, else null.
+const char* QueueRefusal(const struct stat& st);
+// One log line naming the file and the reason, and the share holding it marked need-reindex
+// (unless it is marked already).
+void ReportRefusedQueue(const std::string& queueFile, const struct stat& st, const char* refusal);
 
 // Opens a queue file or its companion for reading, without following links or blocking. Opened:
 // `fd` is the caller's. Refused: the file is sparse or larger than kMaxQueueFileSize; it is not

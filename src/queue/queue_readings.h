@@ -1,0 +1,55 @@
+// What a queue file holds for the folders asked about, read incrementally: a host that asks again
+// and again (the console, progress --watch, the daemon) pays only for the bytes appended since.
+//
+// The process keeps, per queue file (device and inode, the file held open so that its inode is
+// not reused), the offset read to, the lines before it, and for each folder asked about the
+// records that concern it. A later question reads on from that offset. A file that shrank, or
+// whose bytes before the offset changed (its first 4 KiB and 64 bytes each from the middle and
+// the end of what was read are compared), is read again from the start; so is every file when a
+// folder is first asked about, to count its records. The state per
+// file is bounded by the folders asked about (at most kMaxFoldersPerQueue), never by its records,
+// and at most kMaxQueuesRead files are held. Safe when several threads ask.
+//
+// Malformed lines are logged once per process, when first read; a last line without "\n" is
+// counted but not kept, since a writer may be completing it.
+#pragma once
+
+#include <sys/types.h>
+
+#include <cstddef>
+#include <map>
+#include <string>
+#include <vector>
+
+namespace QIRA {
+namespace FILEINDEX {
+namespace detail {
+
+constexpr size_t kMaxFoldersPerQueue = 4096;
+constexpr size_t kMaxQueuesRead = 256;
+
+struct QueueAnswer {
+    bool refused = false;          // sparse or oversized: not read (logged once, share marked)
+    unsigned long long lines = 0;  // every line, a last one without "\n" included
+    // Per folder prefix asked ("<full path>/"): the well-formed records whose path (or old path,
+    // for event 256) is the folder or lies beneath it, each record counted once.
+    std::map<std::string, unsigned long long> under;
+};
+
+// Answers for `queueFile` and `prefixes` ("<full path>/" each). False, with errno set, when the
+// file cannot be opened as a regular file without following a link.
+bool ReadQueue(const std::string& queueFile, const std::vector<std::string>& prefixes, QueueAnswer& answer);
+
+// Announces folders that will be asked about soon, so that the next reading of the file counts
+// them all in one pass (the listing announces its page).
+void ExpectFolders(const std::string& queueFile, const std::vector<std::string>& prefixes);
+
+// Forgets every reading (and closes the files held): for tests and benchmarks.
+void ForgetQueueReadings();
+
+// Bytes the readings hold, roughly: for benchmarks.
+size_t QueueReadingsFootprint();
+
+}  // namespace detail
+}  // namespace FILEINDEX
+}  // namespace QIRA

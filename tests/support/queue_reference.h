@@ -1,0 +1,54 @@
+// The plain reading of a queue file that the incremental readings must always agree with: the
+// whole file, every line, every folder, from scratch.
+#pragma once
+
+#include <sys/stat.h>
+
+#include <fstream>
+#include <iterator>
+#include <string>
+#include <vector>
+
+#include "path_rules.h"
+#include "queue_file.h"
+#include "queue_readings.h"
+#include "queue_record.h"
+
+namespace testkit {
+
+// False when the file is not a regular file.
+inline bool FullReading(const std::string& file, const std::vector<std::string>& prefixes,
+                        QIRA::FILEINDEX::detail::QueueAnswer& answer) {
+    using namespace QIRA::FILEINDEX::detail;
+    answer = QueueAnswer();
+    for (const auto& prefix : prefixes) answer.under[prefix] = 0;
+    struct stat st;
+    if (lstat(file.c_str(), &st) != 0 || !S_ISREG(st.st_mode)) return false;
+    if (QueueRefusal(st) != nullptr) {
+        answer.refused = true;
+        return true;
+    }
+    std::ifstream in(file, std::ios::binary);
+    const std::string content((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+    size_t begin = 0;
+    while (begin < content.size()) {
+        size_t end = content.find('\n', begin);
+        if (end == std::string::npos) end = content.size();
+        ++answer.lines;
+        QueueRecord record;
+        if (end - begin <= kMaxQueueLine && ReadQueueRecordStrict(content.data() + begin, content.data() + end, record)) {
+            for (auto& [prefix, count] : answer.under) {
+                if (prefix.empty()) continue;
+                const std::string folder = prefix.substr(0, prefix.size() - 1);
+                if (IsWithin(record.path, folder) ||
+                    (record.event == kEventRename && !record.path_old.empty() && IsWithin(record.path_old, folder))) {
+                    ++count;
+                }
+            }
+        }
+        begin = end + 1;
+    }
+    return true;
+}
+
+}  // namespace testkit
