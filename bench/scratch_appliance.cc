@@ -9,7 +9,6 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <cstdarg>
 #include <cstdio>
 #include <chrono>
 #include <cstdlib>
@@ -17,6 +16,7 @@
 #include <fstream>
 
 #include "fileindex/json.h"
+#include "queue_mix.h"
 #include "qira_sim/appliance.h"
 
 namespace bench {
@@ -29,9 +29,16 @@ double Scale() {
 
 size_t Scaled(size_t count) { return std::max<size_t>(1, static_cast<size_t>(static_cast<double>(count) * Scale())); }
 
-ScratchAppliance::ScratchAppliance() {
+namespace {
+
+std::string ScratchRoot() {
     char tmpl[] = "/tmp/fileindex-bench-XXXXXX";
-    root_ = mkdtemp(tmpl);
+    return mkdtemp(tmpl);
+}
+
+}  // namespace
+
+ScratchAppliance::ScratchAppliance() : root_(ScratchRoot()), log_(root_ + "/log.sock") {
     setenv("QIRA_ROOT", root_.c_str(), 1);
     qira_sim::InitAppliance(root_);
     mkdir((root_ + "/volume1").c_str(), 0755);
@@ -94,22 +101,29 @@ std::string ScratchAppliance::QueueOf(const std::string& share) const {
     return root_ + "/volume1/" + share + "/@eaDir/QIRA@file_index_queue";
 }
 
-size_t ScratchAppliance::WriteQueue(const std::string& share, size_t bytes, size_t malformedEvery) {
+size_t ScratchAppliance::WriteQueue(const std::string& share, size_t bytes) {
     std::ofstream out(QueueOf(share), std::ios::trunc);
-    const std::string dir = root_ + "/volume1/" + share + "/busy/file";
-    size_t written = 0;
-    for (size_t i = 0; written < bytes; ++i) {
-        std::string line;
-        if (malformedEvery != 0 && i % malformedEvery == malformedEvery - 1) {
-            line = "{\"event\":131072,\"path\":\"" + dir + std::to_string(i) + "\"\n";  // cut short
-        } else {
-            line = "{\"data\":{\"audio\":true,\"document\":false},\"event\":131072,\"path\":\"" + dir +
-                   std::to_string(i) + "\"}\n";
-        }
+    const std::string dir = root_ + "/volume1/" + share + "/busy";
+    size_t written = 0, lines = 0;
+    for (; written < bytes; ++lines) {
+        const std::string line = MixedQueueLine(dir, lines);
         out << line;
         written += line.size();
     }
+    queueLines_[share] = lines;
     return written;
+}
+
+void ScratchAppliance::AppendToQueue(const std::string& share, size_t count) {
+    std::ofstream out(QueueOf(share), std::ios::app);
+    const std::string dir = root_ + "/volume1/" + share + "/busy";
+    size_t& lines = queueLines_[share];
+    for (const size_t end = lines + count; lines < end; ++lines) out << MixedQueueLine(dir, lines);
+}
+
+size_t ScratchAppliance::queueLines(const std::string& share) const {
+    const auto found = queueLines_.find(share);
+    return found == queueLines_.end() ? 0 : found->second;
 }
 
 namespace {
@@ -194,14 +208,3 @@ size_t CountLinesPlain(const std::vector<std::string>& files) {
 }
 
 }  // namespace bench
-
-// The library's log lines are formatted and dropped here: a benchmark measures the library, not
-// the host's system log (which, with no syslog daemon, costs a failed connect per line).
-extern "C" void syslog(int, const char* format, ...) {
-    char buffer[8192];
-    va_list args;
-    va_start(args, format);
-    vsnprintf(buffer, sizeof buffer, format, args);
-    va_end(args);
-    benchmark::DoNotOptimize(buffer);
-}

@@ -1,14 +1,18 @@
 // A simulated appliance in a scratch directory for one benchmark, with a daemon stand-in that
-// accepts and discards every command, and helpers that time a benchmark against its baseline.
+// accepts and discards every command and a socket that receives the library's log lines, and
+// helpers that time a benchmark against its baseline.
 #pragma once
 
 #include <atomic>
 #include <functional>
+#include <map>
 #include <string>
 #include <thread>
 #include <vector>
 
 #include <benchmark/benchmark.h>
+
+#include "log_socket.h"
 
 namespace bench {
 
@@ -28,9 +32,14 @@ public:
     // Creates the directories and writes folder.conf holding these share paths.
     void WriteFolderConf(const std::vector<std::string>& paths);
     std::string QueueOf(const std::string& share) const;
-    // Fills the share's queue with about `bytes` of change records under the share's directory
-    // "busy" (every `malformedEvery`-th line malformed when not 0); returns the file size.
-    size_t WriteQueue(const std::string& share, size_t bytes, size_t malformedEvery = 0);
+    // Fills the share's queue with about `bytes` of mixed lines (queue_mix.h) under the share's
+    // directory "busy"; returns the file size. The lines written are counted in queueLines().
+    size_t WriteQueue(const std::string& share, size_t bytes);
+    // Appends `count` more such lines to the share's queue, as writers do.
+    void AppendToQueue(const std::string& share, size_t count);
+    size_t queueLines(const std::string& share) const;
+    // The library's log lines received so far.
+    size_t logLines() const { return log_.received(); }
     std::string FolderConf() const;
     const std::string& root() const { return root_; }
 
@@ -38,6 +47,8 @@ private:
     void ServeDaemon();
 
     std::string root_;
+    LogSocket log_;
+    std::map<std::string, size_t> queueLines_;
     int listener_ = -1;
     std::atomic<bool> stopping_{false};
     std::thread daemon_;

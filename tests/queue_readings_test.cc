@@ -122,4 +122,64 @@ TEST_F(QueueReadingsTest, AReadingIsKeptPerFileAndFollowsItsRename) {
     EXPECT_LT(detail::QueueReadingsFootprint(), 8192u);
 }
 
+// A long queue is read by two threads. Counting lines alone logs nothing; the first question about
+// a folder logs every malformed line once and in file order, the overlong one by its place, past
+// as many malformed lines as the second thread may hold; a later question logs only new lines.
+TEST_F(QueueReadingsTest, ALongQueueReadInTwoPartsLogsEachMalformedLineOnceInOrder) {
+    std::mt19937 random(7);
+    std::string text;
+    std::vector<std::string> expected;
+    bool overlongWritten = false;
+    const std::string padding = ",\"data\":{\"note\":\"" + std::string(300, 'n') + "\"}}";
+    while (text.size() < (size_t{17} << 20)) {
+        std::string line = Record(random);
+        line.replace(line.rfind(",\"data\""), std::string::npos, padding);
+        if (random() % 2 == 0) line = Malformed(random);
+        if (!overlongWritten && text.size() > (size_t{13} << 20)) {
+            line.assign(detail::kMaxQueueLine + 1, 'x');
+            overlongWritten = true;
+            expected.push_back("Malformed command: too long, queue=" + queue_ + ", offset=" + std::to_string(text.size()) +
+                               ", length=" + std::to_string(line.size()));
+        } else if (detail::QueueRecord record; !detail::ReadQueueRecordStrict(line.data(), line.data() + line.size(), record)) {
+            expected.push_back("Malformed command: " + line);
+        }
+        text += line + "\n";
+    }
+    testkit::WriteFile(queue_, text);
+    testkit::ClearLog();
+    const std::vector<std::string> asked = {dir_ + "/a/", dir_ + "/b/"};
+    QueueAnswer incremental, full;
+    ASSERT_TRUE(testkit::FullReading(queue_, asked, full));
+    ASSERT_TRUE(detail::ReadQueue(queue_, {}, incremental));
+    EXPECT_EQ(incremental.lines, full.lines);
+    EXPECT_TRUE(testkit::LogMessages().empty());
+    ASSERT_TRUE(detail::ReadQueue(queue_, asked, incremental));
+    EXPECT_EQ(incremental.lines, full.lines);
+    EXPECT_EQ(incremental.under, full.under);
+    ASSERT_GT(expected.size(), 2 * 16384u);
+    EXPECT_EQ(testkit::LogMessages(), expected);
+    testkit::ClearLog();
+    Append(queue_, "junk\n");
+    ASSERT_TRUE(detail::ReadQueue(queue_, asked, incremental));
+    EXPECT_EQ(incremental.lines, full.lines + 1);
+    EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"Malformed command: junk"});
+}
+
+// The folders kept per file are bounded, but never below one question's: a question about more
+// folders than the bound still gets every count.
+TEST_F(QueueReadingsTest, AQuestionAboutMoreFoldersThanKeptIsAnsweredWhole) {
+    std::string text;
+    std::vector<std::string> asked;
+    for (size_t i = 0; i < detail::kMaxFoldersPerQueue + 2; ++i) {
+        asked.push_back(dir_ + "/f" + std::to_string(i) + "/");
+        text += "{\"event\":1,\"path\":\"" + dir_ + "/f" + std::to_string(i) + "/x\"}\n";
+    }
+    testkit::WriteFile(queue_, text);
+    QueueAnswer answer;
+    ASSERT_TRUE(detail::ReadQueue(queue_, {asked.front()}, answer));
+    ASSERT_TRUE(detail::ReadQueue(queue_, asked, answer));
+    EXPECT_EQ(answer.under.size(), asked.size());
+    for (const auto& [prefix, count] : answer.under) ASSERT_EQ(count, 1u) << prefix;
+}
+
 }  // namespace

@@ -6,10 +6,15 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <chrono>
+#include <cstring>
+#include <limits>
 #include <memory>
 #include <mutex>
 #include <set>
 #include <string_view>
+#include <system_error>
+#include <thread>
 
 #include "ea_dir.h"
 #include "line_reader.h"
@@ -56,7 +61,6 @@ std::map<Key, std::shared_ptr<Reading>> g_readings;
 std::map<std::string, std::set<std::string>> g_expected;  // queue file -> folder full paths
 unsigned long long g_uses = 0;
 
-std::string FolderOf(const std::string& prefix) { return prefix.empty() ? prefix : prefix.substr(0, prefix.size() - 1); }
 
 bool Removed(const Reading& reading) {
     struct stat st;
@@ -72,12 +76,21 @@ std::set<std::string> TakeExpected(const std::string& queueFile) {
     return expected;
 }
 
-// The reading of the file open as `fd`, made when the file is new to the process; takes `fd` over.
-std::shared_ptr<Reading> ReadingOf(int fd, const struct stat& st) {
-    std::lock_guard<std::mutex> lock(g_mutex);
+// Closes the files that were removed, so that their space is freed: at most once a second.
+void DropRemovedFiles() {
+    static std::chrono::steady_clock::time_point last;
+    const auto now = std::chrono::steady_clock::now();
+    if (now - last < std::chrono::seconds(1)) return;
+    last = now;
     for (auto it = g_readings.begin(); it != g_readings.end();) {
         it = Removed(*it->second) ? g_readings.erase(it) : std::next(it);
     }
+}
+
+// The reading of the file open as `fd`, made when the file is new to the process; takes `fd` over.
+std::shared_ptr<Reading> ReadingOf(int fd, const struct stat& st) {
+    std::lock_guard<std::mutex> lock(g_mutex);
+    DropRemovedFiles();
     std::shared_ptr<Reading>& slot = g_readings[Key(st.st_dev, st.st_ino)];
     if (slot) {
         close(fd);
@@ -131,37 +144,44 @@ void ReadAgain(Reading& reading, bool rewritten) {
     }
 }
 
-// Starts counting the folders not counted yet; true when the file must be read again for them.
+std::string_view FolderOf(const std::string& prefix) { return std::string_view(prefix).substr(0, prefix.size() - 1); }
+
+// Starts counting the folders of this question not counted yet; true when the file must be read
+// again for them. Past kMaxFoldersPerQueue only this question's folders are kept.
 bool Track(Reading& reading, const std::vector<std::string>& prefixes, const std::set<std::string>& expected) {
-    std::vector<std::string> folders(expected.begin(), expected.end());
+    std::vector<std::string_view> asked(expected.begin(), expected.end());
     for (const auto& prefix : prefixes) {
-        if (!prefix.empty()) folders.push_back(FolderOf(prefix));
+        if (!prefix.empty()) asked.push_back(FolderOf(prefix));
     }
-    bool added = false;
-    for (const auto& folder : folders) {
-        if (reading.counts.count(folder) != 0) continue;
-        if (reading.counts.size() >= kMaxFoldersPerQueue) {  // bounded: start over with these folders
-            reading.counts.clear();
-            reading.lengths.clear();
-        }
+    std::vector<std::string_view> missing;
+    for (const auto folder : asked) {
+        if (reading.counts.find(folder) == reading.counts.end()) missing.push_back(folder);
+    }
+    if (missing.empty()) return false;
+    if (reading.counts.size() + missing.size() > kMaxFoldersPerQueue) {
+        reading.counts.clear();
+        reading.lengths.clear();
+        missing = asked;
+    }
+    for (const auto folder : missing) {
         reading.counts.emplace(folder, 0);
         reading.lengths.insert(folder.size());
-        added = true;
     }
-    return added && reading.committed > 0;
+    return reading.committed > 0;
 }
 
-// Calls `count` once for each counted folder that holds the record's path, or else its old path.
+// Calls `count` once for each folder of `counts` that holds the record's path, or else its old
+// path; `lengths` are those of the folders' paths.
 template <typename F>
-void ForEachFolder(Reading& reading, const QueueRecord& record, F count) {
+void ForEachFolder(const std::set<size_t>& lengths, Counts& counts, const QueueRecord& record, F count) {
     static thread_local std::vector<Counts::iterator> matched;
     matched.clear();
     const auto match = [&](const std::string& path) {
-        for (const size_t length : reading.lengths) {
+        for (const size_t length : lengths) {
             if (path.size() < length) break;
             if (path.size() > length && path[length] != '/') continue;
-            const auto folder = reading.counts.find(std::string_view(path.data(), length));
-            if (folder == reading.counts.end() || std::find(matched.begin(), matched.end(), folder) != matched.end()) continue;
+            const auto folder = counts.find(std::string_view(path.data(), length));
+            if (folder == counts.end() || std::find(matched.begin(), matched.end(), folder) != matched.end()) continue;
             matched.push_back(folder);
             count(folder);
         }
@@ -170,46 +190,155 @@ void ForEachFolder(Reading& reading, const QueueRecord& record, F count) {
     if (record.event == kEventRename && !record.path_old.empty()) match(record.path_old);
 }
 
-void LogMalformed(const std::string& queueFile, const LineReader::Line& line, off_t offset) {
-    if (line.overlong) {
+const auto kCountOne = [](Counts::iterator folder) { ++folder->second; };
+
+void LogMalformed(const std::string& queueFile, const char* text, off_t offset, size_t length) {
+    if (text == nullptr) {
         FILEIDX_LOG("Malformed command: too long, queue=%s, offset=%lld, length=%zu", queueFile.c_str(),
-                    static_cast<long long>(offset), line.length);
+                    static_cast<long long>(offset), length);
     } else {
-        FILEIDX_LOG("Malformed command: %.*s", static_cast<int>(line.length), line.begin);
+        FILEIDX_LOG("Malformed command: %.*s", static_cast<int>(length), text);
     }
 }
 
-// Reads on from the offset read to. A last line without "\n" is counted into `tail` and
-// `tailLines` for this answer only.
-void CatchUp(Reading& reading, const std::string& queueFile, Counts& tail, unsigned long long& tailLines) {
-    if (lseek(reading.fd, reading.committed, SEEK_SET) != reading.committed) return;
-    LineReader lines(reading.fd, kMaxQueueLine);
+// The same for a line found by another thread, read again from the file.
+void LogMalformedAt(int fd, const std::string& queueFile, off_t offset, size_t length) {
+    if (length > kMaxQueueLine) return LogMalformed(queueFile, nullptr, offset, length);
+    std::string text(length, '\0');
+    const ssize_t got = length == 0 ? 0 : pread(fd, &text[0], length, offset);
+    LogMalformed(queueFile, text.data(), offset, got < 0 ? 0 : static_cast<size_t>(got));
+}
+
+// Calls take(line, offset, terminated, wellFormed, record) for each line of `lines`, which begins
+// at file offset `base`, until it returns false (the line not taken); the bytes up to the last
+// "\n" taken.
+template <typename Take>
+off_t EachLine(LineReader& lines, off_t base, bool parse, Take take) {
     QueueRecordReader reader;
     QueueRecord record;
     LineReader::Line line;
     off_t terminatedBefore = 0;
     while (lines.Next(line)) {
         const bool terminated = lines.TerminatedBytes() > terminatedBefore;
+        const bool wellFormed = parse && !line.overlong && reader.Read(line.begin, line.end, record);
+        if (!take(line, base + line.offset, terminated, wellFormed, record)) break;
         terminatedBefore = lines.TerminatedBytes();
-        const off_t offset = reading.committed + line.offset;
-        const bool wellFormed = !line.overlong && reader.Read(line.begin, line.end, record);
+    }
+    return terminatedBefore;
+}
+
+// Reads on from the offset read to, up to `until`, counting lines (and, when `parse`, records
+// and malformed lines). A last line without "\n" goes to `tail` and `tailLines`, for this answer only.
+void ReadOn(Reading& reading, const std::string& queueFile, off_t until, bool parse, Counts& tail,
+            unsigned long long& tailLines) {
+    LineReader lines(reading.fd, kMaxQueueLine, reading.committed, until);
+    const auto take = [&](const LineReader::Line& line, off_t offset, bool terminated, bool wellFormed,
+                          const QueueRecord& record) {
+        const char* text = line.overlong ? nullptr : line.begin;
         if (terminated) {
             ++reading.lines;
-            if (wellFormed) ForEachFolder(reading, record, [](Counts::iterator folder) { ++folder->second; });
-            else if (offset >= reading.loggedUpTo) LogMalformed(queueFile, line, offset);
-            continue;
+            if (wellFormed) ForEachFolder(reading.lengths, reading.counts, record, kCountOne);
+            else if (parse && offset >= reading.loggedUpTo) LogMalformed(queueFile, text, offset, line.length);
+            return true;
         }
         ++tailLines;
         if (wellFormed) {
-            ForEachFolder(reading, record, [&](Counts::iterator folder) { ++tail[folder->first]; });
-        } else if (offset != reading.tailLoggedAt || line.length != reading.tailLoggedLength) {
-            LogMalformed(queueFile, line, offset);
+            ForEachFolder(reading.lengths, reading.counts, record, [&](Counts::iterator folder) { ++tail[folder->first]; });
+        } else if (parse && (offset != reading.tailLoggedAt || line.length != reading.tailLoggedLength)) {
+            LogMalformed(queueFile, text, offset, line.length);
             reading.tailLoggedAt = offset;
             reading.tailLoggedLength = line.length;
         }
+        return true;
+    };
+    reading.committed += EachLine(lines, reading.committed, parse, take);
+}
+
+// A long stretch is read by two threads: this one from the start, a helper from a line start
+// near the middle. The helper keeps what it found apart, and the malformed lines' places only
+// (at most kMaxHeldMalformed, where it stops), so that this thread logs and adds them in order.
+constexpr off_t kSplitFrom = off_t{16} << 20;
+constexpr size_t kMaxHeldMalformed = 16384;
+
+struct Part {
+    off_t begin = 0;
+    off_t end = 0;
+    off_t stoppedAt = 0;  // the first byte not taken: a line start
+    unsigned long long lines = 0;
+    Counts counts;        // the reading's folders
+    std::vector<std::pair<off_t, size_t>> malformed;  // offset and length
+};
+
+// The start of the first line after the middle of [from, size); -1 when the stretch is short or
+// no "\n" lies within a line's length of the middle.
+off_t SplitPoint(int fd, off_t from, off_t size) {
+    if (size - from < kSplitFrom || std::thread::hardware_concurrency() < 2) return -1;
+    char block[4096];
+    const off_t middle = from + (size - from) / 2;
+    for (off_t at = middle; at < size && at - middle <= static_cast<off_t>(kMaxQueueLine);) {
+        const ssize_t got = pread(fd, block, sizeof block, at);
+        if (got <= 0) return -1;
+        const void* newline = std::memchr(block, '\n', static_cast<size_t>(got));
+        if (newline != nullptr) {
+            const off_t split = at + (static_cast<const char*>(newline) - block) + 1;
+            return split < size ? split : -1;
+        }
+        at += got;
     }
-    reading.committed += lines.TerminatedBytes();
-    reading.loggedUpTo = std::max(reading.loggedUpTo, reading.committed);
+    return -1;
+}
+
+void ReadPart(const Reading& reading, Part& part) {
+    LineReader lines(reading.fd, kMaxQueueLine, part.begin, part.end);
+    const auto take = [&](const LineReader::Line& line, off_t offset, bool terminated, bool wellFormed,
+                          const QueueRecord& record) {
+        // Not taken: a last line without "\n", or a malformed line past what may be held.
+        if (!terminated || (!wellFormed && part.malformed.size() >= kMaxHeldMalformed)) return false;
+        ++part.lines;
+        if (wellFormed) ForEachFolder(reading.lengths, part.counts, record, kCountOne);
+        else part.malformed.emplace_back(offset, line.length);
+        return true;
+    };
+    part.stoppedAt = part.begin + EachLine(lines, part.begin, true, take);
+}
+
+void TakePart(Reading& reading, const std::string& queueFile, const Part& part) {
+    for (const auto& [offset, length] : part.malformed) {
+        if (offset >= reading.loggedUpTo) LogMalformedAt(reading.fd, queueFile, offset, length);
+    }
+    reading.lines += part.lines;
+    auto theirs = part.counts.begin();
+    for (auto& mine : reading.counts) mine.second += (theirs++)->second;  // the same folders, in order
+    reading.committed = part.stoppedAt;
+}
+
+// Reads what was appended since the last reading (all of the file the first time): counting lines
+// only until a folder is asked about, so that malformed lines are logged when first parsed.
+void CatchUp(Reading& reading, const std::string& queueFile, off_t size, Counts& tail, unsigned long long& tailLines) {
+    constexpr off_t kToTheEnd = std::numeric_limits<off_t>::max();
+    const bool parse = !reading.counts.empty();
+    Part part;
+    part.begin = parse ? SplitPoint(reading.fd, reading.committed, size) : -1;
+    std::thread helper;
+    if (part.begin > 0) {
+        part.end = size;
+        part.counts = reading.counts;
+        for (auto& entry : part.counts) entry.second = 0;
+        try {
+            helper = std::thread([&] { ReadPart(reading, part); });
+        } catch (const std::system_error&) {
+            part.begin = -1;
+        }
+    }
+    ReadOn(reading, queueFile, helper.joinable() ? part.begin : kToTheEnd, parse, tail, tailLines);
+    if (helper.joinable()) {
+        helper.join();
+        if (reading.committed == part.begin) {
+            TakePart(reading, queueFile, part);
+            ReadOn(reading, queueFile, kToTheEnd, parse, tail, tailLines);
+        }
+    }
+    if (parse) reading.loggedUpTo = std::max(reading.loggedUpTo, reading.committed);
     TakeSamples(reading);
 }
 
@@ -240,11 +369,11 @@ bool ReadQueue(const std::string& queueFile, const std::vector<std::string>& pre
     if (Track(*reading, prefixes, expected)) ReadAgain(*reading, false);
     Counts tail;
     unsigned long long tailLines = 0;
-    CatchUp(*reading, queueFile, tail, tailLines);
+    CatchUp(*reading, queueFile, st.st_size, tail, tailLines);
     answer.lines = reading->lines + tailLines;
     for (auto& [prefix, count] : answer.under) {
         if (prefix.empty()) continue;
-        const std::string folder = FolderOf(prefix);
+        const std::string_view folder = FolderOf(prefix);
         const auto found = reading->counts.find(folder);
         const auto inTail = tail.find(folder);
         count = (found != reading->counts.end() ? found->second : 0) + (inTail != tail.end() ? inTail->second : 0);
@@ -257,7 +386,7 @@ void ExpectFolders(const std::string& queueFile, const std::vector<std::string>&
     auto& expected = g_expected[queueFile];
     if (expected.size() + prefixes.size() > kMaxFoldersPerQueue) expected.clear();
     for (const auto& prefix : prefixes) {
-        if (!prefix.empty()) expected.insert(FolderOf(prefix));
+        if (!prefix.empty()) expected.emplace(FolderOf(prefix));
     }
 }
 

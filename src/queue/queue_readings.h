@@ -7,11 +7,14 @@
 // whose bytes before the offset changed (its first 4 KiB and 64 bytes each from the middle and
 // the end of what was read are compared), is read again from the start; so is every file when a
 // folder is first asked about, to count its records. The state per
-// file is bounded by the folders asked about (at most kMaxFoldersPerQueue), never by its records,
+// file is bounded by the folders asked about (at most kMaxFoldersPerQueue, or the folders of one
+// question when it asks about more), never by its records,
 // and at most kMaxQueuesRead files are held. Safe when several threads ask.
 //
-// Malformed lines are logged once per process, when first read; a last line without "\n" is
-// counted but not kept, since a writer may be completing it.
+// Until a folder is asked about, a file's lines are only counted (the progress report); records
+// are parsed, and malformed lines logged, once per process, when a question first needs them. A
+// last line without "\n" is counted but not kept, since a writer may be completing it. A stretch
+// of 16 MiB or more is read by two threads, the lines logged in file order all the same.
 #pragma once
 
 #include <sys/types.h>

@@ -4,14 +4,15 @@
 
 #include <ctime>
 #include <map>
+#include <utility>
 #include <vector>
 
 #include "fileindex/folders.h"
 #include "fileindex/status_mgr.h"
 #include "fileindex/utils.h"
 #include "path_rules.h"
-#include "queue_count.h"
 #include "queue_file.h"
+#include "queue_readings.h"
 
 namespace QIRA {
 namespace FILEINDEX {
@@ -24,36 +25,34 @@ Json::Value PauseOf(long long resumeTime) {
     return pause;
 }
 
-Json::Value ShareProgress(const std::string& share, const std::vector<std::string>& folderPaths) {
+// A queue file's lines and records per prefix; a file that cannot be read holds none.
+detail::QueueAnswer ReadQueueFile(const std::string& file, const std::vector<std::string>& prefixes) {
+    detail::QueueAnswer answer;
+    if (!file.empty()) detail::ReadQueue(file, prefixes, answer);
+    return answer;
+}
+
+Json::Value ShareProgress(const std::string& share, const std::vector<Folder>& folders) {
     Json::Value entry(Json::objectValue);
     entry["share"] = share;
     std::string queuePath;
     if (!detail::ShareQueuePath(share, queuePath)) queuePath.clear();
-    const detail::LineCount queueLines = queuePath.empty() ? detail::LineCount() : detail::CountLines(queuePath);
-    const detail::LineCount companionLines =
-        queuePath.empty() ? detail::LineCount() : detail::CountLines(queuePath + ".tmp");
-    const unsigned long long queue = queueLines.lines;
-    const unsigned long long companion = companionLines.lines;
+    std::vector<std::string> prefixes;  // "<full path>/", empty where a folder does not resolve
+    for (const auto& folder : folders) prefixes.push_back(folder.full_path.empty() ? "" : folder.full_path + "/");
+    detail::QueueAnswer queue = ReadQueueFile(queuePath, prefixes);
+    detail::QueueAnswer companion = ReadQueueFile(queuePath.empty() ? queuePath : queuePath + ".tmp", prefixes);
     entry["unread"] = Json::Value(Json::arrayValue);
-    if (queueLines.refused) entry["unread"].append("queue");
-    if (companionLines.refused) entry["unread"].append("companion");
-    entry["queue"] = static_cast<Json::Int64>(queue);
-    entry["companion"] = static_cast<Json::Int64>(companion);
-    entry["pending"] = static_cast<Json::Int64>(queue + companion);
-    std::vector<std::string> prefixes(folderPaths.size());
-    for (size_t i = 0; i < folderPaths.size(); ++i) {
-        std::string fullPath;
-        if (detail::ShareFullPath(share, folderPaths[i], fullPath)) prefixes[i] = fullPath + "/";
-    }
-    std::map<std::string, unsigned long long> inQueue, inCompanion;
-    if (queue > 0) inQueue = detail::CountRecordsUnder(queuePath, prefixes);
-    if (companion > 0) inCompanion = detail::CountRecordsUnder(queuePath + ".tmp", prefixes);
+    if (queue.refused) entry["unread"].append("queue");
+    if (companion.refused) entry["unread"].append("companion");
+    entry["queue"] = static_cast<Json::Int64>(queue.lines);
+    entry["companion"] = static_cast<Json::Int64>(companion.lines);
+    entry["pending"] = static_cast<Json::Int64>(queue.lines + companion.lines);
     entry["folders"] = Json::Value(Json::arrayValue);
-    for (size_t i = 0; i < folderPaths.size(); ++i) {
+    for (size_t i = 0; i < folders.size(); ++i) {
         Json::Value folder(Json::objectValue);
-        folder["path"] = folderPaths[i];
-        folder["pending"] = static_cast<Json::Int64>(prefixes[i].empty() ? 0 : inQueue[prefixes[i]] + inCompanion[prefixes[i]]);
-        entry["folders"].append(folder);
+        folder["path"] = folders[i].path;
+        folder["pending"] = static_cast<Json::Int64>(prefixes[i].empty() ? 0 : queue.under[prefixes[i]] + companion.under[prefixes[i]]);
+        entry["folders"].append(std::move(folder));
     }
     return entry;
 }
@@ -65,15 +64,15 @@ bool GetProgress(Json::Value& out) {
     std::vector<Folder> all;
     long long resumeTime = -1;
     if (!folders.Load() || !folders.List(all) || !StatusMgr::GetPauseInfo(resumeTime)) return false;
-    std::map<std::string, std::vector<std::string>> byShare;
-    for (const auto& folder : all) {
+    std::map<std::string, std::vector<Folder>> byShare;
+    for (auto& folder : all) {
         std::string share;
-        if (GetShareNameByPath(share, folder.path)) byShare[share].push_back(folder.path);
+        if (GetShareNameByPath(share, folder.path)) byShare[share].push_back(std::move(folder));
     }
     out = Json::Value(Json::objectValue);
     out["pause"] = PauseOf(resumeTime);
     out["shares"] = Json::Value(Json::arrayValue);
-    for (const auto& [share, paths] : byShare) out["shares"].append(ShareProgress(share, paths));
+    for (const auto& [share, shareFolders] : byShare) out["shares"].append(ShareProgress(share, shareFolders));
     return true;
 }
 

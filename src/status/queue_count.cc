@@ -6,15 +6,6 @@ namespace QIRA {
 namespace FILEINDEX {
 namespace detail {
 
-LineCount CountLines(const std::string& file) {
-    LineCount count;
-    QueueAnswer answer;
-    if (!ReadQueue(file, {}, answer)) return count;
-    count.refused = answer.refused;
-    count.lines = answer.lines;
-    return count;
-}
-
 std::map<std::string, unsigned long long> CountRecordsUnder(const std::string& file,
                                                             const std::vector<std::string>& prefixes, bool* refused) {
     QueueAnswer answer;

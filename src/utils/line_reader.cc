@@ -2,6 +2,7 @@
 
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 
@@ -14,6 +15,23 @@ constexpr size_t kBlock = 256 * 1024;
 
 }  // namespace
 
+ssize_t LineReader::ReadBlock(char* into) {
+    ssize_t got;
+    if (position_ < 0) {
+        do {
+            got = read(fd_, into, kBlock);
+        } while (got < 0 && errno == EINTR);
+        return got;
+    }
+    const size_t want = static_cast<size_t>(std::min<off_t>(static_cast<off_t>(kBlock), until_ - position_));
+    if (want == 0) return 0;
+    do {
+        got = pread(fd_, into, want, position_);
+    } while (got < 0 && errno == EINTR);
+    if (got > 0) position_ += got;
+    return got;
+}
+
 // Drops the bytes already returned, keeps the partial line at the front and reads one block.
 bool LineReader::Fill() {
     if (start_ > 0) {
@@ -23,10 +41,7 @@ bool LineReader::Fill() {
         start_ = 0;
     }
     if (buffer_.size() < filled_ + kBlock + kPadding) buffer_.resize(filled_ + kBlock + kPadding);
-    ssize_t got;
-    do {
-        got = read(fd_, buffer_.data() + filled_, kBlock);
-    } while (got < 0 && errno == EINTR);
+    const ssize_t got = ReadBlock(buffer_.data() + filled_);
     if (got <= 0) {
         eof_ = true;
         return false;

@@ -27,6 +27,10 @@ public:
 
     // Reads `fd` from its current offset; the descriptor stays the caller's.
     LineReader(int fd, size_t maxLine) : fd_(fd), maxLine_(maxLine) {}
+    // Reads the bytes [from, until) of `fd` with pread, leaving its offset alone, so that several
+    // readers can share one descriptor; offsets stay relative to `from`.
+    LineReader(int fd, size_t maxLine, off_t from, off_t until)
+        : fd_(fd), maxLine_(maxLine), position_(from), until_(until) {}
 
     // The next line (a last line without "\n" counts too); false at the end of the file or on a
     // read error. The bytes stay valid until the next call.
@@ -37,6 +41,7 @@ public:
 
 private:
     bool Fill();
+    ssize_t ReadBlock(char* into);
     bool Take(size_t end, bool terminated, Line& line);
     bool SkipOverlong(Line& line);
 
@@ -48,6 +53,8 @@ private:
     off_t bufferOffset_ = 0;  // file offset of buffer_[0], relative to where reading began
     off_t terminated_ = 0;
     bool eof_ = false;
+    off_t position_ = -1;  // next offset to pread in a range; -1 reads on from the descriptor's offset
+    off_t until_ = -1;
 };
 
 }  // namespace detail
