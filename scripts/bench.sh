@@ -8,3 +8,4 @@ cmake -S . -B build-bench -DCMAKE_BUILD_TYPE=Release -DFILEINDEX_BUILD_BENCH=ON 
 cmake --build build-bench -j "$(nproc)" >/dev/null
 build-bench/bench/fileindex_bench "$@"
 build-bench/bench/fileindex_live_bench "$@"
+build-bench/bench/fileindex_web_bench "$@"

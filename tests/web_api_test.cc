@@ -1,7 +1,12 @@
 // The console's JSON API over HTTP: a real fileindex-web process on a free loopback port.
 #include "testkit.h"
 
+#include <sys/stat.h>
+
+#include <atomic>
+#include <chrono>
 #include <regex>
+#include <thread>
 
 #include <httplib.h>
 
@@ -13,7 +18,7 @@ protected:
         IndexFixture::SetUp();
         testkit::WriteFile(FolderConf(), R"({"/music/a": {"name": "A"}, "/photo/a": {"name": "P"}})");
         log_ = Path("/web.log");
-        pid_ = testkit::Start({FILEINDEX_WEB, "--listen", "127.0.0.1:0"}, log_);
+        pid_ = testkit::Start({FILEINDEX_WEB, "--listen", "127.0.0.1:0", "--allow-host", "Console.Example"}, log_);
         std::smatch port;
         ASSERT_TRUE(testkit::WaitFor([&] {
             const std::string log = testkit::ReadFile(log_);
@@ -48,6 +53,28 @@ protected:
         answer.retryAfter = result->get_header_value("Retry-After");
         if (result->get_header_value("Content-Type") == "application/json") answer.body = testkit::ParseJson(result->body);
         return answer;
+    }
+    // A connected loopback socket to the console.
+    int Connect() const {
+        const int fd = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
+        sockaddr_in address{};
+        address.sin_family = AF_INET;
+        address.sin_port = htons(static_cast<uint16_t>(port_));
+        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+        EXPECT_EQ(connect(fd, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
+        return fd;
+    }
+    // The status line of the answer to a request sent as it stands.
+    std::string RawStatusLine(const std::string& request) const {
+        const int fd = Connect();
+        EXPECT_EQ(write(fd, request.data(), request.size()), static_cast<ssize_t>(request.size()));
+        std::string answer;
+        char buffer[4096];
+        for (ssize_t got; answer.find("\r\n") == std::string::npos && (got = read(fd, buffer, sizeof buffer)) > 0;) {
+            answer.append(buffer, static_cast<size_t>(got));
+        }
+        close(fd);
+        return answer.substr(0, answer.find("\r\n"));
     }
     // The envelope: the same members whatever the outcome.
     static void ExpectShape(const Answer& answer, bool ok) {
@@ -131,18 +158,114 @@ TEST_F(WebApiTest, StatusAndListingTellTheDaemonsStateAndWhyAFolderIsNotIndexabl
                                                  DaemonSocketPath() + " (No such file or directory)");
 }
 
-TEST_F(WebApiTest, WritesNeedTheTokenTheSameOriginAndAJsonBody) {
-    const std::string body = R"([{"path": "/music/b"}])";
-    EXPECT_EQ(Post("/api/folders", body, {{"X-Fileindex-Token", "wrong"}}).status, 403);
-    EXPECT_EQ(Post("/api/folders", body, {{"X-Fileindex-Token", token_}, {"Origin", "http://evil.example"}}).status, 403);
-    EXPECT_EQ(Post("/api/folders", body, {{"X-Fileindex-Token", token_}, {"Sec-Fetch-Site", "cross-site"}}).status, 403);
-    EXPECT_EQ(Of(client_->Post("/api/folders", {{"X-Fileindex-Token", token_}}, body, "text/plain")).status, 415);
-    EXPECT_EQ(Post("/api/folders", "[{", {{"X-Fileindex-Token", token_}}).status, 400);
-    EXPECT_EQ(Post("/api/folders", std::string(100 * 1024, ' '), {{"X-Fileindex-Token", token_}}).status, 413);
-    EXPECT_FALSE(Conf().isMember("/music/b"));
+// Every write route holds each check on both sides of its boundary: the token (absent, empty, a
+// prefix, one character more or changed, in the query string), the origin (foreign, one that
+// merely begins with the console's, "null") and the body (JSON only, at most 64 KiB).
+TEST_F(WebApiTest, EveryWriteRouteNeedsTheTokenTheSameOriginAndAJsonBody) {
     const std::string origin = "http://127.0.0.1:" + std::to_string(port_);
-    EXPECT_EQ(Post("/api/folders", body, {{"X-Fileindex-Token", token_}, {"Origin", origin}}).status, 200);
-    EXPECT_TRUE(Conf().isMember("/music/b"));
+    std::string changed = token_;
+    changed.back() = changed.back() == 'a' ? 'b' : 'a';
+    struct Case {
+        std::string name;
+        httplib::Headers headers;
+        std::string query, contentType, body;
+        int status;
+    };
+    const std::string pause = R"({"hours": 2})";
+    const std::vector<Case> cases = {
+        {"no token", {}, "", "application/json", pause, 403},
+        {"empty token", {{"X-Fileindex-Token", ""}}, "", "application/json", pause, 403},
+        {"a prefix", {{"X-Fileindex-Token", token_.substr(0, token_.size() - 1)}}, "", "application/json", pause, 403},
+        {"one more", {{"X-Fileindex-Token", token_ + "0"}}, "", "application/json", pause, 403},
+        {"changed", {{"X-Fileindex-Token", changed}}, "", "application/json", pause, 403},
+        {"in the query", {}, "?token=" + token_, "application/json", pause, 403},
+        {"foreign origin", {{"X-Fileindex-Token", token_}, {"Origin", "http://evil.example"}}, "", "application/json", pause, 403},
+        {"origin prefix", {{"X-Fileindex-Token", token_}, {"Origin", origin + ".evil.example"}}, "", "application/json", pause, 403},
+        {"null origin", {{"X-Fileindex-Token", token_}, {"Origin", "null"}}, "", "application/json", pause, 403},
+        {"cross-site fetch", {{"X-Fileindex-Token", token_}, {"Sec-Fetch-Site", "cross-site"}}, "", "application/json", pause, 403},
+        {"text/plain", {{"X-Fileindex-Token", token_}}, "", "text/plain", pause, 415},
+        {"not JSON", {{"X-Fileindex-Token", token_}}, "", "application/json", "{", 400},
+        {"over 64 KiB", {{"X-Fileindex-Token", token_}}, "", "application/json", std::string(64 * 1024 + 1, ' '), 413},
+    };
+    const std::vector<std::string> routes = {"/api/folders", "/api/folders/delete", "/api/reindex", "/api/pause",
+                                             "/api/resume", "/api/shares/revive", "/api/shares/need-reindex"};
+    const std::string folders = testkit::ReadFile(FolderConf()), status = testkit::ReadFile(StatusConf());
+    for (const auto& route : routes) {
+        for (const auto& c : cases) {
+            SCOPED_TRACE(route + ": " + c.name);
+            EXPECT_EQ(Of(client_->Post((route + c.query).c_str(), c.headers, c.body, c.contentType.c_str())).status, c.status);
+        }
+    }
+    EXPECT_EQ(testkit::ReadFile(FolderConf()), folders);
+    EXPECT_EQ(testkit::ReadFile(StatusConf()), status);
+    const httplib::Headers allowed = {{"X-Fileindex-Token", token_}, {"Origin", origin}};
+    EXPECT_EQ(Of(client_->Post("/api/pause", allowed, std::string(64 * 1024 - pause.size(), ' ') + pause, "application/json")).status,
+              200);
+    EXPECT_NE(testkit::ReadFile(StatusConf()), status);  // a body of exactly 64 KiB is taken
+}
+
+// A page elsewhere whose name points at 127.0.0.1 reads nothing: a Host that is not the console's
+// own is refused before any route, the page, the files, reads and writes alike.
+TEST_F(WebApiTest, OnlyTheConsolesOwnNamesAreAnswered) {
+    const std::string port = std::to_string(port_);
+    const std::vector<std::pair<std::string, bool>> hosts = {
+        {"127.0.0.1:" + port, true},          {"localhost:" + port, true},
+        {"LocalHost:" + port, true},          {"console.example:" + port, true},
+        {"evil.example:" + port, false},      {"evil.example", false},
+        {"127.0.0.1", false},                 {"127.0.0.1:" + std::to_string(port_ + 1), false},
+        {"127.0.0.1:" + port + "0", false},   {"console.example", false},
+        {"127.0.0.1:" + port + ".evil.example", false},
+    };
+    const std::vector<std::pair<std::string, int>> routes = {{"/", 200}, {"/app.js", 200}, {"/api/folders", 200}, {"/api/nosuch", 404}};
+    for (const auto& [host, answered] : hosts) {
+        for (const auto& [route, status] : routes) {
+            SCOPED_TRACE(host + " " + route);
+            const Answer answer = Of(client_->Get(route.c_str(), {{"Host", host}}));
+            EXPECT_EQ(answer.status, answered ? status : 421);
+            if (!answered) {
+                EXPECT_EQ(answer.body["error"]["name"].asString(), "HOST_REFUSED");
+            }
+        }
+        SCOPED_TRACE(host + " POST /api/pause");
+        const Answer write = Post("/api/pause", R"({"hours": 1})", {{"X-Fileindex-Token", token_}, {"Host", host}});
+        EXPECT_EQ(write.status, answered ? 200 : 421);
+    }
+    EXPECT_EQ(RawStatusLine("GET /api/folders HTTP/1.0\r\n\r\n"), "HTTP/1.1 421 Misdirected Request");
+}
+
+// What a reviewer expects of an admin page's answers, on every kind of answer.
+TEST_F(WebApiTest, EveryAnswerCarriesTheProtectiveHeaders) {
+    for (const auto& [route, host] : std::vector<std::pair<std::string, std::string>>{
+             {"/", ""}, {"/app.js", ""}, {"/api/status", ""}, {"/api/nosuch", ""}, {"/api/status", "evil.example"}}) {
+        SCOPED_TRACE(route + " " + host);
+        httplib::Headers headers;
+        if (!host.empty()) headers.emplace("Host", host);
+        const auto result = client_->Get(route.c_str(), headers);
+        ASSERT_TRUE(result);
+        EXPECT_EQ(result->get_header_value("Content-Security-Policy"),
+                  "default-src 'self'; script-src 'self'; style-src 'self'; object-src 'none'; base-uri 'none'; "
+                  "form-action 'self'; frame-ancestors 'none'");
+        EXPECT_EQ(result->get_header_value("X-Content-Type-Options"), "nosniff");
+        EXPECT_EQ(result->get_header_value("Referrer-Policy"), "no-referrer");
+        EXPECT_EQ(result->get_header_value("Cache-Control"), "no-store");
+    }
+    const std::string page = client_->Get("/")->body;
+    EXPECT_EQ(page.find("<script>"), std::string::npos);  // no inline script for the policy to block
+    EXPECT_EQ(page.find(" style="), std::string::npos);
+}
+
+// The token is kept where only its owner can read it, and one that others could read is refused.
+TEST_F(WebApiTest, TheTokenFileIsTheOwnersAlone) {
+    struct stat st;
+    ASSERT_EQ(stat(Path("/usr/qira/etc/fileindex/web.token").c_str(), &st), 0);
+    EXPECT_EQ(st.st_mode & 0777, 0600u);
+    for (const mode_t mode : {0640, 0604, 0620}) {
+        SCOPED_TRACE(mode);
+        ASSERT_EQ(chmod(Path("/usr/qira/etc/fileindex/web.token").c_str(), mode), 0);
+        const testkit::RunResult run = testkit::Run({FILEINDEX_WEB, "--listen", "127.0.0.1:0"});
+        EXPECT_EQ(run.status, 1);
+        EXPECT_NE(run.err.find("cannot read or make the token"), std::string::npos) << run.err;
+    }
 }
 
 TEST_F(WebApiTest, AHeldLockIsRetryableAndStaticFilesStayInTheirDirectory) {
@@ -167,23 +290,31 @@ TEST_F(WebApiTest, AHeldLockIsRetryableAndStaticFilesStayInTheirDirectory) {
     }
 }
 
-TEST_F(WebApiTest, SlowAndManyClientsDoNotBlockTheServer) {
-    std::vector<int> idle;
-    for (int i = 0; i < 20; ++i) {  // connections that never send a request
-        const int fd = socket(AF_INET, SOCK_STREAM, 0);
-        sockaddr_in address{};
-        address.sin_family = AF_INET;
-        address.sin_port = htons(static_cast<uint16_t>(port_));
-        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-        ASSERT_EQ(connect(fd, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
-        idle.push_back(fd);
+// Connections that never finish their request, more than a small pool of workers, cannot keep a
+// real request from its answer: each sends a header byte now and then, so that none of them is
+// dropped for idleness while the real request waits.
+TEST_F(WebApiTest, TricklingClientsDoNotBlockTheServer) {
+    std::vector<int> slow;
+    for (int i = 0; i < 100; ++i) {
+        slow.push_back(Connect());
+        const std::string start = "GET /api/status HTTP/1.1\r\nHost: 127.0.0.1\r\nX-Slow: ";
+        ASSERT_EQ(write(slow.back(), start.data(), start.size()), static_cast<ssize_t>(start.size()));
     }
+    std::atomic<bool> answered{false};
+    std::thread trickle([&] {
+        while (!answered) {
+            for (const int fd : slow) (void)send(fd, "a", 1, MSG_NOSIGNAL);
+            std::this_thread::sleep_for(std::chrono::milliseconds(5));
+        }
+    });
     httplib::Client client("127.0.0.1", port_);
-    client.set_read_timeout(2, 0);  // the idle connections hold no worker this one would wait for
+    client.set_read_timeout(60, 0);  // a guard against a hang only
     const auto result = client.Get("/api/status");
+    answered = true;
+    trickle.join();
     ASSERT_TRUE(result);
     EXPECT_EQ(result->status, 200);
-    for (const int fd : idle) close(fd);
+    for (const int fd : slow) close(fd);
 }
 
 }  // namespace

@@ -14,6 +14,7 @@
 #include "search_view.h"
 #include "service_view.h"
 #include "share_path_check.h"
+#include "token.h"
 
 namespace web {
 namespace {
@@ -25,26 +26,26 @@ using QIRA::FILEINDEX::StatusMgr;
 // The library keeps one error code per process: requests enter it one at a time.
 std::mutex g_library;
 
-void Send(httplib::Response& res, int status, const Json::Value& body) {
+void Send(Response& res, int status, const Json::Value& body) {
     res.status = status;
-    res.set_content(QIRA::FILEINDEX::toString(body), "application/json");
+    res.SetContent(QIRA::FILEINDEX::toString(body), "application/json");
 }
 
 // A request refused before the library is called, with the cause the console found.
-void Refuse(httplib::Response& res, const tools::Cause& cause, const std::string& message) {
+void Refuse(Response& res, const tools::Cause& cause, const std::string& message) {
     std::lock_guard<std::mutex> lock(g_library);
     tools::ClearCapturedLog();
     Send(res, cause.httpStatus, tools::FailureEnvelope(cause, message, {}, false));
 }
 
-void Refuse(httplib::Response& res, int status, const std::string& message) {
+void Refuse(Response& res, int status, const std::string& message) {
     Refuse(res, tools::Cause{"REFUSED", 0, message, status}, message);
 }
 
 // Runs one library operation and answers with the envelope: on failure its cause decides the
 // status, a held lock answers 409 with Retry-After, and files saved before the failure are named.
 // `found` is a cause the call itself may set before it fails.
-void Run(httplib::Response& res, const std::string& operation, const std::function<bool(Json::Value&)>& call,
+void Run(Response& res, const std::string& operation, const std::function<bool(Json::Value&)>& call,
          const std::optional<tools::Cause>& found = std::nullopt) {
     std::lock_guard<std::mutex> lock(g_library);
     const tools::SavedFiles before;
@@ -53,20 +54,20 @@ void Run(httplib::Response& res, const std::string& operation, const std::functi
     Json::Value result(Json::objectValue);
     if (call(result)) return Send(res, 200, tools::SuccessEnvelope(result, false));
     const tools::Cause cause = found ? *found : tools::CauseOfFailure();
-    if (cause.number == QIRA::FILEINDEX::FILEINDEX_ERR_LOCK) res.set_header("Retry-After", "1");
+    if (cause.number == QIRA::FILEINDEX::FILEINDEX_ERR_LOCK) res.SetHeader("Retry-After", "1");
     const auto saved = before.Changed();
     Send(res, cause.httpStatus, tools::FailureEnvelope(cause, tools::FailureMessage(operation, cause, saved), saved, false));
 }
 
 // Writes: the token, the same origin and a JSON body. False after answering the refusal.
-bool AcceptWrite(const httplib::Request& req, httplib::Response& res, const std::string& token, Json::Value& body) {
-    if (req.get_header_value("X-Fileindex-Token") != token) {
+bool AcceptWrite(const Request& req, Response& res, const std::string& token, Json::Value& body) {
+    if (!req.HasHeader("X-Fileindex-Token") || !TokenMatches(req.Header("X-Fileindex-Token"), token)) {
         Refuse(res, 403, "this request changes something: it needs the console's token in X-Fileindex-Token");
         return false;
     }
-    const std::string origin = req.get_header_value("Origin");
-    if ((!origin.empty() && origin != "http://" + req.get_header_value("Host")) ||
-        req.get_header_value("Sec-Fetch-Site") == "cross-site") {
+    const std::string origin = req.Header("Origin");
+    if ((!origin.empty() && origin != "http://" + req.Header("Host")) ||
+        req.Header("Sec-Fetch-Site") == "cross-site") {
         Refuse(res, 403, "a write from another origin is refused");
         return false;
     }
@@ -74,7 +75,7 @@ bool AcceptWrite(const httplib::Request& req, httplib::Response& res, const std:
         body = Json::Value(Json::objectValue);
         return true;
     }
-    if (req.get_header_value("Content-Type").rfind("application/json", 0) != 0) {
+    if (req.Header("Content-Type").rfind("application/json", 0) != 0) {
         Refuse(res, 415, "the request body must be JSON (Content-Type: application/json)");
         return false;
     }
@@ -87,20 +88,20 @@ bool AcceptWrite(const httplib::Request& req, httplib::Response& res, const std:
 
 using Write = std::function<bool(const Json::Value& body, Json::Value& result)>;
 
-void Post(httplib::Server& server, const std::string& token, const std::string& route, const std::string& operation,
+void Post(HttpServer& server, const std::string& token, const std::string& route, const std::string& operation,
           const Write& write) {
-    server.Post(route, [token, operation, write](const httplib::Request& req, httplib::Response& res) {
+    server.Post(route, [token, operation, write](const Request& req, Response& res) {
         Json::Value body;
         if (!AcceptWrite(req, res, token, body)) return;
         Run(res, operation, [&](Json::Value& result) { return write(body, result); });
     });
 }
 
-std::string Param(const httplib::Request& req, const std::string& name, const std::string& fallback = "") {
-    return req.has_param(name) ? req.get_param_value(name) : fallback;
+std::string Param(const Request& req, const std::string& name, const std::string& fallback = "") {
+    return req.HasParam(name) ? req.Param(name) : fallback;
 }
 
-unsigned long Number(const httplib::Request& req, const std::string& name, unsigned long fallback) {
+unsigned long Number(const Request& req, const std::string& name, unsigned long fallback) {
     const std::string text = Param(req, name);
     if (text.empty() || text.find_first_not_of("0123456789") != std::string::npos || text.size() > 9) return fallback;
     return std::stoul(text);
@@ -147,7 +148,7 @@ bool ServiceStatus(Json::Value& result) {
 
 // The first path of an upsert or reindex request that is no share path of a known share; false
 // after answering the refusal.
-bool AcceptPaths(httplib::Response& res, const Json::Value& paths, const std::string& operation) {
+bool AcceptPaths(Response& res, const Json::Value& paths, const std::string& operation) {
     for (const auto& path : paths) {
         tools::Cause cause;
         if (path.isString() && !tools::CheckSharePath(path.asString(), cause)) {
@@ -178,8 +179,17 @@ std::string ShareOf(const Json::Value& body) {
 
 }  // namespace
 
-void AddApiRoutes(httplib::Server& server, const std::string& token) {
-    server.Get("/api/folders", [](const httplib::Request& req, httplib::Response& res) {
+void GuardHost(HttpServer& server, std::shared_ptr<const HostCheck> check) {
+    server.SetGuard([check](const Request& req, Response& res) {
+        if (check->Allows(req.Header("Host"))) return false;
+        const std::string message = "this console answers only the names it listens on (see --allow-host)";
+        Refuse(res, tools::Cause{"HOST_REFUSED", 0, message, 421}, message);
+        return true;
+    });
+}
+
+void AddApiRoutes(HttpServer& server, const std::string& token) {
+    server.Get("/api/folders", [](const Request& req, Response& res) {
         for (const auto& name : Additional(Param(req, "additional"))) {
             if (name != "status" && name != "is_valid") {
                 return Refuse(res, 400, "unknown additional fact \"" + name.asString() + "\"; use status, is_valid");
@@ -194,10 +204,10 @@ void AddApiRoutes(httplib::Server& server, const std::string& token) {
             return true;
         });
     });
-    server.Get("/api/folder", [](const httplib::Request& req, httplib::Response& res) {
+    server.Get("/api/folder", [](const Request& req, Response& res) {
         Run(res, "get folder", [&](Json::Value& result) { return IndexMgr::Get(result, Param(req, "path")); });
     });
-    server.Get("/api/explain", [](const httplib::Request& req, httplib::Response& res) {
+    server.Get("/api/explain", [](const Request& req, Response& res) {
         std::optional<tools::Cause> unknownShare;
         Run(
             res, "explain",
@@ -209,11 +219,11 @@ void AddApiRoutes(httplib::Server& server, const std::string& token) {
             },
             unknownShare);
     });
-    server.Get("/api/progress", [](const httplib::Request&, httplib::Response& res) {
+    server.Get("/api/progress", [](const Request&, Response& res) {
         Run(res, "progress", [](Json::Value& result) { return QIRA::FILEINDEX::GetProgress(result); });
     });
-    server.Get("/api/status", [](const httplib::Request&, httplib::Response& res) { Run(res, "status", ServiceStatus); });
-    server.Get("/api/search", [](const httplib::Request& req, httplib::Response& res) {
+    server.Get("/api/status", [](const Request&, Response& res) { Run(res, "status", ServiceStatus); });
+    server.Get("/api/search", [](const Request& req, Response& res) {
         tools::SearchRequest request;
         request.query = Param(req, "q");
         request.type = Param(req, "type");
@@ -231,7 +241,7 @@ void AddApiRoutes(httplib::Server& server, const std::string& token) {
             refused);
     });
 
-    server.Post("/api/folders", [token](const httplib::Request& req, httplib::Response& res) {
+    server.Post("/api/folders", [token](const Request& req, Response& res) {
         Json::Value body;
         if (!AcceptWrite(req, res, token, body) || !AcceptPaths(res, PathsOf(body), "add or change folders")) return;
         Run(res, "add or change folders", [&](Json::Value& result) {
@@ -242,7 +252,7 @@ void AddApiRoutes(httplib::Server& server, const std::string& token) {
     });
     Post(server, token, "/api/folders/delete", "delete folders",
          [](const Json::Value& body, Json::Value&) { return IndexMgr::Delete(body); });
-    server.Post("/api/reindex", [token](const httplib::Request& req, httplib::Response& res) {
+    server.Post("/api/reindex", [token](const Request& req, Response& res) {
         Json::Value body;
         if (!AcceptWrite(req, res, token, body) || !AcceptPaths(res, body, "reindex")) return;
         Run(res, "reindex", [&](Json::Value&) { return IndexMgr::Reindex(body); });
@@ -251,7 +261,7 @@ void AddApiRoutes(httplib::Server& server, const std::string& token) {
         result["pause"] = tools::PauseState(-1);
         return StatusMgr::Resume();
     });
-    server.Post("/api/pause", [token](const httplib::Request& req, httplib::Response& res) {
+    server.Post("/api/pause", [token](const Request& req, Response& res) {
         Json::Value body;
         if (!AcceptWrite(req, res, token, body)) return;
         const int hours = PauseHours(body);
@@ -264,13 +274,13 @@ void AddApiRoutes(httplib::Server& server, const std::string& token) {
             return paused;
         });
     });
-    server.Post("/api/shares/revive", [token](const httplib::Request& req, httplib::Response& res) {
+    server.Post("/api/shares/revive", [token](const Request& req, Response& res) {
         Json::Value body;
         if (!AcceptWrite(req, res, token, body)) return;
         if (ShareOf(body).empty()) return Refuse(res, 400, "\"share\" must name a share");
         Run(res, "revive share", [&](Json::Value&) { return StatusMgr::ShareRevive(ShareOf(body)); });
     });
-    server.Post("/api/shares/need-reindex", [token](const httplib::Request& req, httplib::Response& res) {
+    server.Post("/api/shares/need-reindex", [token](const Request& req, Response& res) {
         Json::Value body;
         if (!AcceptWrite(req, res, token, body)) return;
         if (ShareOf(body).empty() || !body["need_reindex"].isBool()) {

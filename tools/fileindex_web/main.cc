@@ -1,13 +1,14 @@
 // fileindex-web: the management console, a web page and JSON API over libfileindex.
 #include <signal.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdlib>
+#include <memory>
 #include <iostream>
-#include <thread>
-
-#include <httplib.h>
+#include <vector>
 
 #include "api.h"
 #include "appliance_root.h"
@@ -19,7 +20,7 @@
 namespace {
 
 // The page's files: installed beside the binary (../share/fileindex/web), else the source tree's.
-std::string StaticDirectory(const char* argv0) {
+std::string StaticDirectory() {
     char self[4096];
     const ssize_t length = readlink("/proc/self/exe", self, sizeof self - 1);
     if (length > 0) {
@@ -28,8 +29,15 @@ std::string StaticDirectory(const char* argv0) {
         struct stat st;
         if (stat((dir + "/index.html").c_str(), &st) == 0) return dir;
     }
-    (void)argv0;
     return FILEINDEX_WEB_SOURCE_STATIC;
+}
+
+// Raises the limit of open descriptors to `count` where the hard limit allows.
+void AllowDescriptors(rlim_t count) {
+    rlimit limit{};
+    if (getrlimit(RLIMIT_NOFILE, &limit) != 0 || limit.rlim_cur >= count) return;
+    limit.rlim_cur = std::min(count, limit.rlim_max);
+    setrlimit(RLIMIT_NOFILE, &limit);
 }
 
 bool SplitListen(const std::string& listen, std::string& host, int& port) {
@@ -52,7 +60,10 @@ int main(int argc, char** argv) {
     app.set_version_flag("--version", "fileindex-web " FILEINDEX_VERSION);
     std::string listen = "127.0.0.1:8080";
     std::string root;
+    std::vector<std::string> allowedHosts;
     app.add_option("--listen", listen, "Address and port to listen on (port 0: any free port)");
+    app.add_option("--allow-host", allowedHosts,
+                   "A name the console may be reached by besides its address (repeatable), e.g. nas.local");
     app.add_option("--root", root, "Root prefix of the appliance (instead of QIRA_ROOT)")->check(CLI::ExistingDirectory);
     if (const auto ended = tools::Parse(app, argc, argv)) return *ended;
     std::string host;
@@ -72,11 +83,12 @@ int main(int argc, char** argv) {
     bool created = false;
     const std::string token = web::LoadOrCreateToken(tokenFile, created);
     if (token.empty()) {
-        std::cerr << "fileindex-web: cannot read or make the token " << tokenFile << "\n";
+        std::cerr << "fileindex-web: cannot read or make the token " << tokenFile
+                  << " (it must be a regular file of this user, mode 0600)\n";
         return 1;
     }
 
-    // SIGTERM and SIGINT stop the server from a thread of their own.
+    // SIGTERM and SIGINT stop the server; the serving threads never see them.
     sigset_t stopSignals;
     sigemptyset(&stopSignals);
     sigaddset(&stopSignals, SIGTERM);
@@ -84,38 +96,35 @@ int main(int argc, char** argv) {
     pthread_sigmask(SIG_BLOCK, &stopSignals, nullptr);
     signal(SIGPIPE, SIG_IGN);
 
-    httplib::Server server;
-    server.set_payload_max_length(64 * 1024);
-    // Enough workers that idle or slow connections cannot take them all; each waits 3 s at most.
-    server.new_task_queue = [] { return new httplib::ThreadPool(48); };
-    server.set_read_timeout(3, 0);
-    server.set_keep_alive_timeout(3);
-    server.set_write_timeout(5, 0);
-    server.set_keep_alive_max_count(20);
-    server.set_default_headers({{"X-Content-Type-Options", "nosniff"},
-                                {"Content-Security-Policy", "default-src 'self'"},
-                                {"Cache-Control", "no-store"}});
+    web::ServerLimits limits;
+    AllowDescriptors(limits.connections + 64);
+    web::HttpServer server(limits);
+    server.SetDefaultHeaders({{"X-Content-Type-Options", "nosniff"},
+                              {"Content-Security-Policy",
+                               "default-src 'self'; script-src 'self'; style-src 'self'; object-src 'none'; "
+                               "base-uri 'none'; form-action 'self'; frame-ancestors 'none'"},
+                              {"Referrer-Policy", "no-referrer"},
+                              {"X-Frame-Options", "DENY"},
+                              {"Cache-Control", "no-store"}});
     web::AddApiRoutes(server, token);
-    server.set_mount_point("/", StaticDirectory(argv[0]));
-    const int bound = port == 0 ? server.bind_to_any_port(host) : (server.bind_to_port(host, port) ? port : -1);
+    server.ServeFiles(StaticDirectory());
+    const auto hosts = std::make_shared<web::HostCheck>(host, allowedHosts);
+    web::GuardHost(server, hosts);
+    const int bound = server.Listen(host, port);
     if (bound < 0) {
         std::cerr << "fileindex-web: cannot listen on " << listen << "\n";
         return 1;
     }
+    hosts->SetPort(bound);
     if (created) {
         std::cout << "fileindex-web: made a token for writes (kept in " << tokenFile << "): " << token << "\n";
     } else {
         std::cout << "fileindex-web: the token for writes is in " << tokenFile << "\n";
     }
     std::cout << "fileindex-web: listening on http://" << host << ":" << bound << "/" << std::endl;
-    std::thread stopper([&] {
-        int signal = 0;
-        sigwait(&stopSignals, &signal);
-        server.stop();
-    });
-    server.listen_after_bind();
-    pthread_kill(stopper.native_handle(), SIGTERM);
-    stopper.join();
+    int signal = 0;
+    sigwait(&stopSignals, &signal);
+    server.Stop();
     std::cout << "fileindex-web: stopped" << std::endl;
     return 0;
 }

@@ -1,6 +1,7 @@
 #include "token.h"
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cstdio>
@@ -12,6 +13,11 @@ namespace {
 std::string ReadToken(const std::string& file) {
     const int fd = open(file.c_str(), O_RDONLY | O_NOFOLLOW | O_CLOEXEC);
     if (fd < 0) return "";
+    struct stat st;
+    if (fstat(fd, &st) != 0 || !S_ISREG(st.st_mode) || st.st_uid != geteuid() || (st.st_mode & 077) != 0) {
+        close(fd);
+        return "";
+    }
     char buffer[128];
     const ssize_t got = read(fd, buffer, sizeof buffer - 1);
     close(fd);
@@ -45,6 +51,14 @@ std::string LoadOrCreateToken(const std::string& file, bool& created) {
     close(fd);
     created = written;
     return written ? token : "";
+}
+
+bool TokenMatches(const std::string& given, const std::string& token) {
+    unsigned char difference = given.size() == token.size() ? 0 : 1;
+    for (size_t i = 0; i < token.size(); ++i) {
+        difference |= static_cast<unsigned char>(token[i] ^ (i < given.size() ? given[i] : 0));
+    }
+    return difference == 0;
 }
 
 }  // namespace web
