@@ -35,8 +35,9 @@ Comparator ChooseComparator(const std::string& sortBy) {
     };
 }
 
-// Announces the page's folders to the readings of their shares' queues.
-void ExpectPageFolders(const std::vector<Folder>& page) {
+// Reads each queue file of the page's shares once for all the page's folders, so that the status
+// of each folder is then answered from that reading without reading the file again.
+void ReadPageQueues(const std::vector<Folder>& page) {
     std::map<std::string, std::vector<std::string>> byShare;
     for (const auto& folder : page) {
         std::string share;
@@ -48,8 +49,9 @@ void ExpectPageFolders(const std::vector<Folder>& page) {
     for (const auto& [share, prefixes] : byShare) {
         char queue[4096];
         if (FILEIDXQueuePathGet(share.c_str(), queue, sizeof queue) < 0) continue;
-        detail::ExpectFolders(queue, prefixes);
-        detail::ExpectFolders(std::string(queue) + ".tmp", prefixes);
+        detail::QueueAnswer answer;
+        detail::ReadQueue(queue, prefixes, answer);
+        detail::ReadQueue(std::string(queue) + ".tmp", prefixes, answer);
     }
 }
 
@@ -72,8 +74,7 @@ bool Folders::List(Json::Value& out, unsigned long offset, unsigned long limit, 
     const auto first = all.begin() + static_cast<long>(descending || count == 0 ? 0 : offset);
     std::vector<Folder> onPage(first, first + static_cast<long>(count));
     if (descending) std::reverse(onPage.begin(), onPage.end());
-    // The statuses of the page come from one reading of each queue file.
-    ExpectPageFolders(onPage);
+    ReadPageQueues(onPage);
     Json::Value page(Json::arrayValue);
     for (const auto& folder : onPage) page.append(folder.asJson(additional));
     out["folder"] = page;

@@ -58,22 +58,12 @@ using Key = std::pair<dev_t, ino_t>;
 
 std::mutex g_mutex;
 std::map<Key, std::shared_ptr<Reading>> g_readings;
-std::map<std::string, std::set<std::string>> g_expected;  // queue file -> folder full paths
 unsigned long long g_uses = 0;
 
 
 bool Removed(const Reading& reading) {
     struct stat st;
     return fstat(reading.fd, &st) != 0 || st.st_nlink == 0;
-}
-
-std::set<std::string> TakeExpected(const std::string& queueFile) {
-    std::lock_guard<std::mutex> lock(g_mutex);
-    const auto found = g_expected.find(queueFile);
-    if (found == g_expected.end()) return {};
-    std::set<std::string> expected = std::move(found->second);
-    g_expected.erase(found);
-    return expected;
 }
 
 // Closes the files that were removed, so that their space is freed: at most once a second.
@@ -148,8 +138,8 @@ std::string_view FolderOf(const std::string& prefix) { return std::string_view(p
 
 // Starts counting the folders of this question not counted yet; true when the file must be read
 // again for them. Past kMaxFoldersPerQueue only this question's folders are kept.
-bool Track(Reading& reading, const std::vector<std::string>& prefixes, const std::set<std::string>& expected) {
-    std::vector<std::string_view> asked(expected.begin(), expected.end());
+bool Track(Reading& reading, const std::vector<std::string>& prefixes) {
+    std::vector<std::string_view> asked;
     for (const auto& prefix : prefixes) {
         if (!prefix.empty()) asked.push_back(FolderOf(prefix));
     }
@@ -347,7 +337,6 @@ void CatchUp(Reading& reading, const std::string& queueFile, off_t size, Counts&
 bool ReadQueue(const std::string& queueFile, const std::vector<std::string>& prefixes, QueueAnswer& answer) {
     answer = QueueAnswer();
     for (const auto& prefix : prefixes) answer.under[prefix] = 0;
-    const std::set<std::string> expected = TakeExpected(queueFile);
     const int fd = OpenNoFollow(queueFile, O_RDONLY);
     struct stat st;
     if (fd < 0 || fstat(fd, &st) != 0) {
@@ -366,7 +355,7 @@ bool ReadQueue(const std::string& queueFile, const std::vector<std::string>& pre
     }
     reading->refusedSize = -1;
     if (st.st_size < reading->committed || !SamplesHold(*reading)) ReadAgain(*reading, true);
-    if (Track(*reading, prefixes, expected)) ReadAgain(*reading, false);
+    if (Track(*reading, prefixes)) ReadAgain(*reading, false);
     Counts tail;
     unsigned long long tailLines = 0;
     CatchUp(*reading, queueFile, st.st_size, tail, tailLines);
@@ -381,19 +370,9 @@ bool ReadQueue(const std::string& queueFile, const std::vector<std::string>& pre
     return true;
 }
 
-void ExpectFolders(const std::string& queueFile, const std::vector<std::string>& prefixes) {
-    std::lock_guard<std::mutex> lock(g_mutex);
-    auto& expected = g_expected[queueFile];
-    if (expected.size() + prefixes.size() > kMaxFoldersPerQueue) expected.clear();
-    for (const auto& prefix : prefixes) {
-        if (!prefix.empty()) expected.emplace(FolderOf(prefix));
-    }
-}
-
 void ForgetQueueReadings() {
     std::lock_guard<std::mutex> lock(g_mutex);
     g_readings.clear();
-    g_expected.clear();
 }
 
 size_t QueueReadingsFootprint() {

@@ -43,10 +43,6 @@ struct QueueAnswer {
 // file cannot be opened as a regular file without following a link.
 bool ReadQueue(const std::string& queueFile, const std::vector<std::string>& prefixes, QueueAnswer& answer);
 
-// Announces folders that will be asked about soon, so that the next reading of the file counts
-// them all in one pass (the listing announces its page).
-void ExpectFolders(const std::string& queueFile, const std::vector<std::string>& prefixes);
-
 // Forgets every reading (and closes the files held): for tests and benchmarks.
 void ForgetQueueReadings();
 

@@ -1,4 +1,20 @@
-// Reading the records of a share's event queue file, within fixed bounds.
+// A share's event queue: what the indexing daemon has still to do for the share.
+//
+// The queue is the file "<share>/@eaDir/QIRA@file_index_queue", one JSON record per line:
+// {"event": N, "path": P, "data": {...}} and, for a move (256), "path_old". Its companion
+// "<queue>.tmp" holds what the daemon took and has not finished.
+// - Writers append whole lines, each in one write, under an exclusive flock of the queue: the
+//   library (custom_event.h: reindex 65536 and settings 131072 records, waiting about a second
+//   for the lock and else marking the share need-reindex) and the notification daemon (its
+//   change records).
+// - The daemon takes the queue under the same lock, by renaming it to the companion (or
+//   appending it there), and then reads the companion without the lock.
+// - Readers take no lock: they read whole lines only and treat a last line without "\n" as
+//   being written. The status scan and counts (queue_status.h, queue_count.h, progress) read
+//   incrementally (queue_readings.h); the pending-reindex check (pending_reindex.h) and the
+//   daemon's reader (fileindex/queue_reader.h) read from the start.
+//
+// This file: reading a queue file within fixed bounds.
 //
 // A share's users can write in the share's "@eaDir", so a queue may hold anything. Readers keep
 // to two bounds, chosen from what the writers can produce: the library and the notifier write a
