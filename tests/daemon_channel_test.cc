@@ -1,6 +1,8 @@
 // Commands to fileindexd: frames on the wire and the chunked writer.
 #include "testkit.h"
 
+#include <sys/un.h>
+
 #include "daemon_channel.h"
 
 namespace {
@@ -30,12 +32,21 @@ TEST_F(DaemonChannelTest, SocketPathLivesUnderTheRoot) {
     setenv("QIRA_ROOT", root().c_str(), 1);
 }
 
-TEST_F(DaemonChannelTest, RootTooLongForASocketAddressFailsCleanly) {
-    const std::string longRoot = root() + "/" + std::string(80, 'r');
-    MakeDir(longRoot + "/var/run");
-    setenv("QIRA_ROOT", longRoot.c_str(), 1);
-    EXPECT_FALSE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));
-    setenv("QIRA_ROOT", root().c_str(), 1);
+// A socket path of sizeof(sun_path) - 1 bytes is reached; one byte more fails cleanly.
+TEST_F(DaemonChannelTest, SocketPathsFitSunPathExactly) {
+    const size_t tail = std::string("/var/run/fileindexd.sock").size();
+    for (const size_t length : {sizeof(sockaddr_un::sun_path) - 1, sizeof(sockaddr_un::sun_path)}) {
+        SCOPED_TRACE(length);
+        const std::string longRoot = root() + "/" + std::string(length - tail - root().size() - 1, 'r');
+        MakeDir(longRoot + "/var/run");
+        setenv("QIRA_ROOT", longRoot.c_str(), 1);
+        ASSERT_EQ(DaemonSocketPath().size(), length);
+        std::unique_ptr<testkit::FakeDaemon> daemon;
+        if (length < sizeof(sockaddr_un::sun_path)) daemon = std::make_unique<testkit::FakeDaemon>(DaemonSocketPath());
+        EXPECT_EQ(SendCammandToDaemon("resume", Json::Value(Json::objectValue)), daemon != nullptr);
+        EXPECT_EQ(daemon ? daemon->Messages().size() : 1u, 1u);
+        setenv("QIRA_ROOT", root().c_str(), 1);
+    }
 }
 
 // A socket pair whose reading side records pieces as the writer produced them.

@@ -125,7 +125,8 @@ TEST_F(ListingTest, OneReadingPerQueueGivesTheWordsOfAReadingPerFolderAndLogsOnc
     }
     testkit::WriteFile(FolderConf(), toString(conf));
     testkit::WriteFile(QueueOf("music"), "junk 1\n" + record("/f1/x") + "[2]\n" + record("/f3") + "{\"event\":-1}\n");
-    testkit::WriteFile(QueueOf("music") + ".tmp", "tmp junk\n" + record("/f5/y"));
+    testkit::WriteFile(QueueOf("music") + ".tmp", "tmp junk\n" + record("/f5/y") +
+                                                      "{\"event\":256,\"path\":\"/elsewhere\",\"path_old\":\"" + music_ + "/f7/z\"}\n");
     const Json::Value out = List(0, 12, "path", "ASC", J(R"(["status", "is_valid"])"));
     EXPECT_EQ(testkit::LogMessages(), (std::vector<std::string>{"Malformed command: junk 1", "Malformed command: [2]",
                                                                 "Malformed command: {\"event\":-1}", "Malformed command: tmp junk"}));
@@ -143,6 +144,7 @@ TEST_F(ListingTest, OneReadingPerQueueGivesTheWordsOfAReadingPerFolderAndLogsOnc
     EXPECT_EQ(words["/music/f33"], "finished");
     EXPECT_EQ(words["/music/f5"], "processing");
     EXPECT_EQ(words["/music/f2"], "finished");
+    EXPECT_EQ(words["/music/f7"], "processing");  // moved out of it
 }
 
 }  // namespace

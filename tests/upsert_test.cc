@@ -1,6 +1,8 @@
 // Folder upsert end to end: folder.conf, platform calls, registrations, frames and events.
 #include "testkit.h"
 
+#include <climits>
+
 namespace {
 
 class UpsertTest : public testkit::IndexFixture {
@@ -74,6 +76,35 @@ TEST_F(UpsertTest, BadRequestsChangeNothing) {
         EXPECT_FALSE(testkit::Exists(FolderConf()));
         EXPECT_TRUE(qira_sim::Journal().empty());
         EXPECT_TRUE(Messages().empty());
+    }
+}
+
+// A folder path is taken up to the system's limits and refused one byte past them, by the upsert
+// and the reindex alike: a component of NAME_MAX bytes, a full path of PATH_MAX - 1.
+TEST_F(UpsertTest, PathsAreTakenUpToTheSystemsLimitsAndNoFurther) {
+    const auto pathOf = [](size_t length, size_t component) {
+        std::string path = "/music";
+        while (path.size() < length) path += "/" + std::string(std::min(component, length - path.size() - 1), 'c');
+        return path;
+    };
+    const size_t volume = music_.size() - std::string("/music").size();  // the full path's prefix
+    const std::vector<std::pair<std::string, bool>> cases = {
+        {pathOf(6 + 1 + NAME_MAX, NAME_MAX), true},      {pathOf(6 + 2 + NAME_MAX, NAME_MAX + 1), false},
+        {pathOf(PATH_MAX - 1 - volume, 200), true},      {pathOf(PATH_MAX - volume, 200), false},
+    };
+    for (const auto& [path, taken] : cases) {
+        SCOPED_TRACE(std::to_string(path.size()) + " bytes");
+        Settle();
+        Json::Value folders(Json::arrayValue);
+        folders.append(Json::Value(Json::objectValue))["path"] = path;
+        EXPECT_EQ(IndexMgr::Upsert(folders), taken);
+        EXPECT_EQ(Conf().isMember(path), taken);
+        Json::Value paths(Json::arrayValue);
+        paths.append(path);
+        EXPECT_EQ(IndexMgr::Reindex(paths), taken);
+        if (!taken) {
+            EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
+        }
     }
 }
 

@@ -90,6 +90,7 @@ protected:
 };
 
 TEST_F(WebApiTest, EveryRouteAnswersWithTheLibrarysResultOrFailure) {
+    const long long lastHour = (INT32_MAX - time(nullptr)) / 3600;  // a pause ends before 2038-01-19
     struct Case {
         std::string method, route, body;
         int status;
@@ -109,6 +110,11 @@ TEST_F(WebApiTest, EveryRouteAnswersWithTheLibrarysResultOrFailure) {
         {"GET", "/api/status", "", 200},
         {"POST", "/api/pause", R"({"hours": 2})", 200},
         {"POST", "/api/pause", R"({"hours": -1})", 400},
+        {"POST", "/api/pause", R"({"hours": 1.5})", 400},
+        {"POST", "/api/pause", R"({"hours": "2"})", 400},
+        {"POST", "/api/pause", R"({"hours": 0})", 200},
+        {"POST", "/api/pause", "{\"hours\": " + std::to_string(lastHour - 1) + "}", 200},
+        {"POST", "/api/pause", "{\"hours\": " + std::to_string(lastHour + 1) + "}", 400},
         {"POST", "/api/resume", "", 200},
         {"GET", "/api/explain?path=/music/a", "", 200},
         {"GET", "/api/explain?path=/nosuch/a", "", 404},
