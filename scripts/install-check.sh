@@ -19,17 +19,10 @@ cmake --build build-install -j "$(nproc)" >/dev/null
 cmake --install build-install --prefix "$prefix" >/dev/null
 export PATH="$prefix/bin:$PATH"
 
-# The commands between the quick-start markers of a document, as a script; a line marked
-# "# fails" must fail.
-quick_start() {
-  echo 'set -euo pipefail'
-  sed -n '/<!-- quick-start -->/,/<!-- \/quick-start -->/p' "$1" | grep '^    ' | sed 's/^    //' |
-    sed -E 's/^(.*)# fails(.*)$/! \1 # fails\2/'
-}
 for doc in README.md docs/simulated-appliance.md; do
   echo "install-check: quick start of $doc"
   rm -rf /tmp/appliance
-  quick_start "$doc" >"$work/quick-start.sh"
+  scripts/quick-start.sh "$doc" >"$work/quick-start.sh"
   echo 'kill $(jobs -p) 2>/dev/null || true' >>"$work/quick-start.sh"
   (cd "$work" && bash "$work/quick-start.sh") >"$work/quick-start.log" 2>&1 ||
     { cat "$work/quick-start.log"; echo "install-check: the quick start of $doc failed"; exit 1; }

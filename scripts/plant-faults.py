@@ -52,7 +52,7 @@ FAULTS = [
     ("src/queue/custom_event.cc", 'record["data"] = data;', 'record["data"] = data.isNull() ? data : Json::Value(Json::objectValue);'),
     ("src/queue/custom_event.cc", " || pending.IsQueued(path, queuePath + \".tmp\")", ""),
     ("src/queue/custom_event.cc", "ShareSetNeedReindex(shareName, true)", "ShareSetNeedReindex(shareName, false)"),
-    ("src/queue/custom_event.cc", "if (sized && wrote > 0) ftruncate", "if (sized && wrote < 0) ftruncate"),
+    ("src/queue/custom_event.cc", "if (sized && wrote > 0 && ftruncate", "if (sized && wrote < 0 && ftruncate"),
     ("src/index/notifyd_cfg.cc", "kMonitorMask = 65486", "kMonitorMask = 65535"),
     ("src/index/notifyd_cfg.cc", 'ignore.append("@eaDir");', 'ignore.append("@eadir");'),
     ("src/index/share_lifecycle.cc", "if (folders.Count() == 0) detail::StopIndexingServices();", ""),

@@ -47,7 +47,7 @@ bool WriteWholeLine(int fd, const std::string& line) {
     const ssize_t wrote = write(fd, line.data(), line.size());
     if (wrote == static_cast<ssize_t>(line.size())) return true;
     FILEIDX_DEBUG_LOG("write fail, (%ld, %ld)", static_cast<long>(wrote), static_cast<long>(line.size()));
-    if (sized && wrote > 0) ftruncate(fd, before.st_size);
+    if (sized && wrote > 0 && ftruncate(fd, before.st_size) != 0) FILEIDX_LOG("ftruncate failed, reason=%m");
     return false;
 }
 
