@@ -1,5 +1,5 @@
 #!/usr/bin/python3
-"""Plants one fault at a time in src/ of a checkout, rebuilds, runs the unit tests and reports
+"""Plants one fault at a time in src/ and tools/ of a checkout, rebuilds, runs the unit tests and reports
 which faults the suite caught. Used to check that a change to the tests loses no catches:
 run it on a clone before and after, and compare.
 
@@ -51,7 +51,7 @@ FAULTS = [
     ("src/utils/daemon_channel.cc", 'message["type"] = type;', 'message["kind"] = type;'),
     ("src/queue/custom_event.cc", 'record["data"] = data;', 'record["data"] = data.isNull() ? data : Json::Value(Json::objectValue);'),
     ("src/queue/custom_event.cc", " || pending.IsQueued(path, queuePath + \".tmp\")", ""),
-    ("src/queue/custom_event.cc", "ShareSetNeedReindex(shareName, true)", "ShareSetNeedReindex(shareName, false)"),
+    ("src/queue/queue_file.cc", "ShareSetNeedReindex(share, true)", "ShareSetNeedReindex(share, false)"),
     ("src/queue/custom_event.cc", "if (sized && wrote > 0 && ftruncate", "if (sized && wrote < 0 && ftruncate"),
     ("src/index/notifyd_cfg.cc", "kMonitorMask = 65486", "kMonitorMask = 65535"),
     ("src/index/notifyd_cfg.cc", 'ignore.append("@eaDir");', 'ignore.append("@eadir");'),
@@ -68,7 +68,7 @@ FAULTS = [
     ("src/queue/pending_reindex.cc", "if (record.event == static_cast<unsigned>(kEventReindex) && wanted_",
      "if (wanted_"),
     ("src/queue/pending_reindex.cc", "if (std::memchr(begin, '\\\\', static_cast<size_t>(end - begin)) != nullptr) return true;", ""),
-    ("src/queue/queue_status.cc", "(record.event == kEventRename && IsWithin(record.path_old, folderFullPath))", "false"),
+    ("src/queue/queue_status.cc", "return answer.refused || answer.under[prefix] > 0;", "return answer.under[prefix] > 0;"),
     ("src/queue/queue_record.cc", "case simdjson::dom::element_type::NULL_VALUE:\n            out = 0;\n            return Verdict::Record;",
      "case simdjson::dom::element_type::NULL_VALUE:\n            return Verdict::Malformed;"),
     ("src/queue/queue_record.cc", "value > static_cast<int64_t>(UINT_MAX)", "value >= static_cast<int64_t>(UINT_MAX)"),
@@ -79,6 +79,24 @@ FAULTS = [
     ("src/utils/storage_paths.cc", "if (makeLeafDir && !truncated", "if ((makeLeafDir || !makeLeafDir) && !truncated"),
     ("src/utils/ea_dir.cc", " || st.st_nlink > 1", ""),
     ("src/utils/path_rules.cc", " || (path.size() > n && path[n] != '/')", ""),
+    # Incremental queue readings.
+    ("src/queue/queue_readings.cc", "st.st_size < reading->committed ||", ""),
+    ("src/queue/queue_readings.cc", "offset >= reading.loggedUpTo) LogMalformed(", "offset > reading.loggedUpTo) LogMalformed("),
+    ("src/queue/queue_readings.cc", "part.malformed.size() >= kMaxHeldMalformed", "part.malformed.size() > kMaxHeldMalformed + 1"),
+    ("src/queue/queue_readings.cc", "if (reading.committed == part.begin) {", "if (true) {"),
+    ("src/queue/queue_readings.cc", "path[length] != '/'", "path[length] != '/' && false"),
+    ("src/queue/queue_readings.cc", "kEventRename && !record.path_old.empty()", "kEventRename && record.path_old.empty()"),
+    ("src/queue/queue_readings.cc", "        missing = asked;\n", ""),
+    ("src/queue/queue_readings.cc", "if (parse) reading.loggedUpTo", "reading.loggedUpTo"),
+    ("src/queue/progress.cc", "queue.lines + companion.lines", "queue.lines"),
+    # The console.
+    ("tools/fileindex_web/api.cc", "!req.HasHeader(\"X-Fileindex-Token\") || ", ""),
+    ("tools/fileindex_web/host_check.cc", "return port == 80 && names_.count(lower) != 0;", "return names_.count(lower) != 0;"),
+    ("tools/fileindex_web/host_check.cc", "lower.size() > suffix.size() &&", "lower.size() >= suffix.size() &&"),
+    ("tools/fileindex_web/http_server.cc", "> limits_.maxBody) pending.tooLarge", ">= limits_.maxBody) pending.tooLarge"),
+    ("tools/fileindex_web/http_server.cc", "name.empty() || name[0] == '.'", "name.empty()"),
+    ("tools/fileindex_web/token.cc", " || (st.st_mode & 077) != 0", ""),
+    ("tools/fileindex_web/token.cc", "given.size() == token.size() ? 0 : 1", "0"),
 ]
 
 

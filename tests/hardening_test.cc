@@ -1,8 +1,6 @@
 // Links planted in share directories and hostile daemons never steer the library.
 #include "testkit.h"
 
-#include <chrono>
-
 namespace {
 
 using testkit::Canary;
@@ -98,11 +96,12 @@ protected:
     }
 };
 
-TEST_F(DaemonFaultTest, DaemonThatNeverReadsStillReturnsInBoundedTime) {
+// Neither a daemon that never reads nor one that closes at once keeps the caller: RunBounded ends
+// a caller that hangs.
+TEST_F(DaemonFaultTest, DaemonThatNeverReadsDoesNotHoldTheCaller) {
     const pid_t pid = Serve([](int) { pause(); });
-    const auto start = std::chrono::steady_clock::now();
-    EXPECT_TRUE(SendCammandToDaemon("upsert_folder_setting", Big()));  // the socket buffer takes it
-    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(3));
+    const Json::Value big = Big();  // the socket buffer takes it
+    EXPECT_EQ(testkit::RunBounded(60, [&] { return SendCammandToDaemon("upsert_folder_setting", big); }), 1);
     kill(pid, SIGKILL);
     waitpid(pid, nullptr, 0);
 }
@@ -112,12 +111,10 @@ TEST_F(DaemonFaultTest, DaemonThatClosesAtOnceFailsWithoutSigpipe) {
         shutdown(client, SHUT_RDWR);
         close(client);
     });
-    const auto start = std::chrono::steady_clock::now();
     // Larger than the socket buffer, so the close is met whenever it happens.
     Json::Value huge(Json::objectValue);
     huge["folder_path"] = std::string(1 << 20, 'x');
-    EXPECT_FALSE(SendCammandToDaemon("upsert_folder_setting", huge));
-    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(3));
+    EXPECT_EQ(testkit::RunBounded(60, [&] { return SendCammandToDaemon("upsert_folder_setting", huge); }), 0);
     waitpid(pid, nullptr, 0);
 }
 
