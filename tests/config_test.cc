@@ -11,11 +11,6 @@ namespace {
 
 class ConfigTest : public testkit::Sandbox {};
 
-TEST(ErrorHandlerTest, CodesAndLogLevelKeepTheirValues) {
-    EXPECT_EQ(static_cast<int>(FILEINDEX_ERR_MALFORMED_FOLDERS), 8);
-    EXPECT_EQ(LOG_LEVEL, 3);
-}
-
 // A host's sink gets every line with its parts; beside the system log or instead of it.
 TEST_F(ConfigTest, ALogSinkReceivesEveryLineBesideOrInsteadOfTheSystemLog) {
     static std::vector<std::string> received;
@@ -89,29 +84,24 @@ TEST_F(ConfigTest, ExclusiveLockFailsWhileAnotherProcessHoldsAShareLock) {
     EXPECT_TRUE(Logged("Failed to lock folder"));
 }
 
-TEST_F(ConfigTest, LockIsFreeAgainWhenTheHolderUnlocks) {
+// Each configuration has its own lock file; two descriptors of one process conflict too; an
+// unlock without a lock does nothing and an unlocked file can be taken again.
+TEST_F(ConfigTest, LocksAreOneFilePerConfigurationAndFreeAfterUnlock) {
+    Folders never;
+    never.Unlock();
     Folders first;
     ASSERT_TRUE(first.Lock(true));
+    Status status;
+    EXPECT_TRUE(status.Lock(true));
     Folders second;
-    EXPECT_FALSE(second.Lock(true));  // two descriptors of one process conflict too
-    second.Unlock();
-    first.Unlock();
+    Status other;
+    EXPECT_FALSE(second.Lock(true));
+    EXPECT_FALSE(other.Lock(true));
+    EXPECT_EQ(testkit::LogMessages(), (std::vector<std::string>{"Failed to lock folder", "Failed to lock folder"}));
+    for (Config* held : std::vector<Config*>{&second, &other, &status, &first}) held->Unlock();
     Folders third;
     EXPECT_TRUE(third.Lock(true));
     third.Unlock();
-}
-
-TEST_F(ConfigTest, StatusLockUsesItsOwnFileAndTheSameMessage) {
-    Folders folders;
-    ASSERT_TRUE(folders.Lock(true));
-    Status status;
-    EXPECT_TRUE(status.Lock(true));
-    Status other;
-    EXPECT_FALSE(other.Lock(true));
-    EXPECT_TRUE(Logged("Failed to lock folder"));
-    other.Unlock();
-    status.Unlock();
-    folders.Unlock();
     EXPECT_TRUE(testkit::Exists(Path("/tmp/fileidx_cfg_folder.lock")));
     EXPECT_TRUE(testkit::Exists(Path("/tmp/fileidx_cfg_status.lock")));
 }
@@ -141,14 +131,6 @@ TEST_F(ConfigTest, ProgramsRunWhileALockIsHeldDoNotInheritIt) {
     const std::string fds = testkit::ReadFile(listing);
     EXPECT_NE(fds.find("fds"), std::string::npos);
     EXPECT_EQ(fds.find("fileidx_cfg_folder.lock"), std::string::npos) << fds;
-}
-
-TEST_F(ConfigTest, UnlockWithoutLockDoesNothing) {
-    Folders folders;
-    folders.Unlock();
-    Folders other;
-    EXPECT_TRUE(other.Lock(true));
-    other.Unlock();
 }
 
 TEST_F(ConfigTest, ReaderNeverSeesAPartialFileWhileAnotherProcessSaves) {
