@@ -48,8 +48,8 @@ void AddLoaded(std::map<std::string, Folder>& folders, std::map<std::string, Fol
         if (folders.count(key) != 0) continue;
         folder.path = key;
         resolver.Resolve(key, folder.full_path);
-        folders.emplace(key, std::move(folder));
     }
+    folders.merge(read);  // moves the nodes; a folder already held stays as it is
 }
 
 }  // namespace

@@ -94,7 +94,7 @@ Json::Value Pending(const std::string& share, const std::string& fullPath) {
     const std::string prefix = fullPath + "/";
     for (const auto& [role, file] : {std::pair{"queue", queuePath}, std::pair{"companion", queuePath + ".tmp"}}) {
         bool refused = false;
-        pending[role] = static_cast<Json::Int64>(detail::CountRecordsUnder(file, {prefix}, &refused)[prefix]);
+        pending[role] = static_cast<Json::Int64>(detail::CountRecordsUnder(file, prefix, &refused));
         if (refused) pending["unread"].append(role);
     }
     return pending;

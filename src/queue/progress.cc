@@ -50,8 +50,8 @@ Json::Value ShareProgress(const std::string& share, const std::vector<Folder>& f
     entry["folders"] = Json::Value(Json::arrayValue);
     for (size_t i = 0; i < folders.size(); ++i) {
         Json::Value folder(Json::objectValue);
-        folder["path"] = folders[i].path;
-        folder["pending"] = static_cast<Json::Int64>(prefixes[i].empty() ? 0 : queue.under[prefixes[i]] + companion.under[prefixes[i]]);
+        folder[Json::StaticString("path")] = folders[i].path;
+        folder[Json::StaticString("pending")] = static_cast<Json::Int64>(queue.under[i] + companion.under[i]);
         entry["folders"].append(std::move(folder));
     }
     return entry;

@@ -6,15 +6,11 @@ namespace QIRA {
 namespace FILEINDEX {
 namespace detail {
 
-std::map<std::string, unsigned long long> CountRecordsUnder(const std::string& file,
-                                                            const std::vector<std::string>& prefixes, bool* refused) {
+unsigned long long CountRecordsUnder(const std::string& file, const std::string& prefix, bool* refused) {
     QueueAnswer answer;
-    const bool read = ReadQueue(file, prefixes, answer);
+    ReadQueue(file, {prefix}, answer);
     if (refused != nullptr) *refused = answer.refused;
-    if (!read) {
-        for (const auto& prefix : prefixes) answer.under[prefix] = 0;
-    }
-    return answer.under;
+    return answer.under[0];
 }
 
 }  // namespace detail

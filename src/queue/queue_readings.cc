@@ -9,6 +9,7 @@
 #include <chrono>
 #include <cstring>
 #include <limits>
+#include <map>
 #include <memory>
 #include <mutex>
 #include <set>
@@ -47,6 +48,10 @@ struct Reading {
     unsigned long long lines = 0;
     Counts counts;
     std::set<size_t> lengths;  // of the folder paths in `counts`
+    // The last question's prefixes and each one's entry in `counts` (end() for ""): a host that
+    // asks the same again finds its counters without a look-up.
+    std::vector<std::string> asked;
+    std::vector<Counts::iterator> slots;
     std::vector<Sample> samples;
     off_t refusedSize = -1;  // the size a refusal was logged for
     off_t tailLoggedAt = -1;
@@ -136,28 +141,33 @@ void ReadAgain(Reading& reading, bool rewritten) {
 
 std::string_view FolderOf(const std::string& prefix) { return std::string_view(prefix).substr(0, prefix.size() - 1); }
 
-// Starts counting the folders of this question not counted yet; true when the file must be read
-// again for them. Past kMaxFoldersPerQueue only this question's folders are kept.
+// Starts counting the folders of this question not counted yet and points `slots` at each
+// prefix's counter; true when the file must be read again for new folders. Past
+// kMaxFoldersPerQueue only this question's folders are kept.
 bool Track(Reading& reading, const std::vector<std::string>& prefixes) {
-    std::vector<std::string_view> asked;
-    for (const auto& prefix : prefixes) {
-        if (!prefix.empty()) asked.push_back(FolderOf(prefix));
-    }
+    if (prefixes == reading.asked) return false;
     std::vector<std::string_view> missing;
-    for (const auto folder : asked) {
-        if (reading.counts.find(folder) == reading.counts.end()) missing.push_back(folder);
+    for (const auto& prefix : prefixes) {
+        if (!prefix.empty() && reading.counts.find(FolderOf(prefix)) == reading.counts.end()) missing.push_back(FolderOf(prefix));
     }
-    if (missing.empty()) return false;
     if (reading.counts.size() + missing.size() > kMaxFoldersPerQueue) {
         reading.counts.clear();
         reading.lengths.clear();
-        missing = asked;
+        missing.clear();
+        for (const auto& prefix : prefixes) {
+            if (!prefix.empty()) missing.push_back(FolderOf(prefix));
+        }
     }
     for (const auto folder : missing) {
         reading.counts.emplace(folder, 0);
         reading.lengths.insert(folder.size());
     }
-    return reading.committed > 0;
+    reading.asked = prefixes;
+    reading.slots.clear();
+    for (const auto& prefix : prefixes) {
+        reading.slots.push_back(prefix.empty() ? reading.counts.end() : reading.counts.find(FolderOf(prefix)));
+    }
+    return !missing.empty() && reading.committed > 0;
 }
 
 // Calls `count` once for each folder of `counts` that holds the record's path, or else its old
@@ -336,7 +346,7 @@ void CatchUp(Reading& reading, const std::string& queueFile, off_t size, Counts&
 
 bool ReadQueue(const std::string& queueFile, const std::vector<std::string>& prefixes, QueueAnswer& answer) {
     answer = QueueAnswer();
-    for (const auto& prefix : prefixes) answer.under[prefix] = 0;
+    answer.under.assign(prefixes.size(), 0);
     const int fd = OpenNoFollow(queueFile, O_RDONLY);
     struct stat st;
     if (fd < 0 || fstat(fd, &st) != 0) {
@@ -360,12 +370,11 @@ bool ReadQueue(const std::string& queueFile, const std::vector<std::string>& pre
     unsigned long long tailLines = 0;
     CatchUp(*reading, queueFile, st.st_size, tail, tailLines);
     answer.lines = reading->lines + tailLines;
-    for (auto& [prefix, count] : answer.under) {
-        if (prefix.empty()) continue;
-        const std::string_view folder = FolderOf(prefix);
-        const auto found = reading->counts.find(folder);
-        const auto inTail = tail.find(folder);
-        count = (found != reading->counts.end() ? found->second : 0) + (inTail != tail.end() ? inTail->second : 0);
+    for (size_t i = 0; i < prefixes.size(); ++i) {
+        const Counts::iterator slot = reading->slots[i];
+        if (slot == reading->counts.end()) continue;
+        const auto inTail = tail.empty() ? tail.end() : tail.find(slot->first);
+        answer.under[i] = slot->second + (inTail != tail.end() ? inTail->second : 0);
     }
     return true;
 }
@@ -383,6 +392,7 @@ size_t QueueReadingsFootprint() {
         bytes += sizeof(Reading) + 64;  // the entry of the map of readings
         for (const auto& folder : reading.counts) bytes += folder.first.capacity() + 64;  // a map node
         bytes += reading.lengths.size() * 40;
+        for (const auto& prefix : reading.asked) bytes += prefix.capacity() + sizeof(prefix) + sizeof(Counts::iterator);
         for (const auto& sample : reading.samples) bytes += sizeof(Sample) + sample.bytes.capacity();
     }
     return bytes;

@@ -20,7 +20,6 @@
 #include <sys/types.h>
 
 #include <cstddef>
-#include <map>
 #include <string>
 #include <vector>
 
@@ -34,9 +33,10 @@ constexpr size_t kMaxQueuesRead = 256;
 struct QueueAnswer {
     bool refused = false;          // sparse or oversized: not read (logged once, share marked)
     unsigned long long lines = 0;  // every line, a last one without "\n" included
-    // Per folder prefix asked ("<full path>/"): the well-formed records whose path (or old path,
-    // for event 256) is the folder or lies beneath it, each record counted once.
-    std::map<std::string, unsigned long long> under;
+    // Per folder prefix asked ("<full path>/"), in the order asked: the well-formed records whose
+    // path (or old path, for event 256) is the folder or lies beneath it, each record counted
+    // once; 0 for an empty prefix.
+    std::vector<unsigned long long> under;
 };
 
 // Answers for `queueFile` and `prefixes` ("<full path>/" each). False, with errno set, when the

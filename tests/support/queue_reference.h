@@ -21,7 +21,7 @@ inline bool FullReading(const std::string& file, const std::vector<std::string>&
                         QIRA::FILEINDEX::detail::QueueAnswer& answer) {
     using namespace QIRA::FILEINDEX::detail;
     answer = QueueAnswer();
-    for (const auto& prefix : prefixes) answer.under[prefix] = 0;
+    answer.under.assign(prefixes.size(), 0);
     struct stat st;
     if (lstat(file.c_str(), &st) != 0 || !S_ISREG(st.st_mode)) return false;
     if (QueueRefusal(st) != nullptr) {
@@ -37,12 +37,12 @@ inline bool FullReading(const std::string& file, const std::vector<std::string>&
         ++answer.lines;
         QueueRecord record;
         if (end - begin <= kMaxQueueLine && ReadQueueRecordStrict(content.data() + begin, content.data() + end, record)) {
-            for (auto& [prefix, count] : answer.under) {
-                if (prefix.empty()) continue;
-                const std::string folder = prefix.substr(0, prefix.size() - 1);
+            for (size_t i = 0; i < prefixes.size(); ++i) {
+                if (prefixes[i].empty()) continue;
+                const std::string folder = prefixes[i].substr(0, prefixes[i].size() - 1);
                 if (IsWithin(record.path, folder) ||
                     (record.event == kEventRename && !record.path_old.empty() && IsWithin(record.path_old, folder))) {
-                    ++count;
+                    ++answer.under[i];
                 }
             }
         }
