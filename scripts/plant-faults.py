@@ -68,7 +68,7 @@ FAULTS = [
     ("src/queue/pending_reindex.cc", "if (record.event == static_cast<unsigned>(kEventReindex) && wanted_",
      "if (wanted_"),
     ("src/queue/pending_reindex.cc", "if (std::memchr(begin, '\\\\', static_cast<size_t>(end - begin)) != nullptr) return true;", ""),
-    ("src/queue/queue_status.cc", "return answer.refused || answer.under[prefix] > 0;", "return answer.under[prefix] > 0;"),
+    ("src/queue/queue_status.cc", "return answer.refused || answer.under[0] > 0;", "return answer.under[0] > 0;"),
     ("src/queue/queue_record.cc", "case simdjson::dom::element_type::NULL_VALUE:\n            out = 0;\n            return Verdict::Record;",
      "case simdjson::dom::element_type::NULL_VALUE:\n            return Verdict::Malformed;"),
     ("src/queue/queue_record.cc", "value > static_cast<int64_t>(UINT_MAX)", "value >= static_cast<int64_t>(UINT_MAX)"),
@@ -86,7 +86,8 @@ FAULTS = [
     ("src/queue/queue_readings.cc", "if (reading.committed == part.begin) {", "if (true) {"),
     ("src/queue/queue_readings.cc", "path[length] != '/'", "path[length] != '/' && false"),
     ("src/queue/queue_readings.cc", "kEventRename && !record.path_old.empty()", "kEventRename && record.path_old.empty()"),
-    ("src/queue/queue_readings.cc", "        missing = asked;\n", ""),
+    ("src/queue/queue_readings.cc", "        missing.clear();\n", ""),
+    ("src/queue/queue_readings.cc", "if (prefixes == reading.asked) return false;", "if (prefixes.size() == reading.asked.size()) return false;"),
     ("src/queue/queue_readings.cc", "if (parse) reading.loggedUpTo", "reading.loggedUpTo"),
     ("src/queue/progress.cc", "queue.lines + companion.lines", "queue.lines"),
     # The console.
