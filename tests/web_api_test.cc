@@ -211,8 +211,9 @@ TEST_F(WebApiTest, EveryWriteRouteNeedsTheTokenTheSameOriginAndAJsonBody) {
 }
 
 // A page elsewhere whose name points at 127.0.0.1 reads nothing: a Host that is not the console's
-// own is refused before any route, the page, the files, reads and writes alike.
-TEST_F(WebApiTest, OnlyTheConsolesOwnNamesAreAnswered) {
+// own is refused before any route, the page, the files, reads and writes alike. Every kind of
+// answer carries the headers a reviewer expects of an admin page.
+TEST_F(WebApiTest, OnlyTheConsolesOwnNamesAreAnsweredAndEveryAnswerIsGuarded) {
     const std::string port = std::to_string(port_);
     const std::vector<std::pair<std::string, bool>> hosts = {
         {"127.0.0.1:" + port, true},          {"localhost:" + port, true},
@@ -226,35 +227,24 @@ TEST_F(WebApiTest, OnlyTheConsolesOwnNamesAreAnswered) {
     for (const auto& [host, answered] : hosts) {
         for (const auto& [route, status] : routes) {
             SCOPED_TRACE(host + " " + route);
-            const Answer answer = Of(client_->Get(route.c_str(), {{"Host", host}}));
-            EXPECT_EQ(answer.status, answered ? status : 421);
+            const auto result = client_->Get(route.c_str(), {{"Host", host}});
+            ASSERT_TRUE(result);
+            EXPECT_EQ(result->status, answered ? status : 421);
             if (!answered) {
-                EXPECT_EQ(answer.body["error"]["name"].asString(), "HOST_REFUSED");
+                EXPECT_EQ(Of(result).body["error"]["name"].asString(), "HOST_REFUSED");
             }
+            EXPECT_EQ(result->get_header_value("Content-Security-Policy"),
+                      "default-src 'self'; script-src 'self'; style-src 'self'; object-src 'none'; base-uri 'none'; "
+                      "form-action 'self'; frame-ancestors 'none'");
+            EXPECT_EQ(result->get_header_value("X-Content-Type-Options"), "nosniff");
+            EXPECT_EQ(result->get_header_value("Referrer-Policy"), "no-referrer");
+            EXPECT_EQ(result->get_header_value("Cache-Control"), "no-store");
         }
         SCOPED_TRACE(host + " POST /api/pause");
         const Answer write = Post("/api/pause", R"({"hours": 1})", {{"X-Fileindex-Token", token_}, {"Host", host}});
         EXPECT_EQ(write.status, answered ? 200 : 421);
     }
     EXPECT_EQ(RawStatusLine("GET /api/folders HTTP/1.0\r\n\r\n"), "HTTP/1.1 421 Misdirected Request");
-}
-
-// What a reviewer expects of an admin page's answers, on every kind of answer.
-TEST_F(WebApiTest, EveryAnswerCarriesTheProtectiveHeaders) {
-    for (const auto& [route, host] : std::vector<std::pair<std::string, std::string>>{
-             {"/", ""}, {"/app.js", ""}, {"/api/status", ""}, {"/api/nosuch", ""}, {"/api/status", "evil.example"}}) {
-        SCOPED_TRACE(route + " " + host);
-        httplib::Headers headers;
-        if (!host.empty()) headers.emplace("Host", host);
-        const auto result = client_->Get(route.c_str(), headers);
-        ASSERT_TRUE(result);
-        EXPECT_EQ(result->get_header_value("Content-Security-Policy"),
-                  "default-src 'self'; script-src 'self'; style-src 'self'; object-src 'none'; base-uri 'none'; "
-                  "form-action 'self'; frame-ancestors 'none'");
-        EXPECT_EQ(result->get_header_value("X-Content-Type-Options"), "nosniff");
-        EXPECT_EQ(result->get_header_value("Referrer-Policy"), "no-referrer");
-        EXPECT_EQ(result->get_header_value("Cache-Control"), "no-store");
-    }
     const std::string page = client_->Get("/")->body;
     EXPECT_EQ(page.find("<script>"), std::string::npos);  // no inline script for the policy to block
     EXPECT_EQ(page.find(" style="), std::string::npos);
@@ -283,6 +273,28 @@ TEST_F(WebApiTest, TheTokenFileIsTheOwnersAlone) {
         int status = 0;
         ASSERT_EQ(waitpid(pid, &status, 0), pid);  // it is on its way out
         EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1);
+    }
+}
+
+TEST_F(WebApiTest, AHeldLockIsRetryableAndStaticFilesStayInTheirDirectory) {
+    {
+        testkit::ChildHolding holder([] { return Folders().Lock(true); });
+        ASSERT_TRUE(holder.Took());
+        const Answer busy = Post("/api/folders", R"([{"path": "/music/b"}])");
+        EXPECT_EQ(busy.status, 409);
+        EXPECT_EQ(busy.retryAfter, "1");
+        EXPECT_EQ(busy.body["error"]["name"].asString(), "FILEINDEX_ERR_LOCK");
+    }
+    EXPECT_EQ(Post("/api/folders", R"([{"path": "/music/b"}])").status, 200);
+    const auto page = client_->Get("/");
+    ASSERT_TRUE(page);
+    EXPECT_EQ(page->status, 200);
+    EXPECT_NE(page->body.find("<title>File indexing</title>"), std::string::npos);
+    for (const char* escape : {"/../CMakeLists.txt", "/%2e%2e/CMakeLists.txt", "/static/../../LICENSE", "/..%2fLICENSE"}) {
+        SCOPED_TRACE(escape);
+        const auto result = client_->Get(escape);
+        ASSERT_TRUE(result) << escape;
+        EXPECT_EQ(result->status, 404) << escape;
     }
 }
 
