@@ -14,7 +14,7 @@ import sys
 
 # (file, text, replacement): the first occurrence of text is replaced.
 FAULTS = [
-    ("src/utils/utils.cc", "rest.substr(0, rest.find('/'))", "rest.substr(0, rest.rfind('/'))"),
+    ("src/utils/utils.cc", "const size_t end = path.find('/', 1);", "const size_t end = path.rfind('/');"),
     ("src/utils/utils.cc",
      "fullPath = (lastSlash == std::string::npos ? std::string() : sharePath.substr(0, lastSlash)) + path;",
      "fullPath = sharePath + (path.find('/', 1) == std::string::npos ? std::string() : path.substr(path.find('/', 1))); (void)lastSlash;"),

@@ -16,8 +16,8 @@ namespace FILEINDEX {
 
 bool GetShareNameByPath(std::string& shareName, const std::string& path) {
     if (path.empty()) return false;
-    const std::string rest = path.substr(1);
-    shareName = rest.substr(0, rest.find('/'));
+    const size_t end = path.find('/', 1);  // the first character is dropped, whatever it is
+    shareName.assign(path, 1, end == std::string::npos ? std::string::npos : end - 1);
     return true;
 }
 
