@@ -62,7 +62,7 @@ TEST_F(UpsertTest, BadRequestsChangeNothing) {
     for (const char* request : {R"({"path": "/music/a"})", "\"/music/a\"", "null"}) {
         cases.push_back({request, {"Bad param: " + toString(J(request))}});
     }
-    for (const char* bad : {R"({"path": 7})", R"({"path": "/nosuch/x"})", R"([1])", R"("s")", R"({"path": {}})"}) {
+    for (const char* bad : {R"({"path": 7})", R"({"name": "x"})", R"({"path": "/nosuch/x"})", R"([1])", R"("s")", R"({"path": {}})"}) {
         const std::string logged = toString(J(bad));
         cases.push_back({std::string(R"([{"path": "/music/a"}, )") + bad + R"(, {"path": "/music/b"}])",
                          {"Bad param: " + logged, "Upsert failed, folder=" + logged}});
@@ -79,9 +79,10 @@ TEST_F(UpsertTest, BadRequestsChangeNothing) {
     }
 }
 
-// A folder path is taken up to the system's limits and refused one byte past them, by the upsert
-// and the reindex alike: a component of NAME_MAX bytes, a full path of PATH_MAX - 1.
-TEST_F(UpsertTest, PathsAreTakenUpToTheSystemsLimitsAndNoFurther) {
+// A folder path is a canonical share path, taken up to the system's limits and refused one byte
+// past them, by the upsert and the reindex alike: a component of NAME_MAX bytes, a full path of
+// PATH_MAX - 1. A refused path is logged whole and changes nothing.
+TEST_F(UpsertTest, PathsAreCanonicalAndTakenUpToTheSystemsLimitsAndNoFurther) {
     const auto pathOf = [](size_t length, size_t component) {
         std::string path = "/music";
         while (path.size() < length) path += "/" + std::string(std::min(component, length - path.size() - 1), 'c');
@@ -91,20 +92,28 @@ TEST_F(UpsertTest, PathsAreTakenUpToTheSystemsLimitsAndNoFurther) {
     const std::vector<std::pair<std::string, bool>> cases = {
         {pathOf(6 + 1 + NAME_MAX, NAME_MAX), true},      {pathOf(6 + 2 + NAME_MAX, NAME_MAX + 1), false},
         {pathOf(PATH_MAX - 1 - volume, 200), true},      {pathOf(PATH_MAX - volume, 200), false},
+        {"/music/../../etc", false}, {"/music/a/", false}, {"/music//a", false}, {"/music/./a", false},
+        {"/", false},                {"", false},          {"music/a", false},   {std::string(5000, '/'), false},
     };
     for (const auto& [path, taken] : cases) {
-        SCOPED_TRACE(std::to_string(path.size()) + " bytes");
+        SCOPED_TRACE(std::to_string(path.size()) + " bytes: " + path.substr(0, 20));
         Settle();
+        const std::string before = testkit::ReadFile(FolderConf());
         Json::Value folders(Json::arrayValue);
-        folders.append(Json::Value(Json::objectValue))["path"] = path;
+        const Json::Value& element = folders.append(Json::Value(Json::objectValue))["path"] = path;
         EXPECT_EQ(IndexMgr::Upsert(folders), taken);
         EXPECT_EQ(Conf().isMember(path), taken);
         Json::Value paths(Json::arrayValue);
         paths.append(path);
         EXPECT_EQ(IndexMgr::Reindex(paths), taken);
-        if (!taken) {
-            EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
-        }
+        if (taken) continue;
+        EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
+        const std::string logged = toString(folders[0]);
+        EXPECT_EQ(testkit::LogMessages(), (std::vector<std::string>{"Bad param: " + logged, "Upsert failed, folder=" + logged,
+                                                                    "Malformed jsArrPath: " + toString(element)}));
+        EXPECT_EQ(testkit::ReadFile(FolderConf()), before);
+        EXPECT_TRUE(qira_sim::Journal().empty());
+        EXPECT_TRUE(Messages().empty());
     }
 }
 
@@ -141,45 +150,46 @@ TEST_F(UpsertTest, EventsGoInAscendingPathOrderCommandsInRequestOrder) {
     EXPECT_EQ(queue[2]["path"].asString(), music_ + "/c");
 }
 
+// A step after the save fails: folder.conf keeps the change and the steps after it are not taken.
 TEST_F(UpsertTest, LaterStepsFailWithFolderConfAlreadyWritten) {
     struct Case {
-        const char* op;
-        std::string message;
+        std::string name, logged;
+        std::function<void()> setUp;
+        size_t frames;
+        bool marked;
+        _tag_fileindex_err_ error;
     };
-    const Case cases[] = {
-        {"MonitorQueue::Upsert", "UpsertQIRANtifydCfg failed, share=music"},
-        {"QLIBServiceStart", "QLIBServiceStart failed: err=[0x0070 sim/QLIBServiceStart:1]"},
+    const std::vector<Case> cases = {
+        {"notifier refuses", "UpsertQIRANtifydCfg failed, share=music", [] { qira_sim::InjectFault("MonitorQueue::Upsert", 0x70); }, 0, false,
+         FILEINDEX_ERR_NONE},
+        {"service start fails", "QLIBServiceStart failed: err=[0x0070 sim/QLIBServiceStart:1]",
+         [] { qira_sim::InjectFault("QLIBServiceStart", 0x70); }, 0, false, FILEINDEX_ERR_NONE},
+        {"daemon unreachable", "SendCammandToDaemon failed", [this] { daemon_.reset(); }, 0, false, FILEINDEX_ERR_NONE},
+        // The share vanishes once the daemon has been started, before the events are queued.
+        {"share vanishes", "GetFullPath failed, path=/music/a",
+         [] { qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", {"QLIBServiceStart", "fileindexd"}); }, 1, false,
+         FILEINDEX_ERR_PATH},
+        {"queue unwritable", "AddCustomEvent failed", [this] { MakeDir(QueueOf("music")); }, 1, true, FILEINDEX_ERR_NONE},
     };
     for (const auto& c : cases) {
-        SCOPED_TRACE(c.op);
+        SCOPED_TRACE(c.name);
         unlink(FolderConf().c_str());
+        rmdir(QueueOf("music").c_str());
         qira_sim::ClearFaults();
-        qira_sim::InjectFault(c.op, 0x70);
+        if (!daemon_) daemon_ = std::make_unique<testkit::FakeDaemon>(DaemonSocketPath());
+        c.setUp();
         Settle();
-        EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])"))) << c.op;
-        EXPECT_TRUE(testkit::Logged(c.message)) << c.op;
+        EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])")));
+        EXPECT_TRUE(testkit::Logged(c.logged));
         EXPECT_TRUE(Conf().isMember("/music/a"));
-        EXPECT_TRUE(Messages().empty());
-        EXPECT_FALSE(testkit::Exists(QueueOf("music")));
+        if (daemon_) {
+            EXPECT_EQ(Messages().size(), c.frames);
+        }
+        struct stat st;
+        EXPECT_FALSE(lstat(QueueOf("music").c_str(), &st) == 0 && S_ISREG(st.st_mode));
+        EXPECT_EQ(ErrorHandler::GetError(), c.error);
+        EXPECT_EQ(StatusMgr::ShareIsNeedReindex("music"), c.marked);
     }
-}
-
-TEST_F(UpsertTest, UnreachableDaemonStopsBeforeTheEvents) {
-    daemon_.reset();
-    EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])")));
-    EXPECT_TRUE(testkit::Logged("SendCammandToDaemon failed"));
-    EXPECT_TRUE(Conf().isMember("/music/a"));
-    EXPECT_FALSE(testkit::Exists(QueueOf("music")));
-    EXPECT_EQ(qira_sim::ServiceState("fileindexd"), "running");
-}
-
-TEST_F(UpsertTest, EventPathThatNoLongerResolvesFailsWithErrorTwo) {
-    // The share vanishes once the daemon has been started, before the events are queued.
-    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", {"QLIBServiceStart", "fileindexd"});
-    EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])")));
-    EXPECT_TRUE(testkit::Logged("GetFullPath failed, path=/music/a"));
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_PATH);
-    EXPECT_EQ(Messages().size(), 1u);
 }
 
 TEST_F(UpsertTest, FailedSaveStopsBeforeAnyOtherStep) {
@@ -189,13 +199,6 @@ TEST_F(UpsertTest, FailedSaveStopsBeforeAnyOtherStep) {
     EXPECT_TRUE(testkit::Logged("Failed to save json to " + FolderConf()));
     EXPECT_TRUE(qira_sim::Journal().empty());
     EXPECT_TRUE(Messages().empty());
-}
-
-TEST_F(UpsertTest, UnqueueableEventFailsAndMarksTheShare) {
-    MakeDir(QueueOf("music"));
-    EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])")));
-    EXPECT_TRUE(testkit::Logged("AddCustomEvent failed"));
-    EXPECT_TRUE(testkit::ParseJson(testkit::ReadFile(StatusConf()))["need_reindex"].isMember("music"));
 }
 
 TEST_F(UpsertTest, HeldFolderLockFailsWithErrorNineAndChangesNothing) {
@@ -214,14 +217,18 @@ TEST_F(UpsertTest, HeldFolderLockFailsWithErrorNineAndChangesNothing) {
     EXPECT_TRUE(Messages().empty());
 }
 
+// At a thousand folders a request that adds one is refused whole; one that only updates is taken.
 TEST_F(UpsertTest, LimitOfAThousandFoldersRejectsTheWholeRequest) {
     Json::Value conf(Json::objectValue);
     for (int i = 0; i < 1000; ++i) conf["/music/f" + std::to_string(i)] = Json::Value(Json::objectValue);
     testkit::WriteFile(FolderConf(), toString(conf));
     EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/f1", "name": "x"}, {"path": "/music/new"}])")));
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_EXCEED_MAX_FOLDER);
+    EXPECT_TRUE(testkit::Logged("Exceed max folder size"));
     EXPECT_EQ(Conf().size(), 1000u);
     EXPECT_EQ(Conf()["/music/f1"]["name"], Json::Value());
+    EXPECT_TRUE(IndexMgr::Upsert(J(R"([{"path": "/music/f1", "name": "x"}])")));
+    EXPECT_EQ(Conf()["/music/f1"]["name"].asString(), "x");
 }
 
 }  // namespace

@@ -1,7 +1,5 @@
 #include "sandbox.h"
 
-#include <climits>
-
 #include <ftw.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -82,12 +80,6 @@ size_t CountOf(const std::string& text, const std::string& needle) {
     size_t count = 0;
     for (size_t at = text.find(needle); at != std::string::npos; at = text.find(needle, at + 1)) ++count;
     return count;
-}
-
-std::string TooLongSharePath() {
-    std::string path = "/music";
-    while (path.size() + 201 < PATH_MAX) path += "/" + std::string(200, 'x');
-    return path + "/" + std::string(PATH_MAX - 2 - path.size(), 'x');
 }
 
 std::vector<Json::Value> ReadJsonLines(const std::string& path) {

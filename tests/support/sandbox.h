@@ -44,9 +44,6 @@ size_t CountOf(const std::string& text, const std::string& needle);
 // The records the daemon stand-in's log says it applied to the share's index, in all.
 size_t RecordsApplied(const std::string& daemonLog, const std::string& share);
 
-// A share path of "music" that fits PATH_MAX, while the full path (volume in front) does not.
-std::string TooLongSharePath();
-
 // Journal entries as "op" or "op arg1 arg2 ..." strings.
 std::vector<std::string> JournalOps();
 
