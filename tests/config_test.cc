@@ -1,4 +1,5 @@
-// Error state, configuration loading and saving, and the advisory lock between processes.
+// Error state, JSON reading and writing, configuration loading and saving, and the advisory lock
+// between processes.
 #include "testkit.h"
 
 #include <syslog.h>
@@ -153,6 +154,40 @@ TEST_F(ConfigTest, ReaderNeverSeesAPartialFileWhileAnotherProcessSaves) {
     }
     EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0);
     EXPECT_GT(reads, 0);
+}
+
+// Reading is strict and bounded in depth: nothing but one JSON text, no comments, and a failed
+// read leaves the value alone.
+TEST(JsonTest, ReadingIsStrictAndBoundedInDepth) {
+    const auto nested = [](int depth) { return std::string(depth, '[') + std::string(depth, ']'); };
+    const std::vector<std::pair<std::string, bool>> cases = {
+        {" {\"a\": [1, 2]} \n", true}, {"7", true}, {nested(kJsonNestingLimit - 1), true}, {nested(kJsonNestingLimit + 2), false},
+        {"{\"a\":1} x", false}, {"[1 /* c */]", false}, {"{\"a\": 1 // c\n}", false}, {"{\"a\":1,}", false},
+        {"{'a':1}", false}, {"[1,,2]", false}, {"", false}, {"nan", false}};
+    for (const auto& [text, taken] : cases) {
+        SCOPED_TRACE(text.substr(0, 20));
+        Json::Value value = "before";
+        EXPECT_EQ(fromString(value, text), taken);
+        if (!taken) {
+            EXPECT_EQ(value.asString(), "before");
+        }
+    }
+}
+
+TEST_F(ConfigTest, JsonIsWrittenAsOneCompactLineAndFilesAreReplacedWhole) {
+    const std::string path = Path("/data.json");
+    testkit::WriteFile(path, "old");
+    Json::Value value(Json::objectValue);
+    value["b"] = "Müsik\nline";
+    value["a"] = Json::Value(Json::arrayValue);
+    EXPECT_EQ(toString(value), "{\"a\":[],\"b\":\"Müsik\\nline\"}");
+    ASSERT_TRUE(toFile(value, path));
+    Json::Value back;
+    ASSERT_TRUE(fromFile(back, path));
+    EXPECT_EQ(back, value);
+    EXPECT_FALSE(toFile(value, Path("/missing/dir/x.json")));
+    EXPECT_FALSE(fromFile(back, Path("/missing.json")));
+    EXPECT_FALSE(fromFile(back, Path("/volume1")));
 }
 
 }  // namespace

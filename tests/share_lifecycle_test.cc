@@ -61,17 +61,6 @@ TEST_F(ShareLifecycleTest, RenameToAnUnknownShareChangesNothing) {
     EXPECT_EQ(testkit::ReadFile(FolderConf()), before);
 }
 
-TEST_F(ShareLifecycleTest, LockHeldMakesRemoveAndRenameFail) {
-    testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
-    Folders holder;
-    ASSERT_TRUE(holder.Lock(true));
-    EXPECT_FALSE(IndexMgr::ShareRemove("music"));
-    EXPECT_FALSE(IndexMgr::ShareRename("music", "photo"));
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
-    holder.Unlock();
-    EXPECT_TRUE(Conf().isMember("/music/a"));
-}
-
 TEST_F(ShareLifecycleTest, PauseStopsTheConsumerBeforeTheProducer) {
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
     ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("music"));

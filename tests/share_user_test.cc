@@ -111,17 +111,44 @@ TEST_F(ShareUserTest, EaDirSwappedForALinkDuringCleanUpNeverReachesAnotherDirect
     index.ExpectUntouched();
 }
 
-TEST_F(ShareUserTest, ContendedLocksLeakNoDescriptor) {
-    testkit::ChildHolding folders([] { return Folders().Lock(true); });
-    testkit::ChildHolding status([] { return Status().Lock(true); });
-    ASSERT_TRUE(folders.Took() && status.Took());
-    const int before = OpenDescriptors();
-    for (int i = 0; i < 100; ++i) {
-        EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/c"}])")));
-        EXPECT_FALSE(StatusMgr::Resume());
+// Every writer fails with error nine while another process holds its file's lock, changes nothing
+// and keeps no descriptor; readers take no lock.
+TEST_F(ShareUserTest, WritersFailWithErrorNineWhileALockIsHeldAndLeakNothing) {
+    testkit::WriteFile(StatusConf(), R"({"resume_time": -1})");
+    const std::string folders = testkit::ReadFile(FolderConf());
+    testkit::ChildHolding folderLock([] { return Folders().Lock(true); });
+    testkit::ChildHolding statusLock([] { return Status().Lock(true); });
+    ASSERT_TRUE(folderLock.Took() && statusLock.Took());
+    Json::Value out;
+    const std::vector<std::pair<const char*, std::function<bool()>>> writers = {
+        {"Upsert", [] { return IndexMgr::Upsert(J(R"([{"path": "/music/c"}])")); }},
+        {"Delete", [] { return IndexMgr::Delete(J(R"(["/music/a"])")); }},
+        {"Get", [&] { return IndexMgr::Get(out, "/music/a"); }},
+        {"ShareRemove", [] { return IndexMgr::ShareRemove("music"); }},
+        {"ShareRename", [] { return IndexMgr::ShareRename("music", "photo"); }},
+        {"Pause", [] { return StatusMgr::Pause(0); }},
+        {"Resume", [] { return StatusMgr::Resume(); }},
+        {"ShareSetNoSpace", [] { return StatusMgr::ShareSetNoSpace("music", true); }},
+        {"ShareSetNeedReindex", [] { return StatusMgr::ShareSetNeedReindex("music", true); }},
+        {"SetUpdated", [] { return StatusMgr::SetUpdated("m"); }},
+        {"ShareRevive", [] { return StatusMgr::ShareRevive("music"); }},
+    };
+    const int descriptors = OpenDescriptors();
+    for (const auto& [name, call] : writers) {
+        SCOPED_TRACE(name);
+        testkit::ClearError();
+        EXPECT_FALSE(call());
+        EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
+        EXPECT_EQ(OpenDescriptors(), descriptors);
     }
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
-    EXPECT_EQ(OpenDescriptors(), before);
+    long long resume = 0;
+    EXPECT_TRUE(StatusMgr::GetPauseInfo(resume));
+    EXPECT_EQ(resume, -1);
+    EXPECT_TRUE(IndexMgr::IsPathIndexed("/music/a"));
+    EXPECT_EQ(testkit::ReadFile(FolderConf()), folders);
+    EXPECT_EQ(testkit::ReadFile(StatusConf()), R"({"resume_time": -1})");
+    EXPECT_TRUE(qira_sim::Journal().empty());
+    EXPECT_TRUE(Messages().empty());
 }
 
 TEST_F(ShareUserTest, DaemonThatListensButNeverAcceptsFailsTheCallInsteadOfHanging) {

@@ -17,20 +17,28 @@ protected:
     Json::Value File() { return testkit::ParseJson(testkit::ReadFile(StatusConf())); }
 };
 
-TEST_F(StatusTest, NoticeRunsTheNotifierWithTheTenArguments) {
-    EXPECT_TRUE(NotifyNoSpace());
-    ASSERT_EQ(qira_sim::NotifierCalls().size(), 1u);
-    EXPECT_EQ(qira_sim::NotifierCalls()[0], kNoticeArgs);
+// The notice runs the notifier with its ten arguments, on the transition to flagged only; a failed
+// notice is logged and the flag still set.
+TEST_F(StatusTest, NoSpaceNoticeOnlyOnTheTransitionToFlagged) {
+    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("s", true));
+    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("s", true));
+    EXPECT_EQ(qira_sim::NotifierCalls(), std::vector<std::vector<std::string>>{kNoticeArgs});
     const auto journal = qira_sim::Journal();
     ASSERT_EQ(journal.size(), 1u);
     EXPECT_EQ(journal[0]["op"].asString(), "QLIBCExecv");
     EXPECT_EQ(journal[0]["args"][0].asString(), Path("/usr/qira/bin/qiralumnotify"));
     EXPECT_EQ(journal[0]["args"].size(), 10u);
-    qira_sim::SetNotifierExitStatus(1);
-    EXPECT_FALSE(NotifyNoSpace());
+    EXPECT_EQ(File(), J(R"({"no_space": {"s": true}})"));
+    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("s", false));
+    EXPECT_EQ(File(), J(R"({"no_space": {}})"));
+    EXPECT_TRUE(testkit::LogLines().empty());
+    qira_sim::SetNotifierExitStatus(2);
+    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("s", true));
+    EXPECT_EQ(qira_sim::NotifierCalls().size(), 2u);
+    EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"NotifyNoSpace failed"});
+    EXPECT_TRUE(StatusMgr::ShareIsNoSpace("s"));
     qira_sim::InjectFault("QLIBCExecv", 0x0F00);
     EXPECT_FALSE(NotifyNoSpace());
-    EXPECT_TRUE(testkit::LogLines().empty());
 }
 
 TEST_F(StatusTest, MissingFileReadsAsRunningAndUnflagged) {
@@ -41,25 +49,6 @@ TEST_F(StatusTest, MissingFileReadsAsRunningAndUnflagged) {
     EXPECT_FALSE(StatusMgr::ShareIsNeedReindex("s"));
     EXPECT_FALSE(StatusMgr::IsUpdated("m"));
     EXPECT_FALSE(testkit::Exists(StatusConf()));
-}
-
-TEST_F(StatusTest, NoticeOnlyOnTheTransitionToFlagged) {
-    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("s", true));
-    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("s", true));
-    EXPECT_EQ(qira_sim::NotifierCalls().size(), 1u);
-    EXPECT_EQ(File(), J(R"({"no_space": {"s": true}})"));
-    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("s", false));
-    EXPECT_EQ(File(), J(R"({"no_space": {}})"));
-    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("s", true));
-    EXPECT_EQ(qira_sim::NotifierCalls().size(), 2u);
-    EXPECT_TRUE(StatusMgr::ShareIsNoSpace("s"));
-}
-
-TEST_F(StatusTest, FailedNoticeIsLoggedAndTheFlagStillSet) {
-    qira_sim::SetNotifierExitStatus(2);
-    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("s", true));
-    EXPECT_TRUE(testkit::Logged("NotifyNoSpace failed"));
-    EXPECT_TRUE(StatusMgr::ShareIsNoSpace("s"));
 }
 
 TEST_F(StatusTest, ClearingOnAFreshFileLeavesANullMember) {
@@ -167,30 +156,6 @@ TEST_F(StatusTest, ReviveClearsOnlyTheNoSpaceFlagAndSendsTheCommand) {
     const auto messages = daemon.Messages();
     ASSERT_EQ(messages.size(), 2u);
     EXPECT_EQ(messages[0], J(R"({"type": "revive_share_worker", "data": {"share_name": "s"}})"));
-}
-
-TEST_F(StatusTest, WritersFailWithErrorNineWhileAnotherProcessHoldsTheLock) {
-    testkit::WriteFile(StatusConf(), R"({"resume_time": -1})");
-    testkit::FakeDaemon daemon(DaemonSocketPath());
-    testkit::ChildHolding holder([] {
-        Status status;
-        return status.Lock(true);
-    });
-    ASSERT_TRUE(holder.Took());
-    EXPECT_FALSE(StatusMgr::Pause(0));
-    EXPECT_FALSE(StatusMgr::Resume());
-    EXPECT_FALSE(StatusMgr::ShareSetNoSpace("s", true));
-    EXPECT_FALSE(StatusMgr::ShareSetNeedReindex("s", true));
-    EXPECT_FALSE(StatusMgr::SetUpdated("m"));
-    EXPECT_FALSE(StatusMgr::ShareRevive("s"));
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
-    long long resume = 0;
-    EXPECT_TRUE(StatusMgr::GetPauseInfo(resume));  // readers take no lock
-    EXPECT_EQ(resume, -1);
-    holder.Release();
-    EXPECT_EQ(testkit::ReadFile(StatusConf()), R"({"resume_time": -1})");
-    EXPECT_TRUE(daemon.Drain().empty());
-    EXPECT_TRUE(StatusMgr::Resume());
 }
 
 }  // namespace

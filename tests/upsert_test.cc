@@ -201,22 +201,6 @@ TEST_F(UpsertTest, FailedSaveStopsBeforeAnyOtherStep) {
     EXPECT_TRUE(Messages().empty());
 }
 
-TEST_F(UpsertTest, HeldFolderLockFailsWithErrorNineAndChangesNothing) {
-    testkit::WriteFile(FolderConf(), R"({"/music/c": {}})");
-    const std::string before = testkit::ReadFile(FolderConf());
-    Folders holder;
-    ASSERT_TRUE(holder.Lock(true));
-    Settle();
-    EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}])")));
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
-    EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/c"])")));
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
-    holder.Unlock();
-    EXPECT_EQ(testkit::ReadFile(FolderConf()), before);
-    EXPECT_TRUE(qira_sim::Journal().empty());
-    EXPECT_TRUE(Messages().empty());
-}
-
 // At a thousand folders a request that adds one is refused whole; one that only updates is taken.
 TEST_F(UpsertTest, LimitOfAThousandFoldersRejectsTheWholeRequest) {
     Json::Value conf(Json::objectValue);
