@@ -32,6 +32,11 @@ TEST_F(ExplainTest, NamesTheRefusingRuleAndAgreesWithCanPathBeIndexed) {
         {"/twelve/d", share("twelve", R"({"fs_type": 12})"), "file_system"},
         {"/nosuch/d", [] {}, "share_path"},
         {"/surveillance/d", share("surveillance", "{}"), "skipped_share_name"},
+        {"/NetBackup/d", share("NetBackup", "{}"), "skipped_share_name"},
+        {"/netbackup/d", share("netbackup", "{}"), Json::Value()},
+        {"/twenty/d", share("twenty", R"({"fs_type": 20})"), "file_system"},
+        {"/music/b", [] { qira_sim::InjectFault("QIRAGetFSType", 0x10); }, "file_system"},
+        {"/music/c", [] { qira_sim::InjectFault("QLIBShareIsReadOnlyGet", 0x20); }, "read_only_share"},
         {"/locked/d", share("locked", R"({"encrypted": true})"), "encrypted_share"},
         {"/frozen/d", share("frozen", R"({"read_only": true})"), "read_only_share"},
         {"/music/mnt", [this] {
@@ -43,6 +48,7 @@ TEST_F(ExplainTest, NamesTheRefusingRuleAndAgreesWithCanPathBeIndexed) {
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.path);
+        qira_sim::ClearFaults();
         c.setUp();
         const Json::Value out = Explain(c.path);
         EXPECT_EQ(out["refused_by"], c.refusedBy);

@@ -5,7 +5,6 @@
 
 #include <atomic>
 #include <chrono>
-#include <regex>
 #include <thread>
 
 #include <httplib.h>
@@ -18,15 +17,8 @@ protected:
         IndexFixture::SetUp();
         testkit::WriteFile(FolderConf(), R"({"/music/a": {"name": "A"}, "/photo/a": {"name": "P"}})");
         log_ = Path("/web.log");
-        pid_ = testkit::Start({FILEINDEX_WEB, "--listen", "127.0.0.1:0", "--allow-host", "Console.Example"}, log_);
-        std::smatch port;
-        ASSERT_TRUE(testkit::WaitFor([&] {
-            const std::string log = testkit::ReadFile(log_);
-            return std::regex_search(log, port, std::regex("listening on http://127.0.0.1:([0-9]+)/"));
-        }));
-        const std::string log = testkit::ReadFile(log_);
-        std::regex_search(log, port, std::regex("listening on http://127.0.0.1:([0-9]+)/"));
-        port_ = std::stoi(port[1]);
+        port_ = testkit::StartListening({FILEINDEX_WEB, "--listen", "127.0.0.1:0", "--allow-host", "Console.Example"}, log_, pid_);
+        ASSERT_NE(port_, 0) << testkit::ReadFile(log_);
         token_ = testkit::ReadFile(Path("/usr/qira/etc/fileindex/web.token"));
         token_.pop_back();
         client_ = std::make_unique<httplib::Client>("127.0.0.1", port_);

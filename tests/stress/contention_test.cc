@@ -10,12 +10,6 @@ namespace {
 constexpr int kWorkers = 4;
 constexpr int kOpsPerWorker = 80;
 
-struct Outcome {
-    std::string op;
-    std::string target;
-    bool ok;
-};
-
 class ContentionTest : public testkit::Sandbox {
 protected:
     void SetUp() override {
@@ -37,48 +31,33 @@ protected:
         Sandbox::TearDown();
     }
 
-    // Runs one worker's random operations on its own share; writes its outcomes to a file.
+    // Runs one worker's random operations on its own share; writes "op target ok" lines to a file.
     [[noreturn]] void Work(int w) {
         LOG_LEVEL = 7;
-        testkit::ClearLog();
         std::mt19937 random(1000 + w);
         const std::string share = "s" + std::to_string(w);
         std::string lines;
-        int written = 0;
         for (int i = 0; i < kOpsPerWorker; ++i) {
             const std::string path = "/" + share + "/p" + std::to_string(random() % 4);
-            Outcome outcome;
+            const std::string event = ShareDir("ev") + "/ev_" + std::to_string(w) + "_" + std::to_string(i);
+            const bool on = random() % 2 == 0;
             switch (random() % 6) {
                 case 0:
-                case 1: {
-                    Json::Value request(Json::arrayValue);
-                    request.append(Json::Value(Json::objectValue));
-                    request[0]["path"] = path;
-                    request[0]["audio"] = true;
-                    outcome = {"upsert", path, IndexMgr::Upsert(request)};
+                case 1:
+                    lines += "upsert " + path + (IndexMgr::Upsert(J("[{\"path\": \"" + path + "\", \"audio\": true}]")) ? " 1\n" : " 0\n");
                     break;
-                }
-                case 2: {
-                    Json::Value request(Json::arrayValue);
-                    request.append(path);
-                    outcome = {"delete", path, IndexMgr::Delete(request)};
+                case 2:
+                    lines += "delete " + path + (IndexMgr::Delete(J("[\"" + path + "\"]")) ? " 1\n" : " 0\n");
                     break;
-                }
-                case 3: {
-                    const bool on = random() % 2 == 0;
-                    outcome = {on ? "flag_on" : "flag_off", share, StatusMgr::ShareSetNoSpace(share, on)};
+                case 3:
+                    lines += (on ? "flag_on " : "flag_off ") + share + (StatusMgr::ShareSetNoSpace(share, on) ? " 1\n" : " 0\n");
                     break;
-                }
                 case 4:
-                    outcome = {"pause", "-", random() % 2 ? StatusMgr::Pause(0) : StatusMgr::Resume()};
+                    lines += std::string("pause - ") + ((on ? StatusMgr::Pause(0) : StatusMgr::Resume()) ? "1\n" : "0\n");
                     break;
-                default: {
-                    const std::string full = ShareDir("ev") + "/ev_" + std::to_string(w) + "_" + std::to_string(i);
-                    outcome = {"event", full, AddCustomEvent(kEventFolderSettingChanged, full, Json::Value())};
-                    if (outcome.ok) ++written;
-                }
+                default:
+                    lines += "event " + event + (AddCustomEvent(kEventFolderSettingChanged, event, Json::Value()) ? " 1\n" : " 0\n");
             }
-            lines += outcome.op + " " + outcome.target + " " + (outcome.ok ? "1" : "0") + "\n";
         }
         testkit::WriteFile(Path("/worker" + std::to_string(w)), lines);
         _exit(0);
@@ -103,31 +82,22 @@ TEST_F(ContentionTest, ConcurrentCallersLoseNothing) {
     ASSERT_TRUE(status.Load());
     size_t expectedEvents = 0;
     for (int w = 0; w < kWorkers; ++w) {
-        std::map<std::string, Outcome> lastSuccess;
-        std::map<std::string, bool> lastFailed;
+        // The last call on each folder or flag; only a success says what the file holds.
+        std::map<std::string, std::pair<std::string, bool>> last;
         std::stringstream lines(testkit::ReadFile(Path("/worker" + std::to_string(w))));
-        std::string op, target, ok;
-        while (lines >> op) {
-            lines >> target >> ok;
-            if (op == "event") {
-                if (ok == "1") ++expectedEvents;
-                continue;
-            }
+        for (std::string op, target, ok; lines >> op >> target >> ok;) {
+            if (op == "event") expectedEvents += ok == "1";
             const std::string key = op == "upsert" || op == "delete" ? target : op.substr(0, 4) + target;
-            lastFailed[key] = ok != "1";
-            if (ok == "1") lastSuccess[key] = {op, target, true};
+            if (op != "event") last[key] = {op, ok == "1"};
         }
-        for (const auto& [key, outcome] : lastSuccess) {
-            if (lastFailed[key]) continue;  // a later failed call may or may not have changed it
+        for (const auto& [key, outcome] : last) {
+            const auto& [op, ok] = outcome;
+            if (!ok) continue;  // a failed call may or may not have changed it
             Json::Value out;
-            if (outcome.op == "upsert" || outcome.op == "delete") {
-                EXPECT_EQ(folders.Get(out, outcome.target), outcome.op == "upsert") << outcome.target;
-            }
-            if (outcome.op == "flag_on") {
-                EXPECT_TRUE(status.ShareIsNoSpace(outcome.target));
-            }
-            if (outcome.op == "flag_off") {
-                EXPECT_FALSE(status.ShareIsNoSpace(outcome.target));
+            if (op == "upsert" || op == "delete") {
+                EXPECT_EQ(folders.Get(out, key), op == "upsert") << key;
+            } else if (op != "pause") {
+                EXPECT_EQ(status.ShareIsNoSpace(key.substr(4)), op == "flag_on") << key;
             }
         }
     }

@@ -1,11 +1,14 @@
 #include "process.h"
 
 #include <fcntl.h>
-#include <poll.h>
 #include <signal.h>
+#include <sys/mman.h>
 #include <sys/wait.h>
 
 #include <cstring>
+#include <regex>
+
+#include "sandbox.h"
 
 namespace testkit {
 namespace {
@@ -17,48 +20,36 @@ std::vector<char*> Argv(const std::vector<std::string>& argv) {
     return raw;
 }
 
+// The whole content of a memory file, read from its start.
+std::string Slurp(int fd) {
+    std::string text;
+    char buffer[4096];
+    lseek(fd, 0, SEEK_SET);
+    for (ssize_t got; (got = read(fd, buffer, sizeof buffer)) > 0;) text.append(buffer, static_cast<size_t>(got));
+    close(fd);
+    return text;
+}
+
 }  // namespace
 
 RunResult Run(const std::vector<std::string>& argv, const std::string& input) {
-    int in[2], out[2], err[2];
-    if (pipe(in) != 0 || pipe(out) != 0 || pipe(err) != 0) return {};
+    // Memory files rather than pipes: nothing to drain while the tool runs.
+    const int in = memfd_create("in", MFD_CLOEXEC), out = memfd_create("out", MFD_CLOEXEC),
+              err = memfd_create("err", MFD_CLOEXEC);
+    if (write(in, input.data(), input.size()) != static_cast<ssize_t>(input.size())) return {};
+    lseek(in, 0, SEEK_SET);
     const pid_t pid = fork();
     if (pid == 0) {
-        dup2(in[0], 0);
-        dup2(out[1], 1);
-        dup2(err[1], 2);
-        for (int fd : {in[0], in[1], out[0], out[1], err[0], err[1]}) close(fd);
+        dup2(in, 0);
+        dup2(out, 1);
+        dup2(err, 2);
         execv(argv[0].c_str(), Argv(argv).data());
         _exit(127);
     }
-    close(in[0]);
-    close(out[1]);
-    close(err[1]);
-    if (!input.empty() && write(in[1], input.data(), input.size()) < 0) {
-        // The tool may not read its input; that is its business.
-    }
-    close(in[1]);
-    RunResult result;
-    pollfd fds[2] = {{out[0], POLLIN, 0}, {err[0], POLLIN, 0}};
-    int open = 2;
-    while (open > 0 && poll(fds, 2, -1) > 0) {
-        for (int i = 0; i < 2; ++i) {
-            if (fds[i].fd < 0 || !(fds[i].revents & (POLLIN | POLLHUP))) continue;
-            char buffer[4096];
-            const ssize_t got = read(fds[i].fd, buffer, sizeof buffer);
-            if (got > 0) {
-                (i == 0 ? result.out : result.err).append(buffer, static_cast<size_t>(got));
-            } else {
-                close(fds[i].fd);
-                fds[i].fd = -1;
-                --open;
-            }
-        }
-    }
+    close(in);
     int status = 0;
     waitpid(pid, &status, 0);
-    result.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-    return result;
+    return {WIFEXITED(status) ? WEXITSTATUS(status) : -1, Slurp(out), Slurp(err)};
 }
 
 pid_t Start(const std::vector<std::string>& argv, const std::string& logFile) {
@@ -72,6 +63,15 @@ pid_t Start(const std::vector<std::string>& argv, const std::string& logFile) {
         _exit(127);
     }
     return pid;
+}
+
+int StartListening(const std::vector<std::string>& argv, const std::string& logFile, pid_t& pid) {
+    pid = Start(argv, logFile);
+    const std::regex listening("listening on http://127.0.0.1:([0-9]+)/");
+    std::smatch port;
+    std::string log;
+    WaitFor([&] { return std::regex_search(log = ReadFile(logFile), port, listening); });
+    return port.empty() ? 0 : std::stoi(port[1]);
 }
 
 int Stop(pid_t pid) {

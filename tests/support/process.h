@@ -19,6 +19,9 @@ RunResult Run(const std::vector<std::string>& argv, const std::string& input = s
 
 // Starts argv[0] in the background with stdout and stderr going to `logFile`.
 pid_t Start(const std::vector<std::string>& argv, const std::string& logFile);
+// Starts argv[0] as Start does and waits until its log says it listens on a loopback port: that
+// port, or 0 when it never said so.
+int StartListening(const std::vector<std::string>& argv, const std::string& logFile, pid_t& pid);
 // SIGTERM and wait; returns the exit status (-1 when it did not exit normally).
 int Stop(pid_t pid);
 

@@ -1,6 +1,5 @@
 #include "sandbox.h"
 
-#include <ftw.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -14,11 +13,6 @@
 #include "qira_sim/appliance.h"
 
 namespace testkit {
-namespace {
-
-int RemoveEntry(const char* path, const struct stat*, int, struct FTW*) { return remove(path); }
-
-}  // namespace
 
 void Sandbox::SetUp() {
     char tmpl[] = "/tmp/fileindex-test-XXXXXX";
@@ -32,7 +26,8 @@ void Sandbox::SetUp() {
 }
 
 void Sandbox::TearDown() {
-    nftw(root_.c_str(), RemoveEntry, 16, FTW_DEPTH | FTW_PHYS);
+    std::error_code error;
+    std::filesystem::remove_all(root_, error);
     unsetenv("QIRA_ROOT");
 }
 
