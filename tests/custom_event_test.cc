@@ -106,25 +106,37 @@ TEST_F(CustomEventTest, AQueueHeldTooLongMarksTheShareAndFails) {
     EXPECT_EQ(testkit::ReadFile(QueueOf("s")), "");
 }
 
-TEST_F(CustomEventTest, UnknownShareMarksTheEmptyShareNameAndFails) {
-    EXPECT_FALSE(AddCustomEvent(kEventReindex, Path("/volume2/x"), Json::Value()));
-    EXPECT_TRUE(testkit::Logged("QIRAShareNamePathGet failed, path=" + Path("/volume2/x")));
-    EXPECT_EQ(testkit::ParseJson(testkit::ReadFile(StatusConf())), J(R"({"need_reindex": {"": true}})"));
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NONE);
-}
-
-TEST_F(CustomEventTest, QueuePathFailureMarksTheShare) {
-    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "s");
-    EXPECT_FALSE(AddCustomEvent(kEventReindex, dir_ + "/x", Json::Value()));
-    EXPECT_TRUE(testkit::Logged("FILEIDXQueuePathGet failed, share=s"));
-    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("s"));
-}
-
-TEST_F(CustomEventTest, FailedMarkingIsLoggedToo) {
-    MakeDir(QueueOf("s"));
-    mkdir(Path("/tmp/fileidx_cfg_status.lock").c_str(), 0755);
-    EXPECT_FALSE(AddCustomEvent(kEventReindex, dir_ + "/x", Json::Value()));
-    EXPECT_TRUE(testkit::Logged("ShareSetNeedReindex failed, share=s"));
+// An event that cannot be queued marks its share (the empty name when it has none) and fails; a
+// marking that fails is logged too.
+TEST_F(CustomEventTest, AnEventThatCannotBeQueuedMarksItsShare) {
+    struct Case {
+        std::string name, path, logged, status;
+        std::function<void()> setUp;
+        _tag_fileindex_err_ error = FILEINDEX_ERR_NONE;
+    };
+    const std::vector<Case> cases = {
+        {"unknown share", Path("/volume2/x"), "QIRAShareNamePathGet failed, path=" + Path("/volume2/x"),
+         "{\"need_reindex\":{\"\":true}}\n", [] {}},
+        {"no queue path", dir_ + "/x", "FILEIDXQueuePathGet failed, share=s", "{\"need_reindex\":{\"s\":true}}\n",
+         [] { qira_sim::InjectFault("QIRAShareGet", 0x0B00, "s"); }},
+        {"marking fails", dir_ + "/x", "ShareSetNeedReindex failed, share=s", "",
+         [this] {
+             MakeDir(QueueOf("s"));
+             unlink(Path("/tmp/fileidx_cfg_status.lock").c_str());
+             mkdir(Path("/tmp/fileidx_cfg_status.lock").c_str(), 0755);
+         },
+         FILEINDEX_ERR_LOCK},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.name);
+        unlink(StatusConf().c_str());
+        c.setUp();
+        EXPECT_FALSE(AddCustomEvent(kEventReindex, c.path, Json::Value()));
+        EXPECT_TRUE(testkit::Logged(c.logged));
+        EXPECT_EQ(testkit::ReadFile(StatusConf()), c.status);
+        EXPECT_EQ(ErrorHandler::GetError(), c.error);
+        qira_sim::ClearFaults();
+    }
 }
 
 // One operation keeps what it read of a queue and reads on only as far as the file grew; a file

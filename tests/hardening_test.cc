@@ -136,25 +136,4 @@ TEST_F(DaemonFaultTest, DaemonReadingAByteAtATimeGetsAWholeFrame) {
     waitpid(pid, nullptr, 0);
 }
 
-TEST_F(DaemonFaultTest, WrongTypedRequestsAndFilesFailCleanly) {
-    AddShare("music");
-    testkit::WriteFile(FolderConf(), R"({"/music/a": {"name": ["x"], "audio": {"deep": [1]}}})");
-    testkit::WriteFile(StatusConf(), R"({"resume_time": [], "no_space": 5, "need_reindex": "x", "m": {}})");
-    const std::string folders = testkit::ReadFile(FolderConf());
-    const std::string status = testkit::ReadFile(StatusConf());
-    EXPECT_FALSE(IndexMgr::Upsert(J(R"([{"path": {"a": 1}}])")));
-    EXPECT_FALSE(IndexMgr::Delete(J(R"([{"path": "/music/a"}])")));
-    EXPECT_FALSE(IndexMgr::Reindex(J(R"([["/music/a"]])")));
-    EXPECT_FALSE(StatusMgr::ShareSetNoSpace("music", true));
-    EXPECT_FALSE(StatusMgr::ShareSetNeedReindex("music", false));
-    EXPECT_FALSE(StatusMgr::IsUpdated("m"));
-    long long resume = 7;
-    EXPECT_FALSE(StatusMgr::GetPauseInfo(resume));
-    Json::Value out;
-    EXPECT_TRUE(IndexMgr::List(out, 0, 10, "name", "DESC", J(R"([{"k": 1}])")));
-    EXPECT_EQ(out["folder"][0]["name"].asString(), "");
-    EXPECT_EQ(testkit::ReadFile(FolderConf()), folders);
-    EXPECT_EQ(testkit::ReadFile(StatusConf()), status);
-}
-
 }  // namespace

@@ -5,7 +5,7 @@ namespace {
 
 class NotifydCfgTest : public testkit::IndexFixture {};
 
-TEST_F(NotifydCfgTest, QueueDescriptionListsEachFolderOfTheShare) {
+TEST_F(NotifydCfgTest, EachShareIsRegisteredWithItsFoldersAndDeletedAlone) {
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/b": {}, "/photo/a": {}})");
     ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("music"));
     const auto registrations = qira_sim::Registrations();
@@ -17,16 +17,15 @@ TEST_F(NotifydCfgTest, QueueDescriptionListsEachFolderOfTheShare) {
                 "{\"path\": \"" + music_ + "/a\", \"mask\": 65486, \"ignore\": [\"@eaDir\"]}, " +
                 "{\"path\": \"" + music_ + "/b\", \"mask\": 65486, \"ignore\": [\"@eaDir\"]}]}"));
     EXPECT_TRUE(registrations[0]["description"]["config"][0]["mask"].isInt());
-}
-
-TEST_F(NotifydCfgTest, SecondUpsertReplacesAndEmptyShareRegistersAnEmptyConfig) {
-    testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
-    ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("music"));
+    // Another share's is kept apart; an upsert replaces the share's own, even by an empty one.
+    ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("photo"));
     testkit::WriteFile(FolderConf(), R"({})");
     ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("music"));
-    const auto registrations = qira_sim::Registrations();
-    ASSERT_EQ(registrations.size(), 1u);
-    EXPECT_EQ(registrations[0]["description"]["config"], J("[]"));
+    ASSERT_EQ(qira_sim::Registrations().size(), 2u);
+    EXPECT_EQ(qira_sim::Registrations()[1]["description"], J("{\"queue\": \"" + QueueOf("music") + "\", \"config\": []}"));
+    ASSERT_TRUE(IndexMgr::DeleteQIRANotifydCfg("music"));
+    ASSERT_EQ(qira_sim::Registrations().size(), 1u);
+    EXPECT_EQ(qira_sim::Registrations()[0]["queue"].asString(), QueueOf("photo"));
 }
 
 TEST_F(NotifydCfgTest, AnUnresolvableFolderChangesNoRegistration) {
@@ -60,16 +59,6 @@ TEST_F(NotifydCfgTest, PlatformRefusalsAreLogged) {
     EXPECT_TRUE(testkit::Logged("MonitorQueue::Delete failed"));
     EXPECT_FALSE(IndexMgr::DeleteQIRANotifydCfg("nosuch"));
     EXPECT_TRUE(testkit::Logged("FILEIDXQueuePathGet failed, share=nosuch"));
-}
-
-TEST_F(NotifydCfgTest, DeleteRemovesTheSharesRegistration) {
-    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/photo/a": {}})");
-    ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("music"));
-    ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("photo"));
-    ASSERT_TRUE(IndexMgr::DeleteQIRANotifydCfg("music"));
-    const auto registrations = qira_sim::Registrations();
-    ASSERT_EQ(registrations.size(), 1u);
-    EXPECT_EQ(registrations[0]["queue"].asString(), QueueOf("photo"));
 }
 
 }  // namespace

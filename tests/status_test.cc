@@ -41,51 +41,49 @@ TEST_F(StatusTest, NoSpaceNoticeOnlyOnTheTransitionToFlagged) {
     EXPECT_FALSE(NotifyNoSpace());
 }
 
-TEST_F(StatusTest, MissingFileReadsAsRunningAndUnflagged) {
-    long long resume = 5;
-    EXPECT_TRUE(StatusMgr::GetPauseInfo(resume));
-    EXPECT_EQ(resume, -1);
-    EXPECT_FALSE(StatusMgr::ShareIsNoSpace("s"));
-    EXPECT_FALSE(StatusMgr::ShareIsNeedReindex("s"));
-    EXPECT_FALSE(StatusMgr::IsUpdated("m"));
-    EXPECT_FALSE(testkit::Exists(StatusConf()));
+// A flag is set by the share's membership, whatever its value; a marker by its value as a boolean.
+// A missing file reads as running and unflagged and is not made by reading.
+TEST_F(StatusTest, FlagsAreMembershipsAndMarkersBooleans) {
+    struct Case {
+        const char* content;
+        bool noSpace, needReindex, updated;
+    };
+    const Case cases[] = {
+        {"", false, false, false},
+        {R"({"no_space": {"s": false}, "need_reindex": ["s"], "s": 1})", true, false, true},
+        {R"({"no_space": "s", "s": 0})", false, false, false},
+        {R"({"s": false})", false, false, false},
+        {R"({"s": "yes"})", false, false, false},
+        {R"({"s": {}})", false, false, false},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.content);
+        if (*c.content != '\0') testkit::WriteFile(StatusConf(), c.content);
+        EXPECT_EQ(StatusMgr::ShareIsNoSpace("s"), c.noSpace);
+        EXPECT_EQ(StatusMgr::ShareIsNeedReindex("s"), c.needReindex);
+        EXPECT_EQ(StatusMgr::IsUpdated("s"), c.updated);
+        long long resume = 5;
+        EXPECT_EQ(StatusMgr::GetPauseInfo(resume), true);
+        EXPECT_EQ(resume, -1);
+        EXPECT_EQ(testkit::Exists(StatusConf()), *c.content != '\0');
+    }
+    EXPECT_TRUE(StatusMgr::SetUpdated("s"));
+    EXPECT_TRUE(StatusMgr::IsUpdated("s"));
 }
 
-TEST_F(StatusTest, ClearingOnAFreshFileLeavesANullMember) {
+// Clearing on a fresh file leaves a null member; a flag set of the wrong type is not repaired.
+TEST_F(StatusTest, FlagSetsAreWrittenOnlyWhenTheyAreObjects) {
     EXPECT_TRUE(StatusMgr::ShareSetNeedReindex("s", false));
     EXPECT_EQ(File(), J(R"({"need_reindex": null})"));
-    EXPECT_FALSE(StatusMgr::ShareIsNeedReindex("s"));
     EXPECT_TRUE(StatusMgr::ShareSetNeedReindex("s", true));
     EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("s"));
     EXPECT_FALSE(StatusMgr::ShareIsNoSpace("s"));
-}
-
-TEST_F(StatusTest, MembershipNotValueDecidesAFlag) {
-    testkit::WriteFile(StatusConf(), R"({"no_space": {"s": false}, "need_reindex": ["s"]})");
-    EXPECT_TRUE(StatusMgr::ShareIsNoSpace("s"));
-    EXPECT_FALSE(StatusMgr::ShareIsNeedReindex("s"));
-    testkit::WriteFile(StatusConf(), R"({"no_space": "s"})");
-    EXPECT_FALSE(StatusMgr::ShareIsNoSpace("s"));
-}
-
-TEST_F(StatusTest, FlagSetOfTheWrongTypeIsNotRepaired) {
     const std::string content = R"({"no_space": ["s"], "need_reindex": 3})";
     testkit::WriteFile(StatusConf(), content);
     EXPECT_FALSE(StatusMgr::ShareSetNoSpace("s", true));
     EXPECT_FALSE(StatusMgr::ShareSetNeedReindex("s", false));
     EXPECT_EQ(testkit::ReadFile(StatusConf()), content);
     EXPECT_TRUE(qira_sim::NotifierCalls().empty());
-}
-
-TEST_F(StatusTest, MarkersReadAsBooleans) {
-    testkit::WriteFile(StatusConf(), R"({"f": false, "one": 1, "zero": 0, "s": "yes", "o": {}})");
-    EXPECT_FALSE(StatusMgr::IsUpdated("f"));
-    EXPECT_TRUE(StatusMgr::IsUpdated("one"));
-    EXPECT_FALSE(StatusMgr::IsUpdated("zero"));
-    EXPECT_FALSE(StatusMgr::IsUpdated("s"));
-    EXPECT_FALSE(StatusMgr::IsUpdated("o"));
-    EXPECT_TRUE(StatusMgr::SetUpdated("f"));
-    EXPECT_TRUE(StatusMgr::IsUpdated("f"));
 }
 
 TEST_F(StatusTest, MalformedResumeTimeIsAJsonException) {
@@ -102,8 +100,13 @@ TEST_F(StatusTest, MalformedResumeTimeIsAJsonException) {
     }
 }
 
+// A negative pause touches nothing; a pause past 2^31 seconds wraps in 32 bits as stored.
 TEST_F(StatusTest, PauseAndResumeWriteTheFileAndTellTheDaemon) {
     testkit::FakeDaemon daemon(DaemonSocketPath());
+    EXPECT_FALSE(StatusMgr::Pause(-1));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
+    EXPECT_FALSE(testkit::Exists(StatusConf()));
+    EXPECT_FALSE(testkit::Exists(Path("/tmp/fileidx_cfg_status.lock")));
     ASSERT_TRUE(StatusMgr::Pause(0));
     EXPECT_EQ(File(), J(R"({"resume_time": 0})"));
     const long long before = time(nullptr);
@@ -118,26 +121,12 @@ TEST_F(StatusTest, PauseAndResumeWriteTheFileAndTellTheDaemon) {
     EXPECT_EQ(messages[0], J(R"({"type": "pause", "data": {"resume_time": 0}})"));
     EXPECT_EQ(messages[1]["data"]["resume_time"].asInt64(), stored);
     EXPECT_EQ(messages[2], J(R"({"type": "resume", "data": {}})"));
-}
-
-TEST_F(StatusTest, LongPausesWrapIn32Bits) {
-    testkit::FakeDaemon daemon(DaemonSocketPath());
     const int hours = 600000;  // 2,160,000,000 s: past 2^31 from any present time
     const long long now = time(nullptr);
     ASSERT_TRUE(StatusMgr::Pause(hours));
-    const long long expected = static_cast<int32_t>(static_cast<uint32_t>(now) + 3600u * hours);
-    const long long stored = File()["resume_time"].asInt64();
-    EXPECT_LT(stored, 0);
-    EXPECT_NEAR(static_cast<double>(stored), static_cast<double>(expected), 2.0);
-}
-
-TEST_F(StatusTest, NegativePauseTouchesNothing) {
-    testkit::FakeDaemon daemon(DaemonSocketPath());
-    EXPECT_FALSE(StatusMgr::Pause(-1));
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_BAD_PARAM);
-    EXPECT_FALSE(testkit::Exists(StatusConf()));
-    EXPECT_FALSE(testkit::Exists(Path("/tmp/fileidx_cfg_status.lock")));
-    EXPECT_TRUE(daemon.Drain().empty());
+    const long long wrapped = File()["resume_time"].asInt64();
+    EXPECT_LT(wrapped, 0);
+    EXPECT_NEAR(static_cast<double>(wrapped), static_cast<double>(static_cast<int32_t>(static_cast<uint32_t>(now) + 3600u * hours)), 2.0);
 }
 
 TEST_F(StatusTest, UnreachableDaemonLeavesTheFileChangedAndFails) {
