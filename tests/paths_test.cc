@@ -1,6 +1,8 @@
 // Share paths, full paths and the small helpers.
 #include "testkit.h"
 
+#include "qira/qira_share.h"
+
 namespace {
 
 class PathsTest : public testkit::Sandbox {};
@@ -81,6 +83,23 @@ TEST_F(PathsTest, ShareOfAFullPathComesFromThePlatform) {
     EXPECT_EQ(name, "keep");
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_PATH);
     EXPECT_TRUE(testkit::Logged("QIRAShareNamePathGet failed, path=" + Path("/volume1/other/x")));
+}
+
+// The platform gives a full path to the share with the longest directory, on a slash boundary.
+TEST_F(PathsTest, FullPathBelongsToTheLongestShareDirectoryOnASlashBoundary) {
+    AddShare("a");
+    qira_sim::PutShare("nested", ShareDir("a") + "/inner");
+    qira_sim::PutShare("ab", ShareDir("ab"));
+    char name[492];
+    char inside[4096];
+    ASSERT_EQ(QIRAShareNamePathGet((ShareDir("a") + "/inner/x").c_str(), name, sizeof name, inside, sizeof inside), 0);
+    EXPECT_STREQ(name, "nested");
+    EXPECT_STREQ(inside, "/x");
+    ASSERT_EQ(QIRAShareNamePathGet((ShareDir("ab") + "/y").c_str(), name, sizeof name, inside, sizeof inside), 0);
+    EXPECT_STREQ(name, "ab");
+    ASSERT_EQ(QIRAShareNamePathGet(ShareDir("a").c_str(), name, sizeof name, inside, sizeof inside), 0);
+    EXPECT_STREQ(inside, "/");
+    EXPECT_LT(QIRAShareNamePathGet("/elsewhere", name, sizeof name, inside, sizeof inside), 0);
 }
 
 TEST_F(PathsTest, FileTestsDoNotFollowSymbolicLinks) {
