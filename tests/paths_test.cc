@@ -20,29 +20,24 @@ TEST(ShareNameTest, FirstCharacterIsAlwaysDropped) {
     }
 }
 
-TEST(ShareNameTest, ReplaceShareNameKeepsTheRest) {
-    EXPECT_EQ(ReplaceShareName("", "z"), "");
-    EXPECT_EQ(ReplaceShareName("/a/b/c", "z"), "/z/b/c");
-    EXPECT_EQ(ReplaceShareName("/music", "audio"), "/audio");
-    EXPECT_EQ(ReplaceShareName("/music/live", "audio"), "/audio/live");
-}
-
-TEST(HelpersTest, PrefixAndJsonMembers) {
-    EXPECT_TRUE(StringStartWith("abc", ""));
-    EXPECT_TRUE(StringStartWith("abc", "ab"));
-    EXPECT_TRUE(StringStartWith("abc", "abc"));
-    EXPECT_FALSE(StringStartWith("ab", "abc"));
-    EXPECT_FALSE(StringStartWith("Abc", "ab"));
-    bool flag = true;
-    std::string text = "keep";
+TEST(HelpersTest, ShareRenamePrefixAndJsonMembers) {
+    for (const auto& [path, renamed] : {std::pair{"", ""}, {"/a/b/c", "/z/b/c"}, {"/music", "/z"}, {"/music/live", "/z/live"}}) {
+        EXPECT_EQ(ReplaceShareName(path, "z"), renamed) << path;
+    }
+    for (const auto& [text, prefix, starts] : {std::tuple{"abc", "", true}, {"abc", "ab", true}, {"abc", "abc", true},
+                                               {"ab", "abc", false}, {"Abc", "ab", false}}) {
+        EXPECT_EQ(StringStartWith(text, prefix), starts) << text << " " << prefix;
+    }
     const auto obj = testkit::J(R"({"one": 1, "t": true, "s": "x", "n": null})");
+    bool flag = true;
     EXPECT_FALSE(RetrieveBoolFromJsonObj(flag, "one", obj));
     EXPECT_FALSE(RetrieveBoolFromJsonObj(flag, "missing", obj));
     EXPECT_FALSE(RetrieveBoolFromJsonObj(flag, "t", testkit::J("[true]")));
-    EXPECT_TRUE(flag);
+    EXPECT_TRUE(flag);  // untouched by a failed read
     flag = false;
     EXPECT_TRUE(RetrieveBoolFromJsonObj(flag, "t", obj));
     EXPECT_TRUE(flag);
+    std::string text = "keep";
     EXPECT_FALSE(RetrieveStringFromJsonObj(text, "n", obj));
     EXPECT_FALSE(RetrieveStringFromJsonObj(text, "one", obj));
     EXPECT_EQ(text, "keep");

@@ -15,19 +15,28 @@ protected:
     void Index(const std::string& conf) { testkit::WriteFile(FolderConf(), conf); }
 };
 
+// Inside a folder means on a slash boundary; share names and paths are case-sensitive.
 TEST_F(QueriesTest, PathsInsideAndContainingAFolder) {
-    Index(R"({"/music/live": {"name": "Live"}})");
+    Index(R"({"/music/live": {"name": "Live"}, "/Music/a": {}})");
     struct Case {
         const char* path;
         bool inside, contains;
     } cases[] = {{"/music/live", true, true},     {"/music/live/2015", true, false}, {"/music/live/", true, false},
                  {"/music/liveset", false, false}, {"/music", false, true},         {"/Music/live", false, false},
-                 {"/mus", false, false}};
+                 {"/mus", false, false},           {"/Music/a/b", true, false},     {"/music/a/b", false, false}};
     for (const auto& c : cases) {
         SCOPED_TRACE(c.path);
         EXPECT_EQ(IndexMgr::IsPathIndexed(c.path), c.inside);
+        EXPECT_EQ(FILEIDXIsPathIndexed(c.path), c.inside ? 1 : 0);
         EXPECT_EQ(IndexMgr::IsPathContainIndexed(c.path), c.contains);
     }
+    for (const auto& [share, indexed] : {std::pair{"Music", true}, {"music", true}, {"MUSIC", false}, {"x", false}}) {
+        EXPECT_EQ(IndexMgr::IsShareIndexed(share), indexed) << share;
+        EXPECT_EQ(FILEIDXIsShareIndexed(share), indexed ? 1 : 0) << share;
+    }
+    EXPECT_EQ(FILEIDXIsShareIndexed(nullptr), 0);
+    EXPECT_EQ(FILEIDXIsPathIndexed(nullptr), 0);
+    EXPECT_EQ(FILEIDXIsFullPathIndexed(nullptr), 0);
 }
 
 TEST_F(QueriesTest, FullPathsAndTheUnresolvableFolder) {
@@ -40,40 +49,20 @@ TEST_F(QueriesTest, FullPathsAndTheUnresolvableFolder) {
     Index(R"({"/gone/x": {}})");
     EXPECT_TRUE(IndexMgr::IsFullPathIndexed("/elsewhere/entirely"));
     EXPECT_TRUE(testkit::Logged("Failed to get full path from /gone/x"));
-}
-
-TEST_F(QueriesTest, ShareNamesAreCaseSensitive) {
-    Index(R"({"/Music/a": {}})");
-    EXPECT_TRUE(IndexMgr::IsShareIndexed("Music"));
-    EXPECT_FALSE(IndexMgr::IsShareIndexed("music"));
-    EXPECT_EQ(FILEIDXIsShareIndexed("Music"), 1);
-    EXPECT_EQ(FILEIDXIsShareIndexed("music"), 0);
-    EXPECT_EQ(FILEIDXIsPathIndexed("/Music/a/b"), 1);
-    EXPECT_EQ(FILEIDXIsPathIndexed("/music/a/b"), 0);
-    EXPECT_EQ(FILEIDXIsShareIndexed(nullptr), 0);
-    EXPECT_EQ(FILEIDXIsPathIndexed(nullptr), 0);
-    EXPECT_EQ(FILEIDXIsFullPathIndexed(nullptr), 0);
-}
-
-TEST_F(QueriesTest, EmptyShareNamesAreLoggedAndSkipped) {
-    Index(R"({"": {}, "/music/a": {}})");
+    Index(R"({"": {}, "/music/a": {}})");  // an empty share name is logged and skipped
     EXPECT_TRUE(IndexMgr::IsShareIndexed("music"));
     EXPECT_FALSE(IndexMgr::IsShareIndexed("x"));
     EXPECT_TRUE(testkit::Logged("Failed to get share name from path: "));
 }
 
-TEST_F(QueriesTest, NoFileMeansNothingIndexed) {
+// No file means nothing indexed; a malformed one answers no everywhere and says why.
+TEST_F(QueriesTest, MissingOrMalformedFileAnswersNo) {
     std::vector<Folder> list(3);
     EXPECT_TRUE(IndexMgr::List(list));
     EXPECT_TRUE(list.empty());
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NONE);
     EXPECT_FALSE(IndexMgr::IsPathIndexed("/music"));
-    EXPECT_FALSE(IndexMgr::IsShareIndexed("music"));
-}
-
-TEST_F(QueriesTest, MalformedFileAnswersNoEverywhere) {
     Index("[\"/music/a\"]");
-    std::vector<Folder> list;
     EXPECT_FALSE(IndexMgr::List(list));
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_MALFORMED_FOLDERS);
     EXPECT_EQ(FILEIDXIsShareIndexed("music"), 0);

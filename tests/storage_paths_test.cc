@@ -27,36 +27,26 @@ TEST_F(StoragePathsTest, PathsLieInTheSharesEaDirAndTheDatabaseIsCreated) {
 TEST_F(StoragePathsTest, BadArgumentsFailBeforeAnyLookup) {
     AddShare("music");
     char buffer[64];
-    struct Case {
-        const char* name;
-        char* out;
-        int size;
-        const char* message;
+    using Getter = int (*)(const char*, char*, int);
+    const std::tuple<Getter, const char*, char*, int, const char*> cases[] = {
+        {FILEIDXQueuePathGet, nullptr, buffer, 64, "Invaild Argument (__null != szName)=[0]\n"},
+        {FILEIDXQueuePathGet, "music", nullptr, 64, "Invaild Argument (__null != szOutQueuePath)=[0]\n"},
+        {FILEIDXQueuePathGet, "music", buffer, 0, "Invaild Argument (cbOutLen > 0)=[0]\n"},
+        {FILEIDXQueuePathGet, "music", buffer, -5, "Invaild Argument (cbOutLen > 0)=[-5]\n"},
+        {FILEIDXDBPathGet, "music", nullptr, 10, "Invaild Argument (__null != szOutDBPath)=[0]\n"},
     };
-    const Case cases[] = {
-        {nullptr, buffer, 64, "Invaild Argument (__null != szName)=[0]\n"},
-        {"music", nullptr, 64, "Invaild Argument (__null != szOutQueuePath)=[0]\n"},
-        {"music", buffer, 0, "Invaild Argument (cbOutLen > 0)=[0]\n"},
-        {"music", buffer, -5, "Invaild Argument (cbOutLen > 0)=[-5]\n"},
-    };
-    for (const auto& c : cases) {
-        SCOPED_TRACE(c.message);
+    for (const auto& [get, name, out, size, message] : cases) {
+        SCOPED_TRACE(message);
         testkit::ClearLog();
         QLIBCErrSetEx(0, "", 0);
-        EXPECT_EQ(FILEIDXQueuePathGet(c.name, c.out, c.size), -1);
-        EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{c.message});
+        EXPECT_EQ(get(name, out, size), -1);
+        EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{message});
         EXPECT_EQ(QLIBCErrGet(), 0x0D00);
         EXPECT_STREQ(QLIBCErrorGetFile(), "storage_paths.cc");
     }
-    testkit::ClearLog();
-    EXPECT_EQ(FILEIDXDBPathGet("music", nullptr, 10), -1);
-    EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"Invaild Argument (__null != szOutDBPath)=[0]\n"});
     EXPECT_FALSE(testkit::Exists(ShareDir("music") + "/@eaDir"));
-}
-
-TEST_F(StoragePathsTest, UnknownShareFails) {
-    char buffer[4096];
     qira_sim::InjectFault("QIRAShareGet", 0x0B01);
+    testkit::ClearLog();
     EXPECT_EQ(FILEIDXQueuePathGet("nosuch", buffer, sizeof buffer), -1);
     EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"QIRAShareGet failed, name=nosuch, code=2817"});
 }
