@@ -50,7 +50,7 @@ TEST_F(ConfigTest, UnparsableFilesFailWithErrorSixAndTheirPath) {
     }
 }
 
-TEST_F(ConfigTest, SaveReplacesTheFileWithMode0644AndNoTemporaryLeft) {
+TEST_F(ConfigTest, SaveReplacesTheFileWithMode0644AndFailsWithErrorSevenWithoutItsDirectory) {
     Status status;
     status.Pause(0);
     ASSERT_TRUE(status.Save());
@@ -59,46 +59,35 @@ TEST_F(ConfigTest, SaveReplacesTheFileWithMode0644AndNoTemporaryLeft) {
     ASSERT_EQ(stat(StatusConf().c_str(), &st), 0);
     EXPECT_EQ(st.st_mode & 0777, 0644u);
     EXPECT_FALSE(testkit::Exists(StatusConf() + ".tmp"));
-}
-
-TEST_F(ConfigTest, SaveIntoAMissingDirectoryFailsWithErrorSeven) {
+    unlink(StatusConf().c_str());
     rmdir(Path("/usr/qira/etc/fileindex").c_str());
-    Status status;
     EXPECT_FALSE(status.Save());
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_SAVE_JSON);
     EXPECT_TRUE(Logged("Failed to save json to " + StatusConf()));
 }
 
-TEST_F(ConfigTest, ExclusiveLockFailsWhileAnotherProcessHoldsAShareLock) {
-    testkit::ChildHolding reader([] {
-        Folders folders;
-        return folders.Lock(false);
-    });
-    ASSERT_TRUE(reader.Took());
-    Folders shared;
-    EXPECT_TRUE(shared.Lock(false));
-    shared.Unlock();
-    Folders writer;
-    EXPECT_FALSE(writer.Lock(true));
-    writer.Unlock();
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
-    EXPECT_TRUE(Logged("Failed to lock folder"));
-}
-
-// Each configuration has its own lock file; two descriptors of one process conflict too; an
-// unlock without a lock does nothing and an unlocked file can be taken again.
-TEST_F(ConfigTest, LocksAreOneFilePerConfigurationAndFreeAfterUnlock) {
-    Folders never;
+// A shared lock held by another process lets shared locks in and keeps an exclusive one out; each
+// configuration has its own lock file; two descriptors of one process conflict too; an unlock
+// without a lock does nothing and an unlocked file can be taken again.
+TEST_F(ConfigTest, LocksConflictPerConfigurationAndAreFreeAfterUnlock) {
+    {
+        testkit::ChildHolding reader([] { return Folders().Lock(false); });
+        ASSERT_TRUE(reader.Took());
+        Folders shared, writer;
+        EXPECT_TRUE(shared.Lock(false));
+        shared.Unlock();
+        EXPECT_FALSE(writer.Lock(true));
+        writer.Unlock();
+        EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
+    }
+    Folders never, first, second;
     never.Unlock();
-    Folders first;
     ASSERT_TRUE(first.Lock(true));
-    Status status;
+    Status status, other;
     EXPECT_TRUE(status.Lock(true));
-    Folders second;
-    Status other;
     EXPECT_FALSE(second.Lock(true));
     EXPECT_FALSE(other.Lock(true));
-    EXPECT_EQ(testkit::LogMessages(), (std::vector<std::string>{"Failed to lock folder", "Failed to lock folder"}));
+    EXPECT_EQ(testkit::LogMessages(), (std::vector<std::string>{"Failed to lock folder", "Failed to lock folder", "Failed to lock folder"}));
     for (Config* held : std::vector<Config*>{&second, &other, &status, &first}) held->Unlock();
     Folders third;
     EXPECT_TRUE(third.Lock(true));

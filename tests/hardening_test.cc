@@ -15,22 +15,24 @@ protected:
     std::string outside_;
 };
 
-TEST_F(PlantedLinkTest, SymlinkedQueueIsRefusedAndTheShareMarked) {
+// A queue that is a symbolic link or has a second name is refused and its share marked.
+TEST_F(PlantedLinkTest, LinkedQueueIsRefusedAndTheShareMarked) {
     Canary canary(outside_ + "/target");
+    const std::string userFile = music_ + "/user-file";
+    testkit::WriteFile(userFile, "user data");
     MakeDir(music_ + "/@eaDir");
-    ASSERT_EQ(symlink((outside_ + "/target").c_str(), QueueOf("music").c_str()), 0);
-    EXPECT_FALSE(AddCustomEvent(kEventReindex, music_ + "/a", Json::Value()));
-    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
+    for (const bool symbolic : {true, false}) {
+        SCOPED_TRACE(symbolic ? "symbolic" : "hard");
+        unlink(QueueOf("music").c_str());
+        unlink(StatusConf().c_str());
+        ASSERT_EQ(symbolic ? symlink((outside_ + "/target").c_str(), QueueOf("music").c_str())
+                           : link(userFile.c_str(), QueueOf("music").c_str()),
+                  0);
+        EXPECT_FALSE(AddCustomEvent(kEventReindex, music_ + "/a", Json::Value()));
+        EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
+    }
     canary.ExpectUntouched();
-}
-
-TEST_F(PlantedLinkTest, HardLinkedQueueIsRefused) {
-    const std::string target = music_ + "/user-file";
-    testkit::WriteFile(target, "user data");
-    MakeDir(music_ + "/@eaDir");
-    ASSERT_EQ(link(target.c_str(), QueueOf("music").c_str()), 0);
-    EXPECT_FALSE(AddCustomEvent(kEventReindex, music_ + "/a", Json::Value()));
-    EXPECT_EQ(testkit::ReadFile(target), "user data");
+    EXPECT_EQ(testkit::ReadFile(userFile), "user data");
 }
 
 TEST_F(PlantedLinkTest, SymlinkedEaDirIsRefusedForQueueAndDatabase) {
@@ -69,49 +71,37 @@ TEST_F(PlantedLinkTest, SymlinkedDatabaseDirectoryIsLeftAlone) {
     canary.ExpectUntouched();
 }
 
-class DaemonFaultTest : public testkit::Sandbox {
-protected:
-    // A server in a child process that accepts one connection and then behaves as told.
-    template <typename Behaviour>
-    pid_t Serve(Behaviour behaviour) {
-        const std::string path = DaemonSocketPath();
+class DaemonFaultTest : public testkit::Sandbox {};
+
+// Neither a daemon that never reads nor one that closes at once keeps the caller (RunBounded ends
+// one that hangs), and the close raises no SIGPIPE.
+TEST_F(DaemonFaultTest, AStuckOrClosingDaemonDoesNotHoldTheCaller) {
+    const std::vector<std::tuple<const char*, std::function<void(int)>, size_t, int>> cases = {
+        {"never reads", [](int) { pause(); }, 5000, 1},  // the socket buffer takes it
+        {"closes at once", [](int client) { shutdown(client, SHUT_RDWR); }, 1 << 20, 0},  // larger than the buffer
+    };
+    for (const auto& [name, behaviour, size, result] : cases) {
+        SCOPED_TRACE(name);
         int ready[2];
-        if (pipe(ready) != 0) return -1;
-        const pid_t pid = fork();
-        if (pid == 0) {
-            const int fd = testkit::ListenUnix(path, 4);
-            if (write(ready[1], "r", 1) != 1) _exit(1);
-            const int client = accept(fd, nullptr, nullptr);
-            behaviour(client);
+        ASSERT_EQ(pipe(ready), 0);
+        unlink(DaemonSocketPath().c_str());
+        const pid_t daemon = fork();
+        if (daemon == 0) {
+            const int fd = testkit::ListenUnix(DaemonSocketPath(), 4);
+            if (fd < 0 || write(ready[1], "r", 1) != 1) _exit(1);
+            behaviour(accept(fd, nullptr, nullptr));
             _exit(0);
         }
+        close(ready[1]);
         char c;
-        if (read(ready[0], &c, 1) != 1) return -1;
-        return pid;
+        ASSERT_EQ(read(ready[0], &c, 1), 1);
+        Json::Value data(Json::objectValue);
+        data["folder_path"] = std::string(size, 'x');
+        EXPECT_EQ(testkit::RunBounded(60, [&] { return SendCammandToDaemon("upsert_folder_setting", data); }), result);
+        kill(daemon, SIGKILL);
+        waitpid(daemon, nullptr, 0);
+        close(ready[0]);
     }
-};
-
-// Neither a daemon that never reads nor one that closes at once keeps the caller: RunBounded ends
-// a caller that hangs.
-TEST_F(DaemonFaultTest, DaemonThatNeverReadsDoesNotHoldTheCaller) {
-    const pid_t pid = Serve([](int) { pause(); });
-    Json::Value big(Json::objectValue);  // the socket buffer takes it
-    big["folder_path"] = std::string(5000, 'x');
-    EXPECT_EQ(testkit::RunBounded(60, [&] { return SendCammandToDaemon("upsert_folder_setting", big); }), 1);
-    kill(pid, SIGKILL);
-    waitpid(pid, nullptr, 0);
-}
-
-TEST_F(DaemonFaultTest, DaemonThatClosesAtOnceFailsWithoutSigpipe) {
-    const pid_t pid = Serve([](int client) {
-        shutdown(client, SHUT_RDWR);
-        close(client);
-    });
-    // Larger than the socket buffer, so the close is met whenever it happens.
-    Json::Value huge(Json::objectValue);
-    huge["folder_path"] = std::string(1 << 20, 'x');
-    EXPECT_EQ(testkit::RunBounded(60, [&] { return SendCammandToDaemon("upsert_folder_setting", huge); }), 0);
-    waitpid(pid, nullptr, 0);
 }
 
 }  // namespace
