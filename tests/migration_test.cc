@@ -33,25 +33,19 @@ TEST_F(MigrationTest, ConfiguredFoldersAreRegisteredOncePerShareAndReindexed) {
 
 TEST_F(MigrationTest, EachStepFailingEndsTheMigration) {
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/photo/a": {}})");
-    struct Case {
-        const char* op;
-        const char* arg;
-        std::string message;
-        size_t journalled;
+    const std::tuple<const char*, const char*, size_t> cases[] = {
+        {"QLIBServiceStart", "QLIBServiceStart failed: err=[0x00C1 sim/QLIBServiceStart:1]", 1},
+        {"QIRASMBSetSpotlight", "QIRASMBSetSpotlight failed: err=[0x00C1 sim/QIRASMBSetSpotlight:1]", 2},
+        {"MonitorQueue::Upsert", "UpsertQIRANotifydCfg failed, share=music", 3},
     };
-    const Case cases[] = {
-        {"QLIBServiceStart", "", "QLIBServiceStart failed: err=[0x00C1 sim/QLIBServiceStart:1]", 1},
-        {"QIRASMBSetSpotlight", "", "QIRASMBSetSpotlight failed: err=[0x00C1 sim/QIRASMBSetSpotlight:1]", 2},
-        {"MonitorQueue::Upsert", "", "UpsertQIRANotifydCfg failed, share=music", 3},
-    };
-    for (const auto& c : cases) {
-        SCOPED_TRACE(c.op);
+    for (const auto& [op, message, journalled] : cases) {
+        SCOPED_TRACE(op);
         qira_sim::ClearFaults();
-        qira_sim::InjectFault(c.op, 0xC1, c.arg);
+        qira_sim::InjectFault(op, 0xC1);
         Settle();
-        EXPECT_FALSE(Updater_lum60_beta2()) << c.op;
-        EXPECT_TRUE(testkit::Logged(c.message)) << c.op;
-        EXPECT_EQ(qira_sim::Journal().size(), c.journalled) << c.op;
+        EXPECT_FALSE(Updater_lum60_beta2());
+        EXPECT_TRUE(testkit::Logged(message));
+        EXPECT_EQ(qira_sim::Journal().size(), journalled);
         EXPECT_FALSE(testkit::Exists(QueueOf("music")));
     }
     qira_sim::ClearFaults();
