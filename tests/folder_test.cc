@@ -66,7 +66,7 @@ TEST_F(FolderTest, SaveWritesSortedMembersWithTheSixKeysOnly) {
     EXPECT_EQ(list[0].path, "/music/b");
 }
 
-TEST_F(FolderTest, LoadTakesTheMemberNameAndKeepsUnresolvableFolders) {
+TEST_F(FolderTest, LoadTakesTheMemberNameKeepsUnresolvableFoldersAndReplacesNothing) {
     testkit::WriteFile(FolderConf(), R"({"/music/x": {"path": "/other/y", "name": "X"}, "/gone/z": {"name": "Z"},
                                         "/music/n": 7})");
     Folders folders;
@@ -80,17 +80,14 @@ TEST_F(FolderTest, LoadTakesTheMemberNameAndKeepsUnresolvableFolders) {
     EXPECT_EQ(list[1].name, "");
     EXPECT_EQ(list[2].path, "/music/x");
     EXPECT_EQ(list[2].name, "X");
-}
-
-TEST_F(FolderTest, LoadAddsToTheMapWithoutReplacing) {
-    Folders folders;
+    // A second load adds to the map without replacing what it holds.
     UpsertOne(folders, R"({"path": "/music/x", "name": "memory"})");
     testkit::WriteFile(FolderConf(), R"({"/music/x": {"name": "disk"}, "/music/y": {"name": "Y"}})");
     ASSERT_TRUE(folders.Load());
     Json::Value out;
     ASSERT_TRUE(folders.Get(out, "/music/x"));
     EXPECT_EQ(out["name"].asString(), "memory");
-    EXPECT_EQ(folders.Count(), 2u);
+    EXPECT_EQ(folders.Count(), 4u);
 }
 
 TEST_F(FolderTest, MalformedFolderConfFailsWithErrorEight) {
@@ -103,19 +100,6 @@ TEST_F(FolderTest, MalformedFolderConfFailsWithErrorEight) {
         EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_MALFORMED_FOLDERS);
         EXPECT_TRUE(testkit::Logged(std::string("Malformed folders: ") + text));
     }
-}
-
-TEST_F(FolderTest, GetFindsExactKeysOnly) {
-    Folders folders;
-    UpsertOne(folders, R"({"path": "/music/Live"})");
-    UpsertOne(folders, R"({"path": "/music/LIVE"})");
-    EXPECT_EQ(folders.Count(), 2u);
-    Json::Value out = "untouched";
-    EXPECT_FALSE(folders.Get(out, "/music/live"));
-    EXPECT_EQ(out.asString(), "untouched");
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NO_SUCH_FOLDER);
-    EXPECT_TRUE(testkit::Logged("No such folder: /music/live"));
-    EXPECT_TRUE(folders.Get(out, "/music/Live"));
 }
 
 TEST_F(FolderTest, ChangeReportsAgainstTheGoverningFolder) {

@@ -78,8 +78,9 @@ TEST_F(QueriesTest, GetTakesTheExclusiveLock) {
     Json::Value out;
     ASSERT_TRUE(IndexMgr::Get(out, "/music/a"));
     EXPECT_EQ(out["name"].asString(), "A");
-    EXPECT_FALSE(IndexMgr::Get(out, "/music/b"));
+    EXPECT_FALSE(IndexMgr::Get(out, "/Music/a"));
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NO_SUCH_FOLDER);
+    EXPECT_TRUE(testkit::Logged("No such folder: /Music/a"));
     Folders holder;
     ASSERT_TRUE(holder.Lock(false));
     EXPECT_FALSE(IndexMgr::Get(out, "/music/a"));
