@@ -1,4 +1,4 @@
-// Why a path is or is not indexed, how far indexing has got, and the commands over both.
+// Why a path is or is not indexed, and how far indexing has got.
 #include "testkit.h"
 
 namespace {
@@ -97,57 +97,6 @@ TEST_F(ExplainTest, ProgressCountsLinesPerShareAndRecordsPerFolder) {
     testkit::ClearLog();
     ASSERT_TRUE(GetProgress(out));
     EXPECT_TRUE(testkit::LogLines().empty());  // each malformed line is logged once per process
-}
-
-class InsightToolTest : public testkit::IndexFixture {
-protected:
-    testkit::RunResult Ctl(std::vector<std::string> args) {
-        args.insert(args.begin(), FILEINDEXCTL);
-        return testkit::Run(args);
-    }
-    void Seed() {
-        testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
-        MakeDir(music_ + "/@eaDir");
-        testkit::WriteFile(QueueOf("music"), "{\"event\":1,\"path\":\"" + music_ + "/a/x\"}\n");
-    }
-};
-
-TEST_F(InsightToolTest, WaitEndsWhenFinishedOrAtItsTimeOut) {
-    Seed();
-    ASSERT_TRUE(StatusMgr::Pause(0));
-    EXPECT_EQ(Ctl({"wait", "--timeout", "0.2"}).status, 3);  // paused with work pending
-    unlink(QueueOf("music").c_str());                        // drained
-    const auto result = Ctl({"wait", "--timeout", "5", "--json"});
-    EXPECT_EQ(result.status, 0);
-    EXPECT_EQ(testkit::ParseJson(result.out)["result"]["status"].asString(), "finished");
-}
-
-TEST_F(InsightToolTest, WatchWritesJsonLinesOffATerminalAndBarsOnOne) {
-    Seed();
-    const auto lines = Ctl({"progress", "--watch", "--samples", "2", "--interval", "0.05"});
-    ASSERT_EQ(lines.status, 0) << lines.err;
-    std::istringstream in(lines.out);
-    int samples = 0;
-    for (std::string line; std::getline(in, line); ++samples) {
-        EXPECT_EQ(testkit::ParseJson(line)["shares"][0]["pending"].asUInt(), 1u);
-    }
-    EXPECT_EQ(samples, 2);
-    const auto screen = testkit::Run({"/usr/bin/script", "-qec",
-                                      std::string(FILEINDEXCTL) + " progress --watch --samples 2 --interval 0.05",
-                                      "/dev/null"});
-    ASSERT_EQ(screen.status, 0) << screen.err;
-    EXPECT_NE(screen.out.find("\033[H\033[J"), std::string::npos);
-    EXPECT_NE(screen.out.find("music [------------------------------] 1 pending"), std::string::npos) << screen.out;
-}
-
-// The first problem in words, and a folder without a name called so.
-TEST_F(InsightToolTest, ExplainSaysWhatIsWrongInWords) {
-    testkit::WriteFile(FolderConf(), R"({"/music/gone": {}})");
-    const auto explain = Ctl({"explain", "/music/gone"}).out;
-    EXPECT_EQ(explain.rfind("/music/gone: cannot be indexed: the directory does not exist (refused by canonical_path)\n", 0), 0u)
-        << explain;
-    EXPECT_NE(explain.find("governing folder: /music/gone (unnamed; document no, audio no, video no, photo no)"),
-              std::string::npos);
 }
 
 }  // namespace

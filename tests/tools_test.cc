@@ -31,12 +31,19 @@ TEST_F(ToolTest, FoldersRoundTripThroughJsonOutput) {
     EXPECT_EQ(testkit::ParseJson(result.out)["result"]["name"].asString(), "Songs");
 }
 
-TEST_F(ToolTest, RequestsComeFromStandardInput) {
-    const auto result = Ctl({"folder", "set", "--request", "-"}, R"([{"path": "/photo/a", "photo": true}])");
+// A request comes from standard input; --root stands in for the environment, in both tools.
+TEST_F(ToolTest, RequestsComeFromStandardInputAndTheRootFromTheOption) {
+    const std::string root = Path("");
+    unsetenv("QIRA_ROOT");
+    const auto result = Ctl({"--root", root, "folder", "set", "--request", "-"}, R"([{"path": "/photo/a", "photo": true}])");
+    const auto shares = testkit::Run({QIRA_SIM, "--root", root, "--json", "share", "list"});
+    setenv("QIRA_ROOT", root.c_str(), 1);
     ASSERT_EQ(result.status, 0) << result.err;
     EXPECT_TRUE(Conf()["/photo/a"]["photo"].asBool());
+    ASSERT_EQ(shares.status, 0) << shares.err;
+    EXPECT_TRUE(testkit::ParseJson(shares.out)["ok"].asBool());
+    EXPECT_EQ(testkit::ParseJson(shares.out)["result"]["music"]["path"].asString(), music_);
 }
-
 // 0 yes, 1 no, 2 when the answer could not be worked out.
 TEST_F(ToolTest, QuestionsAnswerByExitStatus) {
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
@@ -238,20 +245,6 @@ TEST_F(ToolTest, UsageErrorsExitTwoAndEveryToolTellsItsVersion) {
     }
 }
 
-TEST_F(ToolTest, RootOptionStandsInForTheEnvironment) {
-    const std::string root = Path("");
-    unsetenv("QIRA_ROOT");
-    const auto result = testkit::Run({FILEINDEXCTL, "--root", root, "share", "paths", "music"});
-    const auto shares = testkit::Run({QIRA_SIM, "--root", root, "--json", "share", "list"});
-    setenv("QIRA_ROOT", root.c_str(), 1);
-    ASSERT_EQ(result.status, 0) << result.err;
-    EXPECT_NE(result.out.find(QueueOf("music")), std::string::npos);
-    ASSERT_EQ(shares.status, 0) << shares.err;
-    const auto envelope = testkit::ParseJson(shares.out);
-    EXPECT_TRUE(envelope["ok"].asBool());
-    EXPECT_EQ(envelope["result"]["music"]["path"].asString(), music_);
-}
-
 TEST_F(ToolTest, BashCompletionOffersCommandsOptionsAndIndexedFolders) {
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/b": {}, "/photo/a": {}})");
     const std::string tools = std::string(FILEINDEXCTL).substr(0, std::string(FILEINDEXCTL).rfind('/'));
@@ -321,6 +314,39 @@ TEST_F(ToolTest, ListingPagesDescendingAndTellsWhyAFolderIsNotIndexable) {
     EXPECT_EQ(added.status, 0);
     EXPECT_EQ(added.err, "fileindexctl: warning: /music/ghost cannot be indexed now: the directory does not exist "
                          "(canonical_path); it stays listed as not valid until that changes\n");
+}
+
+// wait ends when indexing is finished, or at its time-out with 3 while work is pending; progress
+// --watch writes JSON lines off a terminal and bars on one.
+TEST_F(ToolTest, WaitAndWatchFollowThePendingWork) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
+    MakeDir(music_ + "/@eaDir");
+    testkit::WriteFile(QueueOf("music"), "{\"event\":1,\"path\":\"" + music_ + "/a/x\"}\n");
+    const auto lines = Ctl({"progress", "--watch", "--samples", "2", "--interval", "0.05"});
+    ASSERT_EQ(lines.status, 0) << lines.err;
+    ASSERT_EQ(Lines(lines.out).size(), 2u);
+    for (const std::string& line : Lines(lines.out)) EXPECT_EQ(testkit::ParseJson(line)["shares"][0]["pending"].asUInt(), 1u);
+    const auto screen = testkit::Run({"/usr/bin/script", "-qec",
+                                      std::string(FILEINDEXCTL) + " progress --watch --samples 2 --interval 0.05", "/dev/null"});
+    ASSERT_EQ(screen.status, 0) << screen.err;
+    EXPECT_NE(screen.out.find("\033[H\033[J"), std::string::npos);
+    EXPECT_NE(screen.out.find("music [------------------------------] 1 pending"), std::string::npos) << screen.out;
+    ASSERT_TRUE(StatusMgr::Pause(0));
+    EXPECT_EQ(Ctl({"wait", "--timeout", "0.2"}).status, 3);  // paused with work pending
+    unlink(QueueOf("music").c_str());                        // drained
+    const auto result = Ctl({"wait", "--timeout", "5", "--json"});
+    EXPECT_EQ(result.status, 0);
+    EXPECT_EQ(testkit::ParseJson(result.out)["result"]["status"].asString(), "finished");
+}
+
+// explain names the first problem in words, and a folder without a name is called so.
+TEST_F(ToolTest, ExplainSaysWhatIsWrongInWords) {
+    testkit::WriteFile(FolderConf(), R"({"/music/gone": {}})");
+    const auto explain = Ctl({"explain", "/music/gone"}).out;
+    EXPECT_EQ(explain.rfind("/music/gone: cannot be indexed: the directory does not exist (refused by canonical_path)\n", 0), 0u)
+        << explain;
+    EXPECT_NE(explain.find("governing folder: /music/gone (unnamed; document no, audio no, video no, photo no)"),
+              std::string::npos);
 }
 
 class DaemonStandInTest : public testkit::IndexFixture {
