@@ -80,30 +80,23 @@ TEST_F(LiveApplianceTest, FilesAndDirectoriesAreFoundWhileTheyAreThereAndWhereTh
 }
 
 // Files under "@eaDir", outside indexed folders, and of a kind the folder does not index never
-// reach the index: a later file that did shows that their changes were seen and passed over.
-TEST_F(LiveApplianceTest, EaDirOutsideFoldersAndSwitchedOffKindsStayOut) {
+// reach the index, nor do those of a deleted folder, whose entries leave it: a later file that did
+// shows that their changes were seen and passed over.
+TEST_F(LiveApplianceTest, EaDirOutsideFoldersSwitchedOffKindsAndDeletedFoldersStayOut) {
     Index("/music/a", R"("document": true, "audio": false)");
+    Index("/music/c", R"("document": true)");
     MakeDir(music_ + "/a/@eaDir/inner");
     testkit::WriteFile(music_ + "/a/@eaDir/inner/hidden.txt", "secret");
     testkit::WriteFile(music_ + "/b/outside.txt", "secret");
     testkit::WriteFile(music_ + "/a/secret.mp3", "");
+    testkit::WriteFile(music_ + "/c/before.txt", "secret");
     testkit::WriteFile(music_ + "/a/sentinel.txt", "secret");
-    EXPECT_TRUE(Finds("secret", Paths{"/music/a/sentinel.txt"}));
+    EXPECT_TRUE(Finds("secret", (Paths{"/music/a/sentinel.txt", "/music/c/before.txt"})));
+    ASSERT_TRUE(IndexMgr::Delete(J(R"(["/music/c"])")));
+    ASSERT_TRUE(testkit::WaitFor([&] { return Logged(notifierLog_, "no longer watching " + music_ + "/c\n"); }));
+    testkit::WriteFile(music_ + "/c/after.txt", "secret");
     ASSERT_TRUE(IndexMgr::Upsert(J(R"([{"path": "/music/a", "audio": true}])")));  // the switch turned on
     EXPECT_TRUE(Finds("secret", (Paths{"/music/a/secret.mp3", "/music/a/sentinel.txt"})));
-}
-
-TEST_F(LiveApplianceTest, ADeletedFolderIsNoLongerWatchedNorInTheIndex) {
-    Index("/music/a", R"("document": true)");
-    Index("/music/b", R"("document": true)");
-    testkit::WriteFile(music_ + "/a/before.txt", "word");
-    EXPECT_TRUE(Finds("word", Paths{"/music/a/before.txt"}));
-    ASSERT_TRUE(IndexMgr::Delete(J(R"(["/music/a"])")));
-    ASSERT_TRUE(testkit::WaitFor([&] { return Logged(notifierLog_, "no longer watching " + music_ + "/a\n"); }));
-    EXPECT_TRUE(Finds("word", Paths{}));
-    testkit::WriteFile(music_ + "/a/after.txt", "word");
-    testkit::WriteFile(music_ + "/b/sentinel.txt", "word");
-    EXPECT_TRUE(Finds("word", Paths{"/music/b/sentinel.txt"}));
 }
 
 // Changes the kernel dropped are recovered by reindex records for every registered folder.
