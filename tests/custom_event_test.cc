@@ -32,32 +32,26 @@ TEST_F(CustomEventTest, FirstEventCreatesTheQueueWithOneWholeLine) {
     EXPECT_EQ(records[1], J("{\"event\": 65536, \"path\": \"" + dir_ + "/b\", \"data\": null}"));
 }
 
+// A pending reindex of exactly the path, in the queue or its companion, suppresses any event;
+// other records, other paths and unreadable lines do not.
 TEST_F(CustomEventTest, APendingReindexOfExactlyThePathSuppressesAnyEvent) {
     MakeDir(dir_ + "/@eaDir");
-    const std::string queued = "{\"event\":65536,\"path\":\"" + dir_ + "/a\",\"data\":null}\n";
-    testkit::WriteFile(QueueOf("s"), "garbage\n{\"event\":\"x\",\"path\":1}\n" + queued);
-    EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/a", J("{}")));
-    EXPECT_TRUE(AddCustomEvent(kEventReindex, dir_ + "/a", J("{}")));
-    EXPECT_EQ(testkit::ReadFile(QueueOf("s")), "garbage\n{\"event\":\"x\",\"path\":1}\n" + queued);
-    for (const std::string& other : std::vector<std::string>{dir_ + "/a/b", dir_, dir_ + "/A"}) {
-        SCOPED_TRACE(other);
+    const auto reindexOf = [](const std::string& path) { return "{\"event\":65536,\"path\":\"" + path + "\",\"data\":null}\n"; };
+    const std::string before = "garbage\n{\"event\":\"x\",\"path\":1}\n{\"event\":131072,\"path\":\"" + dir_ + "/b\"}\n" +
+                               reindexOf(dir_ + "/a") + "{\"event\":65536,\"path\":\"" + dir_ + "\\/e\"}\n";  // an escaped slash
+    testkit::WriteFile(QueueOf("s"), before);
+    testkit::WriteFile(QueueOf("s") + ".tmp", reindexOf(dir_ + "/c"));
+    for (const std::string& covered : {dir_ + "/a", dir_ + "/c", dir_ + "/e"}) {
+        EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, covered, J("{}")));
+        EXPECT_TRUE(AddCustomEvent(kEventReindex, covered, J("{}")));
+    }
+    EXPECT_EQ(testkit::ReadFile(QueueOf("s")), before);
+    for (const std::string& other : {dir_ + "/a/b", dir_, dir_ + "/A", dir_ + "/b"}) {
         EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, other, J("{}")));
     }
+    EXPECT_EQ(testkit::ReadJsonLines(QueueOf("s") + ".tmp").size(), 1u);
     const std::string content = testkit::ReadFile(QueueOf("s"));
-    EXPECT_EQ(std::count(content.begin(), content.end(), '\n'), 6);
-}
-
-TEST_F(CustomEventTest, OnlyReindexRecordsSuppressAndTheTmpCompanionCounts) {
-    MakeDir(dir_ + "/@eaDir");
-    testkit::WriteFile(QueueOf("s"), "{\"event\":131072,\"path\":\"" + dir_ + "/a\",\"data\":{}}\n");
-    EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/a", J("{}")));
-    EXPECT_EQ(testkit::ReadJsonLines(QueueOf("s")).size(), 2u);
-    testkit::WriteFile(QueueOf("s") + ".tmp", "{\"event\":65536,\"path\":\"" + dir_ + "/c\",\"data\":null}\n");
-    EXPECT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/c", J("{}")));
-    EXPECT_EQ(testkit::ReadJsonLines(QueueOf("s")).size(), 2u);
-    testkit::WriteFile(QueueOf("s"), "{\"event\":65536,\"path\":\"" + dir_ + "\\/e\"}\n");  // an escaped slash
-    EXPECT_TRUE(AddCustomEvent(kEventReindex, dir_ + "/e", Json::Value()));
-    EXPECT_EQ(testkit::ReadJsonLines(QueueOf("s")).size(), 1u);
+    EXPECT_EQ(std::count(content.begin(), content.end(), '\n'), 9);
 }
 
 // A queue whose lock another process holds is waited for: released once the append has met it,

@@ -19,17 +19,15 @@ TEST_F(DaemonChannelTest, FrameIsLengthThenJsonThenNul) {
     EXPECT_EQ(frames[0].payload, text + std::string(1, '\0'));
 }
 
-TEST_F(DaemonChannelTest, NoDaemonMeansFalse) {
-    EXPECT_FALSE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));
-    testkit::WriteFile(DaemonSocketPath(), "not a socket");
-    EXPECT_FALSE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));
-}
-
-TEST_F(DaemonChannelTest, SocketPathLivesUnderTheRoot) {
+TEST_F(DaemonChannelTest, SocketPathLivesUnderTheRootAndNoDaemonMeansFalse) {
     EXPECT_EQ(DaemonSocketPath(), Path("/var/run/fileindexd.sock"));
     unsetenv("QIRA_ROOT");
     EXPECT_EQ(DaemonSocketPath(), "/var/run/fileindexd.sock");
     setenv("QIRA_ROOT", root().c_str(), 1);
+    // No daemon, or a file that is not a socket: the call fails.
+    EXPECT_FALSE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));
+    testkit::WriteFile(DaemonSocketPath(), "not a socket");
+    EXPECT_FALSE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));
 }
 
 // A socket path of sizeof(sun_path) - 1 bytes is reached; one byte more fails cleanly.
@@ -63,15 +61,12 @@ TEST(ChunkedWriterTest, LargeMessageGoesInPiecesOfAtMost1024) {
     close(pair[1]);
     EXPECT_EQ(pieces, (std::vector<size_t>{1024, 977}));
     EXPECT_TRUE(detail::WriteChunked(-1, "", 0));  // empty buffer succeeds at once
-}
-
-TEST(ChunkedWriterTest, AFailedFirstWriteNeverReadsBeforeTheBuffer) {
-    int pair[2];
+    // A failed first write never reads before the buffer.
     ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM, 0, pair), 0);
     close(pair[1]);
     signal(SIGPIPE, SIG_IGN);
-    const std::string text(100, 'x');
-    EXPECT_FALSE(detail::WriteChunked(pair[0], text.data(), text.size()));
+    const std::string small(100, 'x');
+    EXPECT_FALSE(detail::WriteChunked(pair[0], small.data(), small.size()));
     close(pair[0]);
 }
 

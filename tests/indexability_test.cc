@@ -38,7 +38,7 @@ TEST_F(IndexabilityTest, SystemPreservedNamesAndSkippedFiles) {
 }
 
 // The share rules themselves are held by the explanation's table.
-TEST_F(IndexabilityTest, ShareRulesNeedAShare) {
+TEST_F(IndexabilityTest, ShareRulesNeedAShareAndSharePathsResolveFirst) {
     EXPECT_FALSE(CanShareBeIndexed(nullptr));
     for (const auto& [props, indexable] : {std::pair{"{}", true}, {R"({"read_only": true})", false}}) {
         qira_sim::PutShare("s", dir_, J(props));
@@ -47,6 +47,11 @@ TEST_F(IndexabilityTest, ShareRulesNeedAShare) {
         EXPECT_EQ(CanShareBeIndexed(share), indexable);
         QIRAShareFree(share);
     }
+    // Share paths resolve first.
+    EXPECT_TRUE(CanPathBeIndexed("/s/dir"));
+    EXPECT_FALSE(CanPathBeIndexed("/nosuch/dir"));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_PATH);
+    EXPECT_TRUE(testkit::Logged("GetFullPath failed, path=/nosuch/dir"));
 }
 
 TEST_F(IndexabilityTest, FullPathRulesInOrderWithTheirLogLines) {
@@ -72,21 +77,12 @@ TEST_F(IndexabilityTest, FullPathRulesInOrderWithTheirLogLines) {
     }
     ASSERT_EQ(symlink((dir_ + "/dir").c_str(), (dir_ + "/link").c_str()), 0);
     EXPECT_FALSE(CanFullPathBeIndexed(dir_ + "/link"));
-}
-
-TEST_F(IndexabilityTest, MountPointsOnlyInSharesUsingEncryption) {
+    // Mount points only in shares using encryption.
     qira_sim::PutShare("s", dir_, J("{\"mount_points\": [\"" + dir_ + "/dir\"]}"));
     EXPECT_FALSE(CanFullPathBeIndexed(dir_ + "/dir"));
     EXPECT_TRUE(testkit::Logged("Mount point[" + dir_ + "/dir] is not allowed to be indexed"));
     qira_sim::PutShare("s", dir_, J("{\"encryption\": true, \"mount_points\": [\"" + dir_ + "/dir\"]}"));
     EXPECT_TRUE(CanFullPathBeIndexed(dir_ + "/dir"));
-}
-
-TEST_F(IndexabilityTest, SharePathsResolveFirst) {
-    EXPECT_TRUE(CanPathBeIndexed("/s/dir"));
-    EXPECT_FALSE(CanPathBeIndexed("/nosuch/dir"));
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_PATH);
-    EXPECT_TRUE(testkit::Logged("GetFullPath failed, path=/nosuch/dir"));
 }
 
 TEST_F(IndexabilityTest, SpaceIsShortOnlyForTheTwoNoSpaceErrors) {

@@ -14,7 +14,7 @@ protected:
     }
 };
 
-TEST_F(ReindexTest, EventsInRequestOrderWithDuplicates) {
+TEST_F(ReindexTest, EventsInRequestOrderUntilOneFails) {
     ASSERT_TRUE(IndexMgr::Reindex(J(R"(["/music/b", "/music/a", "/music/c"])")));
     EXPECT_EQ(Queue("music"), (std::vector<Json::Value>{Event(music_ + "/b"), Event(music_ + "/a"), Event(music_ + "/c")}));
     // A second request for the same path is covered by the pending reindex.
@@ -22,6 +22,11 @@ TEST_F(ReindexTest, EventsInRequestOrderWithDuplicates) {
     EXPECT_EQ(Queue("music").size(), 3u);
     EXPECT_TRUE(IndexMgr::Reindex(J("[]")));
     EXPECT_TRUE(Messages().empty());
+    // An event that cannot be queued stops the request, keeping the earlier events.
+    MakeDir(QueueOf("photo"));
+    EXPECT_FALSE(IndexMgr::Reindex(J(R"(["/music/d", "/photo/a", "/music/e"])")));
+    EXPECT_TRUE(testkit::Logged("AddCustomEvent failed, path=/photo/a"));
+    EXPECT_EQ(Queue("music").size(), 4u);
 }
 
 TEST_F(ReindexTest, ValidationFailsBeforeAnyRevivalOrEvent) {
@@ -59,13 +64,6 @@ TEST_F(ReindexTest, OutOfSpaceSharesAreRevivedOnceInAscendingOrder) {
     EXPECT_TRUE(IndexMgr::Reindex(J(R"(["/music/c"])")));
     EXPECT_TRUE(testkit::Logged("ShareRevice failed, share=music"));
     EXPECT_EQ(Queue("music").size(), 3u);
-}
-
-TEST_F(ReindexTest, EventFailuresStopTheRequestKeepingEarlierEvents) {
-    MakeDir(QueueOf("photo"));
-    EXPECT_FALSE(IndexMgr::Reindex(J(R"(["/music/a", "/photo/a", "/music/b"])")));
-    EXPECT_TRUE(testkit::Logged("AddCustomEvent failed, path=/photo/a"));
-    EXPECT_EQ(Queue("music").size(), 1u);
 }
 
 }  // namespace
