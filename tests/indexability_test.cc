@@ -40,7 +40,7 @@ TEST_F(IndexabilityTest, SystemPreservedNamesAndSkippedFiles) {
 // The share rules themselves are held by the explanation's table.
 TEST_F(IndexabilityTest, ShareRulesNeedAShareAndSharePathsResolveFirst) {
     EXPECT_FALSE(CanShareBeIndexed(nullptr));
-    for (const auto& [props, indexable] : {std::pair{"{}", true}, {R"({"read_only": true})", false}}) {
+    for (const auto& [props, indexable] : {std::pair{R"({"read_only": true})", false}, {"{}", true}}) {
         qira_sim::PutShare("s", dir_, J(props));
         QIRASHARE* share = nullptr;
         ASSERT_EQ(QIRAShareGet("s", &share), 0);

@@ -51,18 +51,18 @@ TEST_F(StoragePathsTest, BadArgumentsFailBeforeAnyLookup) {
     EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"QIRAShareGet failed, name=nosuch, code=2817"});
 }
 
-TEST_F(StoragePathsTest, ShortBuffersTruncateAndEaDirFailuresAreOnlyLogged) {
+// @eaDir failures are only logged: the path is still returned, and truncated to a short buffer.
+TEST_F(StoragePathsTest, EaDirFailuresAreOnlyLoggedAndShortBuffersTruncate) {
     const std::string dir = AddShare("music");
-    char buffer[10];
-    EXPECT_EQ(FILEIDXQueuePathGet("music", buffer, sizeof buffer), 9);
-    EXPECT_EQ(std::string(buffer), dir.substr(0, 9));
-    EXPECT_EQ(FILEIDXDBPathGet("music", buffer, sizeof buffer), 9);
-    // @eaDir failures are logged and the path still returned.
     qira_sim::InjectFault("QIRAEAMKDir", 0x0A00);
     char whole[4096];
     EXPECT_GT(FILEIDXDBPathGet("music", whole, sizeof whole), 0);
     EXPECT_TRUE(testkit::Logged("QIRAEAMKDir failed, path=" + dir + "/@eaDir, code=2560"));
     EXPECT_TRUE(testkit::Logged("mkdir failed, path=" + dir + "/@eaDir/QIRA@.fileindexdb, reason=No such file or directory"));
+    char buffer[10];
+    EXPECT_EQ(FILEIDXQueuePathGet("music", buffer, sizeof buffer), 9);
+    EXPECT_EQ(std::string(buffer), dir.substr(0, 9));
+    EXPECT_EQ(FILEIDXDBPathGet("music", buffer, sizeof buffer), 9);
 }
 
 }  // namespace
