@@ -48,27 +48,23 @@ TEST_F(PlantedLinkTest, SymlinkedEaDirIsRefusedForQueueAndDatabase) {
     canary.ExpectUntouched();
 }
 
-TEST_F(PlantedLinkTest, SymlinkedCompanionIsNeitherFollowedNorRemovedThrough) {
-    Canary canary(outside_ + "/records");
+// A companion or a database directory that is a link is neither followed nor removed through.
+TEST_F(PlantedLinkTest, SymlinkedCompanionAndDatabaseAreNeitherFollowedNorRemovedThrough) {
+    Canary records(outside_ + "/records");
+    MakeDir(outside_ + "/db");
+    Canary index(outside_ + "/db/index");
     MakeDir(music_ + "/@eaDir");
     ASSERT_EQ(symlink((outside_ + "/records").c_str(), (QueueOf("music") + ".tmp").c_str()), 0);
+    ASSERT_EQ(symlink((outside_ + "/db").c_str(), (music_ + "/@eaDir/QIRA@.fileindexdb").c_str()), 0);
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
     EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "finished");
     EXPECT_TRUE(AddCustomEvent(kEventReindex, music_ + "/a", Json::Value()));
-    EXPECT_TRUE(IndexMgr::CleanShareIndexData("music"));
-    EXPECT_FALSE(testkit::Exists(QueueOf("music") + ".tmp"));
-    canary.ExpectUntouched();
-}
-
-TEST_F(PlantedLinkTest, SymlinkedDatabaseDirectoryIsLeftAlone) {
-    MakeDir(music_ + "/@eaDir");
-    MakeDir(outside_ + "/db");
-    Canary canary(outside_ + "/db/index");
-    ASSERT_EQ(symlink((outside_ + "/db").c_str(), (music_ + "/@eaDir/QIRA@.fileindexdb").c_str()), 0);
     char buffer[4096];
     EXPECT_GT(FILEIDXDBPathGet("music", buffer, sizeof buffer), 0);
     EXPECT_TRUE(IndexMgr::CleanShareIndexData("music"));
-    canary.ExpectUntouched();
+    EXPECT_FALSE(testkit::Exists(QueueOf("music") + ".tmp"));
+    records.ExpectUntouched();
+    index.ExpectUntouched();
 }
 
 class DaemonFaultTest : public testkit::Sandbox {};

@@ -238,6 +238,7 @@ TEST_F(WebApiTest, OnlyTheConsolesOwnNamesAreAnsweredAndEveryAnswerIsGuarded) {
     }
     EXPECT_EQ(RawStatusLine("GET /api/folders HTTP/1.0\r\n\r\n"), "HTTP/1.1 421 Misdirected Request");
     const std::string page = client_->Get("/")->body;
+    EXPECT_NE(page.find("<title>File indexing</title>"), std::string::npos);
     EXPECT_EQ(page.find("<script>"), std::string::npos);  // no inline script for the policy to block
     EXPECT_EQ(page.find(" style="), std::string::npos);
 }
@@ -278,10 +279,6 @@ TEST_F(WebApiTest, AHeldLockIsRetryableAndStaticFilesStayInTheirDirectory) {
         EXPECT_EQ(busy.body["error"]["name"].asString(), "FILEINDEX_ERR_LOCK");
     }
     EXPECT_EQ(Post("/api/folders", R"([{"path": "/music/b"}])").status, 200);
-    const auto page = client_->Get("/");
-    ASSERT_TRUE(page);
-    EXPECT_EQ(page->status, 200);
-    EXPECT_NE(page->body.find("<title>File indexing</title>"), std::string::npos);
     for (const char* escape : {"/../CMakeLists.txt", "/%2e%2e/CMakeLists.txt", "/static/../../LICENSE", "/..%2fLICENSE"}) {
         SCOPED_TRACE(escape);
         const auto result = client_->Get(escape);

@@ -35,8 +35,6 @@ FakeDaemon::~FakeDaemon() {
     unlink(path_.c_str());
 }
 
-Frame FakeDaemon::Decode(const std::string& bytes) { return tools::DecodeDaemonFrame(bytes); }
-
 std::vector<Frame> FakeDaemon::Drain() {
     std::vector<Frame> frames;
     int client;
@@ -46,7 +44,7 @@ std::vector<Frame> FakeDaemon::Drain() {
         ssize_t got;
         while ((got = read(client, buffer, sizeof buffer)) > 0) bytes.append(buffer, static_cast<size_t>(got));
         close(client);
-        frames.push_back(Decode(bytes));
+        frames.push_back(tools::DecodeDaemonFrame(bytes));
     }
     return frames;
 }

@@ -30,8 +30,6 @@ public:
     // The same, keeping only "type" and "data" of each message.
     std::vector<Json::Value> Messages();
 
-    static Frame Decode(const std::string& bytes);
-
 private:
     int fd_;
     std::string path_;
