@@ -59,7 +59,9 @@ TEST_F(ExplainTest, NamesTheRefusingRuleAndAgreesWithCanPathBeIndexed) {
 }
 
 TEST_F(ExplainTest, TellsTheGoverningFolderByTheLastMatchAndWhatIsPending) {
-    testkit::WriteFile(FolderConf(), R"({"/music": {"name": "all", "audio": true}, "/music/a": {"name": "a", "photo": true}})");
+    // A folder whose share is gone governs nothing; a folder governs on a slash boundary.
+    testkit::WriteFile(FolderConf(), R"({"/music": {"name": "all", "audio": true}, "/music/a": {"name": "a", "photo": true},
+                                         "/gone/x": {}})");
     MakeDir(music_ + "/@eaDir");
     testkit::WriteFile(QueueOf("music"), "{\"event\":1,\"path\":\"" + music_ + "/a/b/x\"}\nnot json\n{\"event\":1,\"path\":\"" +
                                              music_ + "/ab\"}\n");
@@ -72,6 +74,7 @@ TEST_F(ExplainTest, TellsTheGoverningFolderByTheLastMatchAndWhatIsPending) {
     EXPECT_EQ(inner["pending"], J(R"({"queue": 1, "companion": 1, "unread": []})"));
     EXPECT_EQ(inner["status"].asString(), "processing");
     EXPECT_EQ(Explain("/music/c")["governing_folder"]["name"].asString(), "all");
+    EXPECT_EQ(Explain("/music/ab")["governing_folder"]["name"].asString(), "all");
     EXPECT_TRUE(Explain("/music")["contains_indexed_folder"].asBool());
     EXPECT_TRUE(Explain("/photo/a")["governing_folder"].isNull());
 }

@@ -114,29 +114,27 @@ TEST_F(FolderTest, ChangeReportsAgainstTheGoverningFolder) {
     EXPECT_TRUE(stored["audio"].asBool());
 }
 
+// The report is nested under the path and holds what the governing folder indexed; a path in no
+// share reports nothing.
 TEST_F(FolderTest, DeleteNestsItsReportUnderThePath) {
     Folders folders;
     UpsertOne(folders, R"({"path": "/music/a", "audio": true})");
     UpsertOne(folders, R"({"path": "/music/a/b", "photo": true})");
-    Json::Value changed;
-    ASSERT_TRUE(folders.Delete(changed, "/music/a/b"));
-    Json::Value expected(Json::objectValue);
-    expected["/music/a/b"] = Flags(false, true, false, true);
-    EXPECT_EQ(changed, expected);
-    ASSERT_TRUE(folders.Delete(changed, "/music/a/unknown"));
-    expected = Json::Value(Json::objectValue);
-    expected["/music/a/unknown"] = Flags(false, false, false, false);
-    EXPECT_EQ(changed, expected);
-    ASSERT_TRUE(folders.Delete(changed, "/music/ungoverned"));
-    EXPECT_EQ(changed["/music/ungoverned"], Flags(true, true, true, true));
-    changed = "untouched";
-    ASSERT_TRUE(folders.Delete(changed, "/nosuch/x"));
-    EXPECT_EQ(changed.asString(), "untouched");
-    ASSERT_TRUE(folders.Delete(changed, "/music/a"));
-    EXPECT_EQ(changed["/music/a"], Flags(true, true, true, true));
+    const std::vector<std::pair<std::string, Json::Value>> cases = {
+        {"/music/a/b", Flags(false, true, false, true)},         {"/music/a/unknown", Flags(false, false, false, false)},
+        {"/music/ungoverned", Flags(true, true, true, true)},    {"/nosuch/x", Json::Value()},
+        {"/music/a", Flags(true, true, true, true)}};
+    for (const auto& [path, flags] : cases) {
+        SCOPED_TRACE(path);
+        Json::Value changed = "untouched", expected = "untouched";
+        if (!flags.isNull()) (expected = Json::Value(Json::objectValue))[path] = flags;
+        ASSERT_TRUE(folders.Delete(changed, path));
+        EXPECT_EQ(changed, expected);
+    }
     testkit::WriteFile(FolderConf(), R"({"/nosuch/x": {}})");
     Folders loaded;
     ASSERT_TRUE(loaded.Load());
+    Json::Value changed;
     ASSERT_TRUE(loaded.Delete(changed, "/nosuch/x"));  // a folder whose share is gone still goes
     EXPECT_EQ(loaded.Count(), 0u);
 }

@@ -1,4 +1,4 @@
-// Which shares, paths and names may be indexed; room for the index; the governing folder.
+// Which shares, paths and names may be indexed, and room for the index.
 #include "testkit.h"
 
 #include "qira/qira_share.h"
@@ -100,22 +100,6 @@ TEST_F(IndexabilityTest, SpaceIsShortOnlyForTheTwoNoSpaceErrors) {
     EXPECT_TRUE(IsShareSpaceEnough("s"));
     EXPECT_FALSE(IsShareSpaceEnough("nosuch"));
     EXPECT_TRUE(testkit::Logged("QIRAShareGet failed, share=nosuch"));
-}
-
-TEST_F(IndexabilityTest, TheLastMatchingFolderGoverns) {
-    Folder outer;
-    outer.Reload("/s", J(R"({"name": "outer"})"));
-    Folder inner;
-    inner.Reload("/s/dir", J(R"({"name": "inner"})"));
-    Folder sibling;
-    sibling.Reload("/s/di", J(R"({"name": "sibling"})"));
-    EXPECT_EQ(GetMostSuitableCfg({inner, outer}, dir_ + "/dir/x")["name"].asString(), "outer");
-    EXPECT_EQ(GetMostSuitableCfg({outer, inner}, dir_ + "/dir/x")["name"].asString(), "inner");
-    EXPECT_EQ(GetMostSuitableCfg({outer, inner}, dir_ + "/dir")["name"].asString(), "inner");
-    EXPECT_EQ(GetMostSuitableCfg({sibling}, dir_ + "/dir"), J("{}"));
-    Folder unresolved;
-    unresolved.Reload("/gone/x", J("{}"));
-    EXPECT_EQ(GetMostSuitableCfg({unresolved}, "/anything"), J("{}"));
 }
 
 }  // namespace
