@@ -1,8 +1,6 @@
 // Share paths, full paths and the small helpers.
 #include "testkit.h"
 
-#include "qira/qira_share.h"
-
 namespace {
 
 class PathsTest : public testkit::Sandbox {};
@@ -66,35 +64,23 @@ TEST_F(PathsTest, FullPathTakesTheVolumeFromTheSharesOwnPath) {
     EXPECT_EQ(full, Path("/volume2/films/2024"));
 }
 
-TEST_F(PathsTest, ShareOfAFullPathComesFromThePlatform) {
-    AddShare("music");
-    std::string name;
-    std::string inside;
-    ASSERT_TRUE(GetShareNamePathByFullPath(name, inside, ShareDir("music") + "/live"));
-    EXPECT_EQ(name, "music");
-    EXPECT_EQ(inside, "/live");
-    name = "keep";
+// A full path belongs to the share with the longest directory, on a slash boundary.
+TEST_F(PathsTest, ShareOfAFullPathIsTheLongestShareDirectoryOnASlashBoundary) {
+    AddShare("a");
+    qira_sim::PutShare("nested", ShareDir("a") + "/inner");
+    qira_sim::PutShare("ab", ShareDir("ab"));
+    const std::tuple<std::string, std::string, std::string> cases[] = {
+        {ShareDir("a") + "/inner/x", "nested", "/x"}, {ShareDir("ab") + "/y", "ab", "/y"}, {ShareDir("a"), "a", "/"}};
+    for (const auto& [fullPath, share, inside] : cases) {
+        std::string name, path;
+        ASSERT_TRUE(GetShareNamePathByFullPath(name, path, fullPath)) << fullPath;
+        EXPECT_EQ(name + " " + path, share + " " + inside);
+    }
+    std::string name = "keep", inside;
     EXPECT_FALSE(GetShareNamePathByFullPath(name, inside, Path("/volume1/other/x")));
     EXPECT_EQ(name, "keep");
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_PATH);
     EXPECT_TRUE(testkit::Logged("QIRAShareNamePathGet failed, path=" + Path("/volume1/other/x")));
-}
-
-// The platform gives a full path to the share with the longest directory, on a slash boundary.
-TEST_F(PathsTest, FullPathBelongsToTheLongestShareDirectoryOnASlashBoundary) {
-    AddShare("a");
-    qira_sim::PutShare("nested", ShareDir("a") + "/inner");
-    qira_sim::PutShare("ab", ShareDir("ab"));
-    char name[492];
-    char inside[4096];
-    ASSERT_EQ(QIRAShareNamePathGet((ShareDir("a") + "/inner/x").c_str(), name, sizeof name, inside, sizeof inside), 0);
-    EXPECT_STREQ(name, "nested");
-    EXPECT_STREQ(inside, "/x");
-    ASSERT_EQ(QIRAShareNamePathGet((ShareDir("ab") + "/y").c_str(), name, sizeof name, inside, sizeof inside), 0);
-    EXPECT_STREQ(name, "ab");
-    ASSERT_EQ(QIRAShareNamePathGet(ShareDir("a").c_str(), name, sizeof name, inside, sizeof inside), 0);
-    EXPECT_STREQ(inside, "/");
-    EXPECT_LT(QIRAShareNamePathGet("/elsewhere", name, sizeof name, inside, sizeof inside), 0);
 }
 
 TEST_F(PathsTest, FileTestsDoNotFollowSymbolicLinks) {
