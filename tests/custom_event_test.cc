@@ -55,12 +55,15 @@ TEST_F(CustomEventTest, APendingReindexOfExactlyThePathSuppressesAnyEvent) {
 }
 
 // A queue whose lock another process holds is waited for: released once the append has met it,
-// the record lands and the call succeeds.
-TEST_F(CustomEventTest, AHeldQueueIsWaitedForUntilItsLockIsReleased) {
+// the record lands and the call succeeds. Held for longer than the append waits, the event is
+// given up, the share is marked for a full reindex, the caller learns of it, and the queue is
+// left as it was.
+TEST_F(CustomEventTest, AHeldQueueIsWaitedForAndGivenUpWhenHeldTooLong) {
     testkit::WriteFile(FolderConf(), R"({"/s/a": {}})");
     MakeDir(dir_ + "/@eaDir");
     testkit::WriteFile(QueueOf("s"), "");
-    testkit::ChildHolding holder([this] { return flock(open(QueueOf("s").c_str(), O_RDWR), LOCK_EX) == 0; });
+    const auto holdQueue = [this] { return flock(open(QueueOf("s").c_str(), O_RDWR), LOCK_EX) == 0; };
+    testkit::ChildHolding holder(holdQueue);
     ASSERT_TRUE(holder.Took());
     const int watch = inotify_init1(IN_CLOEXEC);
     ASSERT_GE(inotify_add_watch(watch, QueueOf("s").c_str(), IN_CLOSE_WRITE), 0);
@@ -70,22 +73,16 @@ TEST_F(CustomEventTest, AHeldQueueIsWaitedForUntilItsLockIsReleased) {
     pollfd attempted{watch, POLLIN, 0};
     ASSERT_EQ(poll(&attempted, 1, 60000), 1);
     holder.Release();
+    close(watch);
     int status = -1;
     ASSERT_EQ(waitpid(appender, &status, 0), appender);
     EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1);
-    EXPECT_EQ(testkit::ReadFile(QueueOf("s")), "{\"data\":null,\"event\":65536,\"path\":\"" + dir_ + "/a\"}\n");
+    const std::string queued = "{\"data\":null,\"event\":65536,\"path\":\"" + dir_ + "/a\"}\n";
+    EXPECT_EQ(testkit::ReadFile(QueueOf("s")), queued);
     EXPECT_FALSE(testkit::Exists(StatusConf()));
-    close(watch);
-}
 
-// A queue held for longer than the append waits: the event is given up, the share is marked for a
-// full reindex, the caller learns of it, and the queue is left as it was.
-TEST_F(CustomEventTest, AQueueHeldTooLongMarksTheShareAndFails) {
-    testkit::WriteFile(FolderConf(), R"({"/s/a": {}})");
-    MakeDir(dir_ + "/@eaDir");
-    testkit::WriteFile(QueueOf("s"), "");
-    testkit::ChildHolding holder([this] { return flock(open(QueueOf("s").c_str(), O_RDWR), LOCK_EX) == 0; });
-    ASSERT_TRUE(holder.Took());
+    testkit::ChildHolding tooLong(holdQueue);
+    ASSERT_TRUE(tooLong.Took());
     LOG_LEVEL = 7;
     EXPECT_FALSE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/b", J("{}")));
     LOG_LEVEL = 3;
@@ -93,11 +90,11 @@ TEST_F(CustomEventTest, AQueueHeldTooLongMarksTheShareAndFails) {
                                                                ", reason=Resource temporarily unavailable"});
     EXPECT_EQ(testkit::ParseJson(testkit::ReadFile(StatusConf())), J(R"({"need_reindex": {"s": true}})"));
     testkit::ClearLog();
-    EXPECT_FALSE(IndexMgr::Reindex(J(R"(["/s/a"])")));
-    EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"AddCustomEvent failed, path=/s/a"});
+    EXPECT_FALSE(IndexMgr::Reindex(J(R"(["/s/c"])")));
+    EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"AddCustomEvent failed, path=/s/c"});
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_NONE);
-    holder.Release();
-    EXPECT_EQ(testkit::ReadFile(QueueOf("s")), "");
+    tooLong.Release();
+    EXPECT_EQ(testkit::ReadFile(QueueOf("s")), queued);
 }
 
 // An event that cannot be queued marks its share (the empty name when it has none) and fails; a
