@@ -53,22 +53,6 @@ protected:
         MakeDir(music_ + "/@eaDir");
         queue_ = QueueOf("music");
     }
-    void PlantSparseQueue() {
-        const int fd = open(queue_.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
-        ASSERT_EQ(ftruncate(fd, kSparseSize), 0);
-        close(fd);
-    }
-    // A line far over the limit, then a reindex record of the folder.
-    void PlantLongLineThenRecord() {
-        const int fd = open(queue_.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
-        const std::string block(1 << 20, 'x');
-        for (size_t written = 0; written < kLongLine; written += block.size()) {
-            ASSERT_EQ(write(fd, block.data(), block.size()), static_cast<ssize_t>(block.size()));
-        }
-        const std::string record = "\n{\"event\":65536,\"path\":\"" + music_ + "/a\",\"data\":null}\n";
-        ASSERT_EQ(write(fd, record.data(), record.size()), static_cast<ssize_t>(record.size()));
-        close(fd);
-    }
     std::string queue_;
 };
 
@@ -112,7 +96,9 @@ void ExpectEveryOperationReturnsHoldingLittleMemory() {
 }
 
 TEST_F(HostileQueueTest, ASparseQueueIsNotReadAndItsShareIsMarked) {
-    PlantSparseQueue();
+    const int fd = open(queue_.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
+    ASSERT_EQ(ftruncate(fd, kSparseSize), 0);
+    close(fd);
     ExpectEveryOperationReturnsHoldingLittleMemory();
     EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
     testkit::ClearLog();
@@ -128,7 +114,15 @@ TEST_F(HostileQueueTest, ASparseQueueIsNotReadAndItsShareIsMarked) {
 }
 
 TEST_F(HostileQueueTest, ALineOverTheLimitIsSkippedAndTheNextRecordRead) {
-    PlantLongLineThenRecord();
+    // A line far over the limit, then a reindex record of the folder.
+    const int fd = open(queue_.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
+    const std::string block(1 << 20, 'x');
+    for (size_t written = 0; written < kLongLine; written += block.size()) {
+        ASSERT_EQ(write(fd, block.data(), block.size()), static_cast<ssize_t>(block.size()));
+    }
+    const std::string record = "\n{\"event\":65536,\"path\":\"" + music_ + "/a\",\"data\":null}\n";
+    ASSERT_EQ(write(fd, record.data(), record.size()), static_cast<ssize_t>(record.size()));
+    close(fd);
     const off_t planted = static_cast<off_t>(testkit::ReadFile(queue_).size());
     ExpectEveryOperationReturnsHoldingLittleMemory();
     testkit::ClearLog();

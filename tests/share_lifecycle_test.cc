@@ -54,7 +54,7 @@ TEST_F(ShareLifecycleTest, RenameKeepsSettingsAndTouchesNothingElse) {
     EXPECT_EQ(testkit::ReadFile(FolderConf()), before);
 }
 
-TEST_F(ShareLifecycleTest, PauseStopsTheConsumerBeforeTheProducer) {
+TEST_F(ShareLifecycleTest, PauseStopsTheConsumerFirstAndResumeStartsItLast) {
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
     ASSERT_TRUE(IndexMgr::UpsertQIRANotifydCfg("music"));
     Settle();
@@ -72,10 +72,9 @@ TEST_F(ShareLifecycleTest, PauseStopsTheConsumerBeforeTheProducer) {
     EXPECT_FALSE(IndexMgr::SharePause("music"));
     EXPECT_EQ(Messages().size(), 1u);
     EXPECT_TRUE(testkit::Logged("DeleteQIRANotifydCfg failed, share=music"));
-}
-
-TEST_F(ShareLifecycleTest, ResumeStartsTheProducerBeforeTheConsumer) {
-    testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
+    // Resume: the producer first, then the consumer; the no-space flag stays.
+    qira_sim::ClearFaults();
+    Settle();
     testkit::WriteFile(StatusConf(), R"({"no_space": {"music": true}})");
     ASSERT_TRUE(IndexMgr::ShareResume("music"));
     EXPECT_EQ(qira_sim::Registrations().size(), 1u);

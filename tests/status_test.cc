@@ -129,22 +129,20 @@ TEST_F(StatusTest, PauseAndResumeWriteTheFileAndTellTheDaemon) {
     EXPECT_NEAR(static_cast<double>(wrapped), static_cast<double>(static_cast<int32_t>(static_cast<uint32_t>(now) + 3600u * hours)), 2.0);
 }
 
-TEST_F(StatusTest, UnreachableDaemonLeavesTheFileChangedAndFails) {
+TEST_F(StatusTest, ReviveClearsOnlyTheNoSpaceFlagAndAnUnreachableDaemonFailsAfterTheSave) {
+    testkit::WriteFile(StatusConf(), R"({"no_space": {"s": true, "t": true}, "need_reindex": {"s": true}})");
+    auto daemon = std::make_unique<testkit::FakeDaemon>(DaemonSocketPath());
+    ASSERT_TRUE(StatusMgr::ShareRevive("s"));
+    ASSERT_TRUE(StatusMgr::ShareRevive("never"));
+    EXPECT_EQ(File(), J(R"({"no_space": {"t": true}, "need_reindex": {"s": true}})"));
+    const auto messages = daemon->Messages();
+    ASSERT_EQ(messages.size(), 2u);
+    EXPECT_EQ(messages[0], J(R"({"type": "revive_share_worker", "data": {"share_name": "s"}})"));
+    daemon.reset();  // unreachable: the file is changed and the call fails
     EXPECT_FALSE(StatusMgr::Pause(1));
     EXPECT_GT(File()["resume_time"].asInt64(), 0);
     EXPECT_TRUE(testkit::Logged("SendCammandToDaemon failed"));
     EXPECT_EQ(testkit::LogLines().back().source, "status_mgr.cc");
-}
-
-TEST_F(StatusTest, ReviveClearsOnlyTheNoSpaceFlagAndSendsTheCommand) {
-    testkit::WriteFile(StatusConf(), R"({"no_space": {"s": true, "t": true}, "need_reindex": {"s": true}})");
-    testkit::FakeDaemon daemon(DaemonSocketPath());
-    ASSERT_TRUE(StatusMgr::ShareRevive("s"));
-    ASSERT_TRUE(StatusMgr::ShareRevive("never"));
-    EXPECT_EQ(File(), J(R"({"no_space": {"t": true}, "need_reindex": {"s": true}})"));
-    const auto messages = daemon.Messages();
-    ASSERT_EQ(messages.size(), 2u);
-    EXPECT_EQ(messages[0], J(R"({"type": "revive_share_worker", "data": {"share_name": "s"}})"));
 }
 
 }  // namespace
