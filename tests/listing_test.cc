@@ -23,11 +23,6 @@ protected:
         }
         testkit::WriteFile(FolderConf(), toString(conf));
     }
-    static std::vector<std::string> Names(const Json::Value& out) {
-        std::vector<std::string> names;
-        for (const auto& folder : out["folder"]) names.push_back(folder["name"].asString());
-        return names;
-    }
     Json::Value List(unsigned long offset, unsigned long limit, const std::string& sortBy, const std::string& direction,
                      const Json::Value& additional = Json::Value(Json::arrayValue)) {
         Json::Value out;
@@ -57,7 +52,9 @@ TEST_F(ListingTest, PagesInEveryOrder) {
     for (const auto& c : cases) {
         SCOPED_TRACE(std::to_string(c.offset) + " " + std::to_string(c.limit) + " " + c.sortBy + " " + c.direction);
         const Json::Value out = List(c.offset, c.limit, c.sortBy, c.direction);
-        EXPECT_EQ(Names(out), c.names);
+        Texts names;
+        for (const auto& folder : out["folder"]) names.push_back(folder["name"].asString());
+        EXPECT_EQ(names, c.names);
         EXPECT_EQ(out["total"].asUInt(), 10u);
         EXPECT_EQ(out["offset"].asUInt64(), c.offset);
         EXPECT_EQ(out.getMemberNames(), (Texts{"folder", "offset", "total"}));

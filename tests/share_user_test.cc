@@ -5,6 +5,8 @@
 #include <stdio.h>
 #include <sys/resource.h>
 
+#include <filesystem>
+
 #include "queue_file.h"
 
 namespace {
@@ -16,13 +18,6 @@ protected:
         ASSERT_TRUE(IndexMgr::Upsert(J(R"([{"path": "/music/a"}, {"path": "/music/b"}])")));
         MakeDir(music_ + "/@eaDir/QIRA@.fileindexdb");
         Settle();
-    }
-    static int OpenDescriptors() {
-        int count = 0;
-        DIR* dir = opendir("/proc/self/fd");
-        while (readdir(dir) != nullptr) ++count;
-        closedir(dir);
-        return count;
     }
 };
 
@@ -133,13 +128,17 @@ TEST_F(ShareUserTest, WritersFailWithErrorNineWhileALockIsHeldAndLeakNothing) {
         {"SetUpdated", [] { return StatusMgr::SetUpdated("m"); }},
         {"ShareRevive", [] { return StatusMgr::ShareRevive("music"); }},
     };
-    const int descriptors = OpenDescriptors();
+    const auto openDescriptors = [] {
+        const auto fds = std::filesystem::directory_iterator("/proc/self/fd");
+        return std::distance(begin(fds), end(fds));
+    };
+    const auto descriptors = openDescriptors();
     for (const auto& [name, call] : writers) {
         SCOPED_TRACE(name);
         testkit::ClearError();
         EXPECT_FALSE(call());
         EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
-        EXPECT_EQ(OpenDescriptors(), descriptors);
+        EXPECT_EQ(openDescriptors(), descriptors);
     }
     long long resume = 0;
     EXPECT_TRUE(StatusMgr::GetPauseInfo(resume));

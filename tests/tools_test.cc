@@ -349,37 +349,23 @@ TEST_F(ToolTest, ExplainSaysWhatIsWrongInWords) {
               std::string::npos);
 }
 
-class DaemonStandInTest : public testkit::IndexFixture {
-protected:
-    void StartDaemon() {
-        daemon_.reset();
-        log_ = Path("/daemon.log");
-        pid_ = testkit::Start({FILEINDEXD_REF, "--interval", "5"}, log_);
-        // The socket file appears at bind, before the daemon listens: wait for its own word.
-        ASSERT_TRUE(testkit::WaitFor([this] { return testkit::ReadFile(log_).find("listening on") != std::string::npos; }));
-    }
-    void TearDown() override {
-        if (pid_ > 0) {
-            EXPECT_EQ(testkit::Stop(pid_), 0);
-        }
-        IndexFixture::TearDown();
-    }
-    std::string log_;
-    pid_t pid_ = -1;
-};
-
 // A pause holds the work back; progress --watch shows the backlog shrink once the daemon drains
 // it, and wait returns when it is done.
-TEST_F(DaemonStandInTest, PauseHoldsWorkBackAndProgressFollowsTheDrain) {
+TEST_F(ToolTest, TheDaemonStandInHoldsWorkBackWhilePausedAndProgressFollowsTheDrain) {
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
-    StartDaemon();
+    daemon_.reset();
+    const std::string log = Path("/daemon.log");
+    const pid_t daemon = testkit::Start({FILEINDEXD_REF, "--interval", "5"}, log);
+    const std::shared_ptr<void> stop(nullptr, [daemon](void*) { EXPECT_EQ(testkit::Stop(daemon), 0); });
+    // The socket file appears at bind, before the daemon listens: wait for its own word.
+    ASSERT_TRUE(testkit::WaitFor([&] { return testkit::ReadFile(log).find("listening on") != std::string::npos; }));
     ASSERT_TRUE(StatusMgr::Pause(0));
     ASSERT_TRUE(IndexMgr::Reindex(J(R"(["/music/a", "/music/a/b"])")));
     // The daemon takes commands before each drain pass: once it has taken a second pause, sent
     // after the records were queued, it has had its pass over the queue and held them back.
     ASSERT_TRUE(StatusMgr::Pause(0));
-    ASSERT_TRUE(testkit::WaitFor([this] { return testkit::CountOf(testkit::ReadFile(log_), "\"type\":\"pause\"") == 2; }));
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "paused") << testkit::ReadFile(log_);
+    ASSERT_TRUE(testkit::WaitFor([&] { return testkit::CountOf(testkit::ReadFile(log), "\"type\":\"pause\"") == 2; }));
+    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "paused") << testkit::ReadFile(log);
     const std::string samples = Path("/samples.log");
     const pid_t watch = testkit::Start({FILEINDEXCTL, "progress", "--watch", "--interval", "0.05"}, samples);
     const auto backlogs = [&] {
