@@ -9,22 +9,20 @@ namespace {
 
 class DaemonChannelTest : public testkit::Sandbox {};
 
-TEST_F(DaemonChannelTest, FrameIsLengthThenJsonThenNul) {
-    testkit::FakeDaemon daemon(DaemonSocketPath());
+TEST_F(DaemonChannelTest, FrameIsLengthThenJsonThenNulOnTheSocketUnderTheRoot) {
+    auto daemon = std::make_unique<testkit::FakeDaemon>(DaemonSocketPath());
     ASSERT_TRUE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));
-    const auto frames = daemon.Drain();
+    const auto frames = daemon->Drain();
     ASSERT_EQ(frames.size(), 1u);
     const std::string text = "{\"data\":{},\"type\":\"resume\"}";
     EXPECT_EQ(frames[0].length, text.size() + 1);
     EXPECT_EQ(frames[0].payload, text + std::string(1, '\0'));
-}
-
-TEST_F(DaemonChannelTest, SocketPathLivesUnderTheRootAndNoDaemonMeansFalse) {
     EXPECT_EQ(DaemonSocketPath(), Path("/var/run/fileindexd.sock"));
     unsetenv("QIRA_ROOT");
     EXPECT_EQ(DaemonSocketPath(), "/var/run/fileindexd.sock");
     setenv("QIRA_ROOT", root().c_str(), 1);
     // No daemon, or a file that is not a socket: the call fails.
+    daemon.reset();
     EXPECT_FALSE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));
     testkit::WriteFile(DaemonSocketPath(), "not a socket");
     EXPECT_FALSE(SendCammandToDaemon("resume", Json::Value(Json::objectValue)));

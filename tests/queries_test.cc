@@ -37,6 +37,11 @@ TEST_F(QueriesTest, PathsInsideAndContainingAFolder) {
     EXPECT_EQ(FILEIDXIsShareIndexed(nullptr), 0);
     EXPECT_EQ(FILEIDXIsPathIndexed(nullptr), 0);
     EXPECT_EQ(FILEIDXIsFullPathIndexed(nullptr), 0);
+    // The plain functions have unmangled names.
+    for (const char* name : {"FILEIDXIsShareIndexed", "FILEIDXIsPathIndexed", "FILEIDXIsFullPathIndexed",
+                             "FILEIDXDBPathGet", "FILEIDXQueuePathGet"}) {
+        EXPECT_NE(dlsym(RTLD_DEFAULT, name), nullptr) << name;
+    }
 }
 
 TEST_F(QueriesTest, FullPathsAndTheUnresolvableFolder) {
@@ -87,13 +92,6 @@ TEST_F(QueriesTest, GetTakesTheExclusiveLock) {
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
     EXPECT_TRUE(IndexMgr::IsPathIndexed("/music/a"));  // the membership questions take no lock
     holder.Unlock();
-}
-
-TEST(PlainFunctionsTest, HaveUnmangledNames) {
-    for (const char* name : {"FILEIDXIsShareIndexed", "FILEIDXIsPathIndexed", "FILEIDXIsFullPathIndexed",
-                             "FILEIDXDBPathGet", "FILEIDXQueuePathGet"}) {
-        EXPECT_NE(dlsym(RTLD_DEFAULT, name), nullptr) << name;
-    }
 }
 
 }  // namespace

@@ -24,16 +24,6 @@ protected:
     }
 };
 
-TEST_F(StatusReportTest, UnreadablePauseStateFailsTheServiceWord) {
-    testkit::WriteFile(QueueOf("music"), "");
-    testkit::WriteFile(StatusConf(), R"({"resume_time": "soon"})");
-    std::string word = "unchanged";
-    EXPECT_FALSE(StatusMgr::GetStatus(word));
-    EXPECT_EQ(word, "unchanged");
-    testkit::WriteFile(QueueOf("music"), Record(music_ + "/a"));
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "processing");  // pause value -1
-}
-
 // One row: status.conf, one queue file and its content, then the word of the service (no folder)
 // or of a folder.
 TEST_F(StatusReportTest, WordsFollowTheQueuesThePauseAndTheNoSpaceFlag) {
@@ -103,11 +93,19 @@ TEST_F(StatusReportTest, MalformedLinesAreLoggedAndSkipped) {
     EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"Malformed command: late garbage"});
 }
 
-TEST_F(StatusReportTest, UnknownShareOrQueuePathFailsTheServiceWord) {
+TEST_F(StatusReportTest, UnknownShareQueuePathOrPauseStateFailsTheServiceWord) {
+    // An unreadable pause state fails the service word; a folder reads it as -1.
+    testkit::WriteFile(QueueOf("music"), "");
+    testkit::WriteFile(StatusConf(), R"({"resume_time": "soon"})");
+    std::string word = "unchanged";
+    EXPECT_FALSE(StatusMgr::GetStatus(word));
+    EXPECT_EQ(word, "unchanged");
+    testkit::WriteFile(QueueOf("music"), Record(music_ + "/a"));
+    EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "processing");  // pause value -1
+    unlink(StatusConf().c_str());
     testkit::WriteFile(FolderConf(), "{}");
     EXPECT_EQ(Service(), "finished");  // no folders
     testkit::WriteFile(FolderConf(), R"({"": {}})");
-    std::string word;
     EXPECT_FALSE(StatusMgr::GetStatus(word));
     EXPECT_TRUE(testkit::Logged("Failed to get share name from path: "));
     // The share vanishes after the indexability rules, before its queue path is asked for.

@@ -2,6 +2,7 @@
 
 #include <syslog.h>
 
+#include <algorithm>
 #include <cstdarg>
 #include <cstdio>
 #include <regex>
@@ -27,10 +28,7 @@ std::vector<std::string> LogMessages() {
 void ClearLog() { Lines().clear(); }
 
 bool Logged(const std::string& message) {
-    for (const auto& line : Lines()) {
-        if (line.message == message) return true;
-    }
-    return false;
+    return std::any_of(Lines().begin(), Lines().end(), [&](const LogLine& line) { return line.message == message; });
 }
 
 void Record(int priority, const std::string& text) {
