@@ -44,7 +44,8 @@ TEST_F(QueriesTest, PathsInsideAndContainingAFolder) {
     }
 }
 
-TEST_F(QueriesTest, FullPathsAndTheUnresolvableFolder) {
+// No file means nothing indexed; a malformed one answers no everywhere and says why.
+TEST_F(QueriesTest, FullPathsTheUnresolvableFolderAndAMissingOrMalformedFile) {
     Index(R"({"/music/live": {}})");
     const std::string dir = ShareDir("music");
     EXPECT_TRUE(IndexMgr::IsFullPathIndexed(dir + "/live/a"));
@@ -58,10 +59,6 @@ TEST_F(QueriesTest, FullPathsAndTheUnresolvableFolder) {
     EXPECT_TRUE(IndexMgr::IsShareIndexed("music"));
     EXPECT_FALSE(IndexMgr::IsShareIndexed("x"));
     EXPECT_TRUE(testkit::Logged("Failed to get share name from path: "));
-}
-
-// No file means nothing indexed; a malformed one answers no everywhere and says why.
-TEST_F(QueriesTest, MissingOrMalformedFileAnswersNo) {
     std::vector<Folder> list(3);
     EXPECT_TRUE(IndexMgr::List(list));
     EXPECT_TRUE(list.empty());

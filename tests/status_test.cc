@@ -43,7 +43,7 @@ TEST_F(StatusTest, NoSpaceNoticeOnlyOnTheTransitionToFlagged) {
 
 // A flag is set by the share's membership, whatever its value; a marker by its value as a boolean.
 // A missing file reads as running and unflagged and is not made by reading.
-TEST_F(StatusTest, FlagsAreMembershipsAndMarkersBooleans) {
+TEST_F(StatusTest, FlagsAreMembershipsMarkersBooleansAndFlagSetsWrittenOnlyAsObjects) {
     struct Case {
         const char* content;
         bool noSpace, needReindex, updated;
@@ -69,10 +69,8 @@ TEST_F(StatusTest, FlagsAreMembershipsAndMarkersBooleans) {
     }
     EXPECT_TRUE(StatusMgr::SetUpdated("s"));
     EXPECT_TRUE(StatusMgr::IsUpdated("s"));
-}
-
-// Clearing on a fresh file leaves a null member; a flag set of the wrong type is not repaired.
-TEST_F(StatusTest, FlagSetsAreWrittenOnlyWhenTheyAreObjects) {
+    // Clearing on a fresh file leaves a null member; a flag set of the wrong type is not repaired.
+    unlink(StatusConf().c_str());
     EXPECT_TRUE(StatusMgr::ShareSetNeedReindex("s", false));
     EXPECT_EQ(File(), J(R"({"need_reindex": null})"));
     EXPECT_TRUE(StatusMgr::ShareSetNeedReindex("s", true));
