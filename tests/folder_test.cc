@@ -66,7 +66,7 @@ TEST_F(FolderTest, SaveWritesSortedMembersWithTheSixKeysOnly) {
     EXPECT_EQ(list[0].path, "/music/b");
 }
 
-TEST_F(FolderTest, LoadTakesTheMemberNameKeepsUnresolvableFoldersAndReplacesNothing) {
+TEST_F(FolderTest, LoadTakesTheMemberNameKeepsUnresolvableFoldersReplacesNothingAndRefusesANonObject) {
     testkit::WriteFile(FolderConf(), R"({"/music/x": {"path": "/other/y", "name": "X"}, "/gone/z": {"name": "Z"},
                                         "/music/n": 7})");
     Folders folders;
@@ -88,9 +88,7 @@ TEST_F(FolderTest, LoadTakesTheMemberNameKeepsUnresolvableFoldersAndReplacesNoth
     ASSERT_TRUE(folders.Get(out, "/music/x"));
     EXPECT_EQ(out["name"].asString(), "memory");
     EXPECT_EQ(folders.Count(), 4u);
-}
-
-TEST_F(FolderTest, MalformedFolderConfFailsWithErrorEight) {
+    // A file that is not an object fails with error eight.
     for (const char* text : {"[]", "7", "\"x\"", "null"}) {
         SCOPED_TRACE(text);
         testkit::WriteFile(FolderConf(), text);

@@ -15,7 +15,7 @@ protected:
     std::string dir_;
 };
 
-TEST_F(IndexabilityTest, SystemPreservedNamesAndSkippedFiles) {
+TEST_F(IndexabilityTest, SystemPreservedNamesSkippedFilesAndShareRules) {
     for (const char* name : {".TemporaryItems", "QIRA@.fileindexdb", "QIRA@file_index_queue", ".QIRAPPSDB",
                              ".DS_Store", "@eaDir"}) {
         EXPECT_TRUE(IsSystemPreservedFileName(name)) << name;
@@ -35,10 +35,7 @@ TEST_F(IndexabilityTest, SystemPreservedNamesAndSkippedFiles) {
         qira_sim::PutShare("s", dir_, J("{\"fs_type\": " + std::to_string(type) + "}"));
         EXPECT_TRUE(IsSkipIndex(dir_ + "/dir/f")) << type;
     }
-}
-
-// The share rules themselves are held by the explanation's table.
-TEST_F(IndexabilityTest, ShareRulesNeedAShareAndSharePathsResolveFirst) {
+    // The share rules themselves are held by the explanation's table; a share is needed, and share paths resolve first.
     EXPECT_FALSE(CanShareBeIndexed(nullptr));
     for (const auto& [props, indexable] : {std::pair{R"({"read_only": true})", false}, {"{}", true}}) {
         qira_sim::PutShare("s", dir_, J(props));

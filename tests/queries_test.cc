@@ -45,20 +45,7 @@ TEST_F(QueriesTest, PathsInsideAndContainingAFolder) {
 }
 
 // No file means nothing indexed; a malformed one answers no everywhere and says why.
-TEST_F(QueriesTest, FullPathsTheUnresolvableFolderAndAMissingOrMalformedFile) {
-    Index(R"({"/music/live": {}})");
-    const std::string dir = ShareDir("music");
-    EXPECT_TRUE(IndexMgr::IsFullPathIndexed(dir + "/live/a"));
-    EXPECT_FALSE(IndexMgr::IsFullPathIndexed(dir + "/livex"));
-    EXPECT_EQ(FILEIDXIsFullPathIndexed((dir + "/live").c_str()), 1);
-    EXPECT_EQ(FILEIDXIsFullPathIndexed("/elsewhere"), 0);
-    Index(R"({"/gone/x": {}})");
-    EXPECT_TRUE(IndexMgr::IsFullPathIndexed("/elsewhere/entirely"));
-    EXPECT_TRUE(testkit::Logged("Failed to get full path from /gone/x"));
-    Index(R"({"": {}, "/music/a": {}})");  // an empty share name is logged and skipped
-    EXPECT_TRUE(IndexMgr::IsShareIndexed("music"));
-    EXPECT_FALSE(IndexMgr::IsShareIndexed("x"));
-    EXPECT_TRUE(testkit::Logged("Failed to get share name from path: "));
+TEST_F(QueriesTest, AMissingOrMalformedFileFullPathsAndTheUnresolvableFolder) {
     std::vector<Folder> list(3);
     EXPECT_TRUE(IndexMgr::List(list));
     EXPECT_TRUE(list.empty());
@@ -73,6 +60,19 @@ TEST_F(QueriesTest, FullPathsTheUnresolvableFolderAndAMissingOrMalformedFile) {
     Index("{\"/music/a\": ");
     EXPECT_EQ(FILEIDXIsPathIndexed("/music/a"), 0);
     EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOAD_JSON);
+    Index(R"({"/music/live": {}})");
+    const std::string dir = ShareDir("music");
+    EXPECT_TRUE(IndexMgr::IsFullPathIndexed(dir + "/live/a"));
+    EXPECT_FALSE(IndexMgr::IsFullPathIndexed(dir + "/livex"));
+    EXPECT_EQ(FILEIDXIsFullPathIndexed((dir + "/live").c_str()), 1);
+    EXPECT_EQ(FILEIDXIsFullPathIndexed("/elsewhere"), 0);
+    Index(R"({"/gone/x": {}})");
+    EXPECT_TRUE(IndexMgr::IsFullPathIndexed("/elsewhere/entirely"));
+    EXPECT_TRUE(testkit::Logged("Failed to get full path from /gone/x"));
+    Index(R"({"": {}, "/music/a": {}})");  // an empty share name is logged and skipped
+    EXPECT_TRUE(IndexMgr::IsShareIndexed("music"));
+    EXPECT_FALSE(IndexMgr::IsShareIndexed("x"));
+    EXPECT_TRUE(testkit::Logged("Failed to get share name from path: "));
 }
 
 TEST_F(QueriesTest, GetTakesTheExclusiveLock) {

@@ -73,19 +73,6 @@ TEST_F(ShareUserTest, NulBytesAreRefusedBeforeAnythingReachesThePlatform) {
     EXPECT_TRUE(Messages().empty());
 }
 
-TEST_F(ShareUserTest, FifoQueueBlocksNeitherWritersNorReaders) {
-    ASSERT_EQ(unlink(QueueOf("music").c_str()), 0);
-    ASSERT_EQ(mkfifo(QueueOf("music").c_str(), 0644), 0);
-    EXPECT_EQ(testkit::RunBounded(30, [] { return IndexMgr::Upsert(J(R"([{"path": "/music/c"}])")); }), 0);
-    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));  // the event could not be queued
-    EXPECT_EQ(testkit::RunBounded(30, [] { return IndexMgr::Reindex(J(R"(["/music/a"])")); }), 0);
-    const auto scan = [this] {
-        return detail::ScanQueue(QueueOf("music"), [](const detail::QueueRecord&) {}, [](const detail::MalformedLine&) {}) ==
-               detail::QueueOpen::Opened;
-    };
-    EXPECT_EQ(testkit::RunBounded(30, scan), 0);
-}
-
 TEST_F(ShareUserTest, EaDirSwappedForALinkDuringCleanUpNeverReachesAnotherDirectory) {
     const std::string other = Path("/other");
     MakeDir(other + "/QIRA@.fileindexdb/sub");
@@ -165,7 +152,7 @@ TEST_F(ShareUserTest, DaemonThatListensButNeverAcceptsFailsTheCallInsteadOfHangi
     close(listener);
 }
 
-TEST_F(ShareUserTest, ShortWriteIsCutBackAndMarksTheShare) {
+TEST_F(ShareUserTest, AShortWriteIsCutBackAndAFifoQueueBlocksNobody) {
     // A long queue first, so that the size limit below stays above every other file written.
     testkit::WriteFile(QueueOf("music"), std::string(1 << 20, '\n'));
     const std::string before = testkit::ReadFile(QueueOf("music"));
@@ -179,6 +166,17 @@ TEST_F(ShareUserTest, ShortWriteIsCutBackAndMarksTheShare) {
     EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
     ASSERT_TRUE(AddCustomEvent(kEventReindex, music_ + "/c", Json::Value()));
     EXPECT_EQ(testkit::ReadFile(QueueOf("music")), before + "{\"data\":null,\"event\":65536,\"path\":\"" + music_ + "/c\"}\n");
+    // A queue that is a FIFO blocks neither writers nor readers.
+    ASSERT_EQ(unlink(QueueOf("music").c_str()), 0);
+    ASSERT_EQ(mkfifo(QueueOf("music").c_str(), 0644), 0);
+    EXPECT_EQ(testkit::RunBounded(30, [] { return IndexMgr::Upsert(J(R"([{"path": "/music/c"}])")); }), 0);
+    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));  // the event could not be queued
+    EXPECT_EQ(testkit::RunBounded(30, [] { return IndexMgr::Reindex(J(R"(["/music/a"])")); }), 0);
+    const auto scan = [this] {
+        return detail::ScanQueue(QueueOf("music"), [](const detail::QueueRecord&) {}, [](const detail::MalformedLine&) {}) ==
+               detail::QueueOpen::Opened;
+    };
+    EXPECT_EQ(testkit::RunBounded(30, scan), 0);
 }
 
 }  // namespace

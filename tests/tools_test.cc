@@ -292,7 +292,7 @@ TEST_F(ToolTest, ServiceStatusShowsPauseAndFlags) {
 
 // Descending pages follow each other as ascending ones do; a folder that cannot be indexed says
 // why, in the listing, in its status and when it is added.
-TEST_F(ToolTest, ListingPagesDescendingAndTellsWhyAFolderIsNotIndexable) {
+TEST_F(ToolTest, ListingPagesDescendingAndListingAndExplainTellWhyAFolderIsNotIndexable) {
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/b": {}, "/music/c": {}, "/photo/a": {}, "/music/gone": {}})");
     const auto page = [&](std::vector<std::string> args) {
         args.insert(args.begin(), {"--json", "folder", "list", "--desc", "--limit", "2"});
@@ -314,6 +314,13 @@ TEST_F(ToolTest, ListingPagesDescendingAndTellsWhyAFolderIsNotIndexable) {
     EXPECT_EQ(added.status, 0);
     EXPECT_EQ(added.err, "fileindexctl: warning: /music/ghost cannot be indexed now: the directory does not exist "
                          "(canonical_path); it stays listed as not valid until that changes\n");
+    // explain names the first problem in words, and a folder without a name is called so.
+    testkit::WriteFile(FolderConf(), R"({"/music/gone": {}})");
+    const auto explain = Ctl({"explain", "/music/gone"}).out;
+    EXPECT_EQ(explain.rfind("/music/gone: cannot be indexed: the directory does not exist (refused by canonical_path)\n", 0), 0u)
+        << explain;
+    EXPECT_NE(explain.find("governing folder: /music/gone (unnamed; document no, audio no, video no, photo no)"),
+              std::string::npos);
 }
 
 // wait ends when indexing is finished, or at its time-out with 3 while work is pending; progress
@@ -337,16 +344,6 @@ TEST_F(ToolTest, WaitAndWatchFollowThePendingWork) {
     const auto result = Ctl({"wait", "--timeout", "5", "--json"});
     EXPECT_EQ(result.status, 0);
     EXPECT_EQ(testkit::ParseJson(result.out)["result"]["status"].asString(), "finished");
-}
-
-// explain names the first problem in words, and a folder without a name is called so.
-TEST_F(ToolTest, ExplainSaysWhatIsWrongInWords) {
-    testkit::WriteFile(FolderConf(), R"({"/music/gone": {}})");
-    const auto explain = Ctl({"explain", "/music/gone"}).out;
-    EXPECT_EQ(explain.rfind("/music/gone: cannot be indexed: the directory does not exist (refused by canonical_path)\n", 0), 0u)
-        << explain;
-    EXPECT_NE(explain.find("governing folder: /music/gone (unnamed; document no, audio no, video no, photo no)"),
-              std::string::npos);
 }
 
 // A pause holds the work back; progress --watch shows the backlog shrink once the daemon drains
