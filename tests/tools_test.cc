@@ -57,7 +57,7 @@ TEST_F(ToolTest, QuestionsAnswerByExitStatus) {
         {{"is", "share-indexed", "nosuch"}, 2},        {{"is", "path-indexed", "/nosuch/a"}, 2},
     };
     for (const auto& [args, status] : cases) {
-        SCOPED_TRACE(args[1] + " " + args[2]);
+        SCOPED_TRACE(testing::PrintToString(args));
         EXPECT_EQ(Ctl(args).status, status);
     }
     testkit::WriteFile(FolderConf(), "{broken");
@@ -161,7 +161,7 @@ TEST_F(ToolTest, JsonHasOneShapeAndSuccessCarriesNoLog) {
         {"migrate"}, {"progress", "--interval", "0.05"}, {"explain", "/music/gone"}};
     const std::vector<std::string> members = {"error", "log", "message", "ok", "result", "saved"};
     for (auto args : commands) {
-        SCOPED_TRACE(args[0] + " " + args[1]);
+        SCOPED_TRACE(testing::PrintToString(args));
         args.push_back("--json");
         const auto result = Ctl(args);
         EXPECT_EQ(result.status, 0) << result.out;
@@ -193,7 +193,7 @@ TEST_F(ToolTest, ArgumentsTheLibraryWouldReadOtherwiseAreRefused) {
         {{"service", "pause", "--hours", "-3"}, "hours must be a whole number, 0 or more"},
     };
     for (const auto& [args, message] : cases) {
-        SCOPED_TRACE(args[0] + " " + args[1]);
+        SCOPED_TRACE(testing::PrintToString(args));
         const auto result = Ctl(args);
         EXPECT_EQ(result.status, 2);
         EXPECT_EQ(result.out, "");
