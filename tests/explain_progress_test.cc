@@ -12,39 +12,42 @@ protected:
     }
 };
 
-// One table drives both: the explanation's verdict is CanPathBeIndexed's, and it names the rule.
+// One table drives both: the explanation's verdict is CanPathBeIndexed's, and it names the rule and
+// the problem in words.
 TEST_F(ExplainTest, NamesTheRefusingRuleAndAgreesWithCanPathBeIndexed) {
     struct Case {
         std::string path;
         std::function<void()> setUp;
         Json::Value refusedBy;
+        std::string problem;  // the start of the words; empty when indexable
     };
     const auto share = [this](const std::string& name, const char* props) {
         return [this, name, props] { MakeDir(AddShare(name, J(props)) + "/d"); };
     };
     const std::vector<Case> cases = {
-        {"/music/a", [] {}, Json::Value()},
-        {"/music/#recycle/x", [this] { MakeDir(music_ + "/#recycle/x"); }, "recycle_bin"},
-        {"/music/#snapshot/x", [this] { MakeDir(music_ + "/#snapshot/x"); }, "snapshot"},
-        {"/unknownfs/d", share("unknownfs", R"({"fs_type": -1})"), "file_system"},
-        {"/remote/d", share("remote", R"({"fs_type": 21})"), "file_system"},
-        {"/image/d", share("image", R"({"fs_type": 31})"), "file_system"},
-        {"/twelve/d", share("twelve", R"({"fs_type": 12})"), "file_system"},
-        {"/nosuch/d", [] {}, "share_path"},
-        {"/surveillance/d", share("surveillance", "{}"), "skipped_share_name"},
-        {"/NetBackup/d", share("NetBackup", "{}"), "skipped_share_name"},
-        {"/netbackup/d", share("netbackup", "{}"), Json::Value()},
-        {"/twenty/d", share("twenty", R"({"fs_type": 20})"), "file_system"},
-        {"/music/b", [] { qira_sim::InjectFault("QIRAGetFSType", 0x10); }, "file_system"},
-        {"/music/c", [] { qira_sim::InjectFault("QLIBShareIsReadOnlyGet", 0x20); }, "read_only_share"},
-        {"/locked/d", share("locked", R"({"encrypted": true})"), "encrypted_share"},
-        {"/frozen/d", share("frozen", R"({"read_only": true})"), "read_only_share"},
+        {"/music/a", [] {}, Json::Value(), ""},
+        {"/music/#recycle/x", [this] { MakeDir(music_ + "/#recycle/x"); }, "recycle_bin", "the path lies in the share's recycle bin"},
+        {"/music/#snapshot/x", [this] { MakeDir(music_ + "/#snapshot/x"); }, "snapshot", "the path lies in a snapshot"},
+        {"/unknownfs/d", share("unknownfs", R"({"fs_type": -1})"), "file_system", "its file system is unknown (type -1)"},
+        {"/remote/d", share("remote", R"({"fs_type": 21})"), "file_system", "its file system is remote (type 21)"},
+        {"/image/d", share("image", R"({"fs_type": 31})"), "file_system", "its file system is image (type 31)"},
+        {"/twelve/d", share("twelve", R"({"fs_type": 12})"), "file_system", "its file system is never indexed (type 12)"},
+        {"/nosuch/d", [] {}, "share_path", "no share is named \"nosuch\""},
+        {"/surveillance/d", share("surveillance", "{}"), "skipped_share_name", "share \"surveillance\" is never indexed"},
+        {"/NetBackup/d", share("NetBackup", "{}"), "skipped_share_name", "share \"NetBackup\" is never indexed"},
+        {"/netbackup/d", share("netbackup", "{}"), Json::Value(), ""},
+        {"/twenty/d", share("twenty", R"({"fs_type": 20})"), "file_system", "its file system is remote (type 20)"},
+        {"/music/b", [] { qira_sim::InjectFault("QIRAGetFSType", 0x10); }, "file_system", "its file system is unknown (type -1)"},
+        {"/music/c", [] { qira_sim::InjectFault("QLIBShareIsReadOnlyGet", 0x20); }, "read_only_share",
+         "the read-only flag of share \"music\" cannot be read"},
+        {"/locked/d", share("locked", R"({"encrypted": true})"), "encrypted_share", "share \"locked\" is encrypted"},
+        {"/frozen/d", share("frozen", R"({"read_only": true})"), "read_only_share", "share \"frozen\" is read-only"},
         {"/music/mnt", [this] {
              MakeDir(music_ + "/mnt");
              qira_sim::PutShare("music", music_, J("{\"mount_points\": [\"" + music_ + "/mnt\"]}"));
-         }, "mount_point"},
+         }, "mount_point", "the path is a mount point in a share without encryption"},
         {"/music/link", [this] { ASSERT_EQ(symlink((music_ + "/a").c_str(), (music_ + "/link").c_str()), 0); },
-         "canonical_path"},
+         "canonical_path", "it is not its own real path, " + music_ + "/a: a symbolic link"},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.path);
@@ -52,6 +55,7 @@ TEST_F(ExplainTest, NamesTheRefusingRuleAndAgreesWithCanPathBeIndexed) {
         c.setUp();
         const Json::Value out = Explain(c.path);
         EXPECT_EQ(out["refused_by"], c.refusedBy);
+        EXPECT_EQ(out["problem"].isNull() ? "" : out["problem"].asString().substr(0, c.problem.size()), c.problem);
         EXPECT_EQ(out["indexable"].asBool(), CanPathBeIndexed(c.path));
         EXPECT_EQ(out["rules"].size(), 11u);  // every rule, in its order
         EXPECT_EQ(out["rules"][10]["rule"].asString(), "canonical_path");

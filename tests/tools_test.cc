@@ -103,6 +103,8 @@ TEST_F(ToolTest, EveryFailureNamesItsCauseInTextAndJsonAlike) {
          "folder get failed: FILEINDEX_ERR_NO_SUCH_FOLDER (4): no indexed folder has that path", nullptr},
         {{"--lock-wait", "0", "folder", "delete", "/music/a"}, 1, "FILEINDEX_ERR_LOCK",
          "folder delete failed: FILEINDEX_ERR_LOCK (9): the configuration lock is held by another process; try again", lockHeld},
+        {{"folder", "add", "music/b"}, 1, "BAD_PATH",
+         "folder add failed: BAD_PATH: \"music/b\" is no share path: it begins with \"/\" and a share's name, e.g. /music/live", nullptr},
         {{"folder", "add", "/music/b/"}, 1, "BAD_PATH", "folder add failed: BAD_PATH: drop the trailing \"/\": /music/b", nullptr},
         {{"folder", "add", "/music/../b"}, 1, "BAD_PATH",
          "folder add failed: BAD_PATH: \"/music/../b\" has an empty, \".\" or \"..\" component; give the folder's own path", nullptr},
@@ -169,6 +171,7 @@ TEST_F(ToolTest, JsonHasOneShapeAndSuccessCarriesNoLog) {
         EXPECT_EQ(out.getMemberNames(), members);
         EXPECT_EQ(out["error"], J(R"({"name": "FILEINDEX_ERR_NONE", "number": 0})"));
         EXPECT_EQ(out["log"], J("[]"));
+        EXPECT_EQ(out["saved"], J("[]"));
     }
     for (const auto& args : std::vector<std::vector<std::string>>{{"service", "status"}, {"progress", "--interval", "0.05"}}) {
         auto withJson = args;

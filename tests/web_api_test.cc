@@ -126,6 +126,9 @@ TEST_F(WebApiTest, EveryRouteAnswersWithTheLibrarysResultOrFailure) {
     EXPECT_EQ(Get("/api/folders?offset=1&limit=1&sort_by=name&sort_direction=DESC").body["result"]["folder"][0]["name"].asString(),
               "A");
     EXPECT_EQ(Get("/api/explain?path=/music/a").body["result"]["governing_folder"]["name"].asString(), "A");
+    // Numbers of up to nine digits are taken; a longer one stands for its default.
+    EXPECT_EQ(Get("/api/folders?offset=999999999&limit=1").body["result"]["offset"].asUInt(), 999999999u);
+    EXPECT_EQ(Get("/api/folders?offset=1000000000&limit=1").body["result"]["folder"].size(), 1u);
     const Answer failed = Post("/api/folders/delete", R"([5])");
     EXPECT_EQ(failed.body["error"], J(R"({"name": "FILEINDEX_ERR_BAD_PARAM", "number": 1})"));
     EXPECT_EQ(failed.body["log"], J(R"(["Bad param: 5"])"));
@@ -182,6 +185,7 @@ TEST_F(WebApiTest, EveryWriteRouteNeedsTheTokenTheSameOriginAndAJsonBody) {
         {"null origin", {{"X-Fileindex-Token", token_}, {"Origin", "null"}}, "", "application/json", pause, 403},
         {"cross-site fetch", {{"X-Fileindex-Token", token_}, {"Sec-Fetch-Site", "cross-site"}}, "", "application/json", pause, 403},
         {"text/plain", {{"X-Fileindex-Token", token_}}, "", "text/plain", pause, 415},
+        {"text/json", {{"X-Fileindex-Token", token_}}, "", "text/json", pause, 415},
         {"not JSON", {{"X-Fileindex-Token", token_}}, "", "application/json", "{", 400},
         {"over 64 KiB", {{"X-Fileindex-Token", token_}}, "", "application/json", std::string(64 * 1024 + 1, ' '), 413},
     };
