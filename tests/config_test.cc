@@ -91,7 +91,7 @@ TEST_F(ConfigTest, LocksConflictPerConfigurationAndAreFreeAfterUnlock) {
     EXPECT_TRUE(status.Lock(true));
     EXPECT_FALSE(second.Lock(true));
     EXPECT_FALSE(other.Lock(true));
-    EXPECT_EQ(testkit::LogMessages(), (std::vector<std::string>{"Failed to lock folder", "Failed to lock folder", "Failed to lock folder"}));
+    EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>(3, "Failed to lock folder"));
     for (Config* held : std::vector<Config*>{&second, &other, &status, &first}) held->Unlock();
     Folders third;
     EXPECT_TRUE(third.Lock(true));

@@ -151,8 +151,8 @@ TEST_F(UpsertTest, LaterStepsFailWithFolderConfAlreadyWritten) {
         _tag_fileindex_err_ error;
     };
     const std::vector<Case> cases = {
-        {"notifier refuses", "UpsertQIRANtifydCfg failed, share=music", [] { qira_sim::InjectFault("MonitorQueue::Upsert", 0x70); }, 0, false,
-         FILEINDEX_ERR_NONE},
+        {"notifier refuses", "UpsertQIRANtifydCfg failed, share=music", [] { qira_sim::InjectFault("MonitorQueue::Upsert", 0x70); },
+         0, false, FILEINDEX_ERR_NONE},
         {"service start fails", "QLIBServiceStart failed: err=[0x0070 sim/QLIBServiceStart:1]",
          [] { qira_sim::InjectFault("QLIBServiceStart", 0x70); }, 0, false, FILEINDEX_ERR_NONE},
         {"daemon unreachable", "SendCammandToDaemon failed", [this] { daemon_.reset(); }, 0, false, FILEINDEX_ERR_NONE},
