@@ -121,6 +121,7 @@ TEST_F(CustomEventTest, AnEventThatCannotBeQueuedMarksItsShare) {
     for (const auto& c : cases) {
         SCOPED_TRACE(c.name);
         unlink(StatusConf().c_str());
+        testkit::ClearLog();
         c.setUp();
         EXPECT_FALSE(AddCustomEvent(kEventReindex, c.path, Json::Value()));
         EXPECT_TRUE(testkit::Logged(c.logged));

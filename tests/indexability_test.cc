@@ -35,7 +35,7 @@ TEST_F(IndexabilityTest, SystemPreservedNamesSkippedFilesAndShareRules) {
         qira_sim::PutShare("s", dir_, J("{\"fs_type\": " + std::to_string(type) + "}"));
         EXPECT_TRUE(IsSkipIndex(dir_ + "/dir/f")) << type;
     }
-    // The share rules themselves are held by the explanation's table; a share is needed, and share paths resolve first.
+    // The share rules themselves are held by the explanation's table; here, that a share is needed.
     EXPECT_FALSE(CanShareBeIndexed(nullptr));
     for (const auto& [props, indexable] : {std::pair{R"({"read_only": true})", false}, {"{}", true}}) {
         qira_sim::PutShare("s", dir_, J(props));

@@ -44,7 +44,8 @@ TEST_F(QueriesTest, PathsInsideAndContainingAFolder) {
     }
 }
 
-// No file means nothing indexed; a malformed one answers no everywhere and says why.
+// No file means nothing indexed; a malformed one answers no everywhere and says why. A full path
+// is inside a folder on a slash boundary, and a folder whose share is gone holds every path.
 TEST_F(QueriesTest, AMissingOrMalformedFileFullPathsAndTheUnresolvableFolder) {
     std::vector<Folder> list(3);
     EXPECT_TRUE(IndexMgr::List(list));

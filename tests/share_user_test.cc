@@ -93,44 +93,42 @@ TEST_F(ShareUserTest, EaDirSwappedForALinkDuringCleanUpNeverReachesAnotherDirect
     index.ExpectUntouched();
 }
 
-// Every writer fails with error nine while another process holds its file's lock, changes nothing
-// and keeps no descriptor; readers take no lock.
+// Every writer fails with error nine while another process holds the lock of the file it writes,
+// changes nothing and keeps no descriptor; readers take no lock.
 TEST_F(ShareUserTest, WritersFailWithErrorNineWhileALockIsHeldAndLeakNothing) {
     testkit::WriteFile(StatusConf(), R"({"resume_time": -1})");
     const std::string folders = testkit::ReadFile(FolderConf());
-    testkit::ChildHolding folderLock([] { return Folders().Lock(true); });
-    testkit::ChildHolding statusLock([] { return Status().Lock(true); });
-    ASSERT_TRUE(folderLock.Took() && statusLock.Took());
     Json::Value out;
-    const std::vector<std::pair<const char*, std::function<bool()>>> writers = {
-        {"Upsert", [] { return IndexMgr::Upsert(J(R"([{"path": "/music/c"}])")); }},
-        {"Delete", [] { return IndexMgr::Delete(J(R"(["/music/a"])")); }},
-        {"Get", [&] { return IndexMgr::Get(out, "/music/a"); }},
-        {"ShareRemove", [] { return IndexMgr::ShareRemove("music"); }},
-        {"ShareRename", [] { return IndexMgr::ShareRename("music", "photo"); }},
-        {"Pause", [] { return StatusMgr::Pause(0); }},
-        {"Resume", [] { return StatusMgr::Resume(); }},
-        {"ShareSetNoSpace", [] { return StatusMgr::ShareSetNoSpace("music", true); }},
-        {"ShareSetNeedReindex", [] { return StatusMgr::ShareSetNeedReindex("music", true); }},
-        {"SetUpdated", [] { return StatusMgr::SetUpdated("m"); }},
-        {"ShareRevive", [] { return StatusMgr::ShareRevive("music"); }},
+    const std::vector<std::tuple<const char*, bool, std::function<bool()>>> writers = {
+        {"Upsert", false, [] { return IndexMgr::Upsert(J(R"([{"path": "/music/c"}])")); }},
+        {"Delete", false, [] { return IndexMgr::Delete(J(R"(["/music/a"])")); }},
+        {"Get", false, [&] { return IndexMgr::Get(out, "/music/a"); }},
+        {"ShareRemove", false, [] { return IndexMgr::ShareRemove("music"); }},
+        {"ShareRename", false, [] { return IndexMgr::ShareRename("music", "photo"); }},
+        {"Pause", true, [] { return StatusMgr::Pause(0); }},
+        {"Resume", true, [] { return StatusMgr::Resume(); }},
+        {"ShareSetNoSpace", true, [] { return StatusMgr::ShareSetNoSpace("music", true); }},
+        {"ShareSetNeedReindex", true, [] { return StatusMgr::ShareSetNeedReindex("music", true); }},
+        {"SetUpdated", true, [] { return StatusMgr::SetUpdated("m"); }},
+        {"ShareRevive", true, [] { return StatusMgr::ShareRevive("music"); }},
     };
     const auto openDescriptors = [] {
         const auto fds = std::filesystem::directory_iterator("/proc/self/fd");
         return std::distance(begin(fds), end(fds));
     };
-    const auto descriptors = openDescriptors();
-    for (const auto& [name, call] : writers) {
+    for (const auto& [name, ofStatus, call] : writers) {
         SCOPED_TRACE(name);
+        testkit::ChildHolding holder([ofStatus = ofStatus] { return ofStatus ? Status().Lock(true) : Folders().Lock(true); });
+        ASSERT_TRUE(holder.Took());
         testkit::ClearError();
+        const auto descriptors = openDescriptors();
         EXPECT_FALSE(call());
         EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
         EXPECT_EQ(openDescriptors(), descriptors);
+        long long resume = 0;
+        EXPECT_TRUE(StatusMgr::GetPauseInfo(resume) && resume == -1);
+        EXPECT_TRUE(IndexMgr::IsPathIndexed("/music/a"));
     }
-    long long resume = 0;
-    EXPECT_TRUE(StatusMgr::GetPauseInfo(resume));
-    EXPECT_EQ(resume, -1);
-    EXPECT_TRUE(IndexMgr::IsPathIndexed("/music/a"));
     EXPECT_EQ(testkit::ReadFile(FolderConf()), folders);
     EXPECT_EQ(testkit::ReadFile(StatusConf()), R"({"resume_time": -1})");
     EXPECT_TRUE(qira_sim::Journal().empty());

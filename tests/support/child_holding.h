@@ -39,6 +39,8 @@ public:
         const char go = 'g';
         if (write(release_[1], &go, 1) != 1) kill(pid_, SIGKILL);
         waitpid(pid_, nullptr, 0);
+        close(release_[0]);
+        close(release_[1]);
         pid_ = -1;
     }
 
