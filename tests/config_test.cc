@@ -137,12 +137,12 @@ TEST_F(ConfigTest, ReaderNeverSeesAPartialFileWhileAnotherProcessSaves) {
     EXPECT_GT(reads, 0);
 }
 
-// Reading is strict and bounded in depth: nothing but one JSON text, no comments, and a failed
-// read leaves the value alone.
+// Reading is strict and bounded in depth (kJsonNestingLimit levels and not one more): nothing but
+// one JSON text, no comments, and a failed read leaves the value alone.
 TEST(JsonTest, ReadingIsStrictAndBoundedInDepth) {
     const auto nested = [](int depth) { return std::string(depth, '[') + std::string(depth, ']'); };
     const std::vector<std::pair<std::string, bool>> cases = {
-        {" {\"a\": [1, 2]} \n", true}, {"7", true}, {nested(kJsonNestingLimit - 1), true}, {nested(kJsonNestingLimit + 2), false},
+        {" {\"a\": [1, 2]} \n", true}, {"7", true}, {nested(kJsonNestingLimit), true}, {nested(kJsonNestingLimit + 1), false},
         {"{\"a\":1} x", false}, {"[1 /* c */]", false}, {"{\"a\": 1 // c\n}", false}, {"{\"a\":1,}", false},
         {"{'a':1}", false}, {"[1,,2]", false}, {"", false}, {"nan", false}};
     for (const auto& [text, taken] : cases) {
@@ -155,7 +155,7 @@ TEST(JsonTest, ReadingIsStrictAndBoundedInDepth) {
     }
 }
 
-TEST_F(ConfigTest, JsonIsWrittenAsOneCompactLineAndFilesAreReplacedWhole) {
+TEST_F(ConfigTest, JsonIsWrittenAsOneCompactLineAndReadBackFromItsFile) {
     const std::string path = Path("/data.json");
     testkit::WriteFile(path, "old");
     Json::Value value(Json::objectValue);
