@@ -5,6 +5,12 @@ namespace {
 
 class ExplainTest : public testkit::IndexFixture {
 protected:
+    // "/d/d/.../d", `levels` components.
+    static std::string Deep(int levels) {
+        std::string path;
+        for (int i = 0; i < levels; ++i) path += "/d";
+        return path;
+    }
     Json::Value Explain(const std::string& path) {
         Json::Value out;
         EXPECT_TRUE(ExplainPath(path, out));
@@ -48,6 +54,10 @@ TEST_F(ExplainTest, NamesTheRefusingRuleAndAgreesWithCanPathBeIndexed) {
          }, "mount_point", "the path is a mount point in a share without encryption"},
         {"/music/link", [this] { ASSERT_EQ(symlink((music_ + "/a").c_str(), (music_ + "/link").c_str()), 0); },
          "canonical_path", "it is not its own real path, " + music_ + "/a: a symbolic link"},
+        {"/music/a/@tmp/x", [this] { MakeDir(music_ + "/a/@tmp/x"); }, "entry", "a component is a system name"},
+        {"/music/a/.DS_Store", [this] { MakeDir(music_ + "/a/.DS_Store"); }, "entry", "a component is a system name"},
+        {"/music" + Deep(64), [this] { MakeDir(music_ + Deep(64)); }, Json::Value(), ""},
+        {"/music" + Deep(65), [this] { MakeDir(music_ + Deep(65)); }, "entry", "too deep: more than 64 levels"},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.path);
@@ -56,9 +66,10 @@ TEST_F(ExplainTest, NamesTheRefusingRuleAndAgreesWithCanPathBeIndexed) {
         const Json::Value out = Explain(c.path);
         EXPECT_EQ(out["refused_by"], c.refusedBy);
         EXPECT_EQ(out["problem"].isNull() ? "" : out["problem"].asString().substr(0, c.problem.size()), c.problem);
-        EXPECT_EQ(out["indexable"].asBool(), CanPathBeIndexed(c.path));
-        EXPECT_EQ(out["rules"].size(), 11u);  // every rule, in its order
+        EXPECT_EQ(out["indexable"].asBool(), CanPathBeIndexed(c.path) && c.refusedBy != "entry");
+        EXPECT_EQ(out["rules"].size(), 12u);  // every rule, in its order, the daemon's entry rules last
         EXPECT_EQ(out["rules"][10]["rule"].asString(), "canonical_path");
+        EXPECT_EQ(out["rules"][11]["rule"].asString(), "entry");
     }
 }
 

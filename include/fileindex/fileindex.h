@@ -2,6 +2,7 @@
 #pragma once
 
 #include "fileindex/config.h"
+#include "fileindex/entry_rules.h"
 #include "fileindex/error.h"
 #include "fileindex/fileidx.h"
 #include "fileindex/explain.h"

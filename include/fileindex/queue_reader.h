@@ -34,5 +34,16 @@ FILEINDEX_EXPORT QueueReading ReadQueueRecords(const std::string& queueFile,
                                                const std::function<void(const QueueRecordView&)>& onRecord,
                                                const std::function<void(off_t offset, size_t length)>& onMalformed);
 
+// A slice of a queue file the caller opened (the daemon reaches it through the share directory's
+// descriptor): the lines from byte `from` on, until `maxRecords` records were handed out or the
+// file ends; `next` is the offset after the last line read (an unterminated last line included),
+// where the next slice starts. `queueFile` names the file in the refusal's log line and tells its
+// share. Refused like the whole reading (the share is marked need-reindex); Unopened when `fd` is
+// not a regular file. The descriptor's offset is left alone.
+FILEINDEX_EXPORT QueueReading ReadQueueSlice(int fd, const std::string& queueFile, off_t from, size_t maxRecords,
+                                             const std::function<void(const QueueRecordView&)>& onRecord,
+                                             const std::function<void(off_t offset, size_t length)>& onMalformed,
+                                             off_t& next);
+
 }  // namespace FILEINDEX
 }  // namespace QIRA

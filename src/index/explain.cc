@@ -2,6 +2,8 @@
 // the share's flags and what is pending for the path.
 #include "fileindex/explain.h"
 
+#include "fileindex/entry_rules.h"
+
 #include "fileindex/folders.h"
 #include "fileindex/index_mgr.h"
 #include "fileindex/status_mgr.h"
@@ -16,6 +18,9 @@ namespace FILEINDEX {
 namespace {
 
 constexpr char kSharePathRule[] = "share_path";
+constexpr char kEntryRule[] = "entry";
+constexpr char kEntryDescription[] =
+    "what the indexing daemon keeps out beneath a share: too deep, a system name, or a skipped directory on the way";
 
 std::string Quoted(const Json::Value& value) { return "\"" + value.asString() + "\""; }
 
@@ -25,6 +30,7 @@ std::string ProblemOf(const detail::RuleVerdict& verdict) {
     const std::string& rule = verdict.rule;
     const std::string share = Quoted(facts["share"]);
     if (rule == kSharePathRule) return "no share is named " + share;
+    if (rule == kEntryRule) return EntryRefusalWords(facts["refusal"].asCString());
     if (rule == "recycle_bin") return "the path lies in the share's recycle bin";
     if (rule == "snapshot") return "the path lies in a snapshot";
     if (rule == "file_system") {
@@ -67,6 +73,17 @@ Json::Value RulesJson(const std::vector<detail::RuleVerdict>& verdicts, Json::Va
     return rules;
 }
 
+// The rules the indexing daemon applies to every entry on the way from the share directory.
+detail::RuleVerdict EntryVerdict(const std::string& share, const std::string& fullPath) {
+    Json::Value facts(Json::objectValue);
+    std::string shareDir;
+    const char* refusal = detail::ShareFullPath(share, "/" + share, shareDir) ? EntryRefusal(shareDir, fullPath, true)
+                                                                             : "not_beneath";
+    facts["refusal"] = refusal != nullptr ? Json::Value(refusal) : Json::Value();
+    facts["max_depth"] = MaxEntryDepth();
+    return {kEntryRule, kEntryDescription, refusal != nullptr ? "refuse" : "pass", facts};
+}
+
 // The share path's own rule, before those of its full path.
 std::vector<detail::RuleVerdict> Verdicts(const std::string& share, const std::string& fullPath, bool resolved) {
     Json::Value facts(Json::objectValue);
@@ -76,10 +93,12 @@ std::vector<detail::RuleVerdict> Verdicts(const std::string& share, const std::s
         {kSharePathRule, "a share path whose share is unknown", resolved ? "pass" : "refuse", facts}};
     if (resolved) {
         detail::EvaluateFullPath(fullPath, &verdicts);
+        verdicts.push_back(EntryVerdict(share, fullPath));
     } else {
         for (const auto& [rule, description] : detail::IndexabilityRules()) {
             verdicts.push_back({rule, description, "not_evaluated", Json::Value()});
         }
+        verdicts.push_back({kEntryRule, kEntryDescription, "not_evaluated", Json::Value()});
     }
     return verdicts;
 }

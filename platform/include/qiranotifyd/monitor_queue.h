@@ -8,6 +8,10 @@
 namespace QIRA {
 namespace QIRANOTIFYD {
 
+// Directories at most this many components below their share directory are watched; what lies
+// deeper is neither watched nor reported.
+constexpr int kMaxTreeDepth = 64;
+
 enum _tag_monitor_queue_type_ {
     MONITOR_QUEUE_TYPE_NONE = 0,
     MONITOR_QUEUE_TYPE_CUSTOM = 1,
