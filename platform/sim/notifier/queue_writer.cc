@@ -14,10 +14,22 @@ namespace {
 
 constexpr std::chrono::milliseconds kLockPatience{1000};
 
-bool IsStillTheQueue(int fd, const std::string& path) {
+bool IsStillTheQueue(int fd, int dirFd, const std::string& name) {
     struct stat held, named;
-    return fstat(fd, &held) == 0 && lstat(path.c_str(), &named) == 0 && held.st_dev == named.st_dev &&
-           held.st_ino == named.st_ino;
+    return fstat(fd, &held) == 0 && fstatat(dirFd, name.c_str(), &named, AT_SYMLINK_NOFOLLOW) == 0 &&
+           held.st_dev == named.st_dev && held.st_ino == named.st_ino;
+}
+
+// The queue's directory ("<share>/@eaDir"), itself reached without following a link: a share's
+// users can put a link to another share's "@eaDir" in its place.
+int OpenQueueDir(const std::string& queuePath) {
+    const std::string dir = queuePath.substr(0, queuePath.rfind('/'));
+    const size_t slash = dir.rfind('/');
+    const int parent = open(slash == 0 ? "/" : dir.substr(0, slash).c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC);
+    if (parent < 0) return -1;
+    const int fd = openat(parent, dir.substr(slash + 1).c_str(), O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
+    close(parent);
+    return fd;
 }
 
 bool WriteLines(int fd, const std::vector<std::string>& lines) {
@@ -32,13 +44,11 @@ bool WriteLines(int fd, const std::vector<std::string>& lines) {
     return true;
 }
 
-}  // namespace
-
-bool AppendLines(const std::string& queuePath, const std::vector<std::string>& lines) {
+bool AppendLinesIn(int dirFd, const std::string& name, const std::vector<std::string>& lines) {
     const auto deadline = std::chrono::steady_clock::now() + kLockPatience;
     auto delay = std::chrono::milliseconds(1);
     while (std::chrono::steady_clock::now() < deadline) {
-        const int fd = open(queuePath.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC, 0644);
+        const int fd = openat(dirFd, name.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC, 0644);
         if (fd < 0) return false;
         if (flock(fd, LOCK_EX | LOCK_NB) != 0) {
             const int reason = errno;
@@ -48,7 +58,7 @@ bool AppendLines(const std::string& queuePath, const std::vector<std::string>& l
             delay = std::min(delay * 2, std::chrono::milliseconds(32));
             continue;
         }
-        if (!IsStillTheQueue(fd, queuePath)) {  // taken while we waited: open the new queue
+        if (!IsStillTheQueue(fd, dirFd, name)) {  // taken while we waited: open the new queue
             flock(fd, LOCK_UN);
             close(fd);
             continue;
@@ -59,6 +69,16 @@ bool AppendLines(const std::string& queuePath, const std::vector<std::string>& l
         return written;
     }
     return false;
+}
+
+}  // namespace
+
+bool AppendLines(const std::string& queuePath, const std::vector<std::string>& lines) {
+    const int dirFd = OpenQueueDir(queuePath);
+    if (dirFd < 0) return false;
+    const bool written = AppendLinesIn(dirFd, queuePath.substr(queuePath.rfind('/') + 1), lines);
+    close(dirFd);
+    return written;
 }
 
 }  // namespace qiranotifyd_sim

@@ -9,12 +9,14 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstring>
 #include <fstream>
 #include <iostream>
 
 #include <json/value.h>
 #include <json/writer.h>
 
+#include "qiranotifyd/monitor_queue.h"
 #include "queue_writer.h"
 
 namespace qiranotifyd_sim {
@@ -31,6 +33,15 @@ bool Ignored(const Root& root, const std::string& name) {
 
 bool IsWithin(const std::string& path, const std::string& dir) {
     return path.compare(0, dir.size(), dir) == 0 && (path.size() == dir.size() || path[dir.size()] == '/');
+}
+
+// Components of `dir` below the share directory holding the root's queue
+// ("<share>/@eaDir/<queue>").
+int DepthBelowShare(const Root& root, const std::string& dir) {
+    const std::string eaDir = root.queue.substr(0, root.queue.rfind('/'));
+    const std::string share = eaDir.substr(0, eaDir.rfind('/'));
+    if (!IsWithin(dir, share)) return 0;
+    return static_cast<int>(std::count(dir.begin() + static_cast<long>(share.size()), dir.end(), '/'));
 }
 
 std::string Limit(const char* name) {
@@ -84,6 +95,14 @@ void TreeWatcher::WatchTree(const Root& root, const std::string& dir, std::map<i
 
 bool TreeWatcher::AddWatch(const std::string& dir, const Root& root, std::map<int, Watch>& into,
                            std::set<std::string>& exhausted) {
+    // What lies deeper is never indexed: its directories are not watched.
+    if (DepthBelowShare(root, dir) >= QIRA::QIRANOTIFYD::kMaxTreeDepth) {
+        if (tooDeep_.insert(root.path).second) {
+            std::cout << "qiranotifyd-sim: not watching " << dir << " or anything deeper than "
+                      << QIRA::QIRANOTIFYD::kMaxTreeDepth << " levels below its share" << std::endl;
+        }
+        return false;
+    }
     const uint32_t mask = (root.mask & IN_ALL_EVENTS) | kTreeEvents | IN_ONLYDIR | IN_DONT_FOLLOW | IN_EXCL_UNLINK;
     const int wd = inotify_add_watch(fd_, dir.c_str(), mask);
     if (wd >= 0) {
@@ -93,6 +112,8 @@ bool TreeWatcher::AddWatch(const std::string& dir, const Root& root, std::map<in
     if (errno == ENOSPC && exhausted.insert(root.path).second) {
         lost_(root, "out of inotify watches at " + dir + "; raise fs.inotify.max_user_watches (now " +
                         Limit("max_user_watches") + ")");
+    } else if (errno != ENOSPC && unwatchable_.insert(root.path).second) {
+        std::cout << "qiranotifyd-sim: cannot watch " << dir << ": " << std::strerror(errno) << std::endl;
     }
     return false;
 }

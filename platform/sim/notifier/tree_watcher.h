@@ -10,7 +10,8 @@
 //   8    deleted (also moved out of the watched tree, or into an ignored name)
 //   256  moved inside the watched tree, from "path_old" to "path"
 // A directory created later is watched as it appears. Names on a root's ignore list (such as
-// "@eaDir") are neither watched nor reported, at any depth.
+// "@eaDir") are neither watched nor reported, at any depth; nor are directories deeper than
+// kMaxTreeDepth below the share directory, which is logged once per root.
 #pragma once
 
 #include <sys/types.h>
@@ -86,6 +87,8 @@ private:
     std::map<int, Watch> watches_;
     std::map<std::string, std::vector<std::string>> pending_;  // queue -> lines not yet appended
     std::map<std::string, std::vector<Root>> pendingRoots_;    // queue -> the roots they concern
+    std::set<std::string> tooDeep_;      // roots whose depth bound was logged
+    std::set<std::string> unwatchable_;  // roots with a directory that could not be watched, logged
 };
 
 }  // namespace qiranotifyd_sim
