@@ -142,13 +142,15 @@ TEST_F(LiveApplianceTest, SearchFindsPrefixesWithoutAccentsBestFirst) {
 
     pid_t web = -1;
     httplib::Client client("127.0.0.1", testkit::StartListening({FILEINDEX_WEB, "--listen", "127.0.0.1:0"}, Path("/web.log"), web));
-    const auto found = client.Get("/api/search?q=week&type=document");
+    const httplib::Headers token = {{"X-Fileindex-Token", testkit::ReadFile(Path("/usr/qira/etc/fileindex/web.token")).substr(0, 64)}};
+    EXPECT_EQ(client.Get("/api/search?q=week")->status, 403);  // a search reads the files' text: the token only
+    const auto found = client.Get("/api/search?q=week&type=document", token);
     ASSERT_TRUE(found);
     const Json::Value hit = testkit::ParseJson(found->body)["result"]["hits"][0];
     EXPECT_EQ(hit["path"].asString(), "/music/a/journal.txt");
     EXPECT_EQ(hit["snippet"], J(R"([{"text": "a ", "match": false}, {"text": "week", "match": true},
                                     {"text": " in crete", "match": false}])"));
-    EXPECT_EQ(client.Get("/api/search?q=")->status, 400);
+    EXPECT_EQ(client.Get("/api/search?q=", token)->status, 400);
     EXPECT_EQ(testkit::Stop(web), 0);
 }
 

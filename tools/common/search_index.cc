@@ -1,19 +1,29 @@
 #include "search_index.h"
 
+#include <fcntl.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <sqlite3.h>
 
 #include <algorithm>
 #include <cctype>
+#include <cerrno>
+#include <climits>
+#include <cstdlib>
+#include <ctime>
+#include <mutex>
+#include <set>
 #include <sstream>
+#include <tuple>
+
+#include "beneath.h"
 
 namespace tools {
 namespace {
 
+const char kPragmas[] = "PRAGMA journal_mode=WAL; PRAGMA synchronous=NORMAL;";
 const char kSchema[] =
-    "PRAGMA journal_mode=WAL;"
-    "PRAGMA synchronous=NORMAL;"
     "CREATE TABLE IF NOT EXISTS files(id INTEGER PRIMARY KEY, path TEXT NOT NULL UNIQUE, type TEXT NOT NULL,"
     " size INTEGER NOT NULL, mtime INTEGER NOT NULL);"
     "CREATE VIRTUAL TABLE IF NOT EXISTS search USING fts5(name, path, body,"
@@ -21,6 +31,79 @@ const char kSchema[] =
 
 // Rows at `?1` or beneath it: every path beneath sorts between "<path>/" and "<path>0".
 const char kUnder[] = "(path = ?1 OR (path >= ?1 || '/' AND path < ?1 || '0'))";
+
+// How long opening and checking an index may take.
+constexpr std::chrono::seconds kOpenBudget{2};
+// Virtual machine steps between two looks at the deadline.
+constexpr int kProgressSteps = 1000;
+
+// --- Files SQLite opens: beneath a registered share directory only --------------------------
+
+std::mutex g_dirsMutex;
+std::set<std::string> g_shareDirs;  // real paths
+
+bool IsWithinDir(const std::string& path, const std::string& dir) {
+    return path.size() > dir.size() && path.compare(0, dir.size(), dir) == 0 && path[dir.size()] == '/';
+}
+
+// The registered share directory holding `path`, or "".
+std::string ShareDirOf(const std::string& path) {
+    std::lock_guard<std::mutex> lock(g_dirsMutex);
+    std::string found;
+    for (const auto& dir : g_shareDirs) {
+        if (IsWithinDir(path, dir) && dir.size() > found.size()) found = dir;
+    }
+    return found;
+}
+
+// A regular file with one link, owned by this process's user when it is opened for writing; or
+// a directory opened for reading (SQLite syncs the directory of its journal).
+bool AcceptableFile(int fd, int flags) {
+    struct stat st;
+    if (fstat(fd, &st) != 0) return false;
+    if (S_ISDIR(st.st_mode)) return (flags & O_ACCMODE) == O_RDONLY;
+    const bool writing = (flags & O_ACCMODE) != O_RDONLY;
+    return S_ISREG(st.st_mode) && st.st_nlink == 1 && (!writing || st.st_uid == geteuid());
+}
+
+// SQLite's open(): resolved beneath the share directory, never through a link, never blocking.
+int ConfinedOpen(const char* path, int flags, int mode) {
+    const std::string file = path != nullptr ? path : "";
+    const std::string shareDir = ShareDirOf(file);
+    if (shareDir.empty()) {
+        errno = EACCES;
+        return -1;
+    }
+    const Fd base(open(shareDir.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+    if (!base.Valid()) return -1;
+    Fd fd(OpenBeneath(base.Get(), file.substr(shareDir.size() + 1), flags, static_cast<mode_t>(mode)));
+    if (!fd.Valid()) return -1;
+    if (!AcceptableFile(fd.Get(), flags)) {
+        errno = EPERM;
+        return -1;
+    }
+    // SQLite expects blocking descriptors for its regular files; O_NONBLOCK only kept a FIFO from
+    // holding the open.
+    fcntl(fd.Get(), F_SETFL, fcntl(fd.Get(), F_GETFL) & ~O_NONBLOCK);
+    return fd.Release();
+}
+
+// SQLite resolves links in a path by reading them: a link on the way makes the open fail.
+ssize_t RefusedReadlink(const char*, char*, size_t) {
+    errno = EPERM;
+    return -1;
+}
+
+void ConfineSqliteFiles() {
+    static std::once_flag once;
+    std::call_once(once, [] {
+        sqlite3_vfs* vfs = sqlite3_vfs_find(nullptr);
+        vfs->xSetSystemCall(vfs, "open", reinterpret_cast<sqlite3_syscall_ptr>(&ConfinedOpen));
+        vfs->xSetSystemCall(vfs, "readlink", reinterpret_cast<sqlite3_syscall_ptr>(&RefusedReadlink));
+    });
+}
+
+// --- Statements ------------------------------------------------------------------------------
 
 // A prepared statement, finalized on every way out.
 class Statement {
@@ -39,10 +122,16 @@ public:
         sqlite3_bind_int64(statement_, index, number);
         return *this;
     }
-    bool Step() { return sqlite3_step(statement_) == SQLITE_ROW; }
+    // True for each row; false at the end or on failure (Done tells which).
+    bool Step() {
+        rc_ = sqlite3_step(statement_);
+        return rc_ == SQLITE_ROW;
+    }
+    bool Done() const { return rc_ == SQLITE_DONE; }
+    bool Reset() { return sqlite3_reset(statement_) == SQLITE_OK; }
     bool Run() {
-        const int rc = sqlite3_step(statement_);
-        return rc == SQLITE_DONE || rc == SQLITE_ROW;
+        rc_ = sqlite3_step(statement_);
+        return rc_ == SQLITE_DONE || rc_ == SQLITE_ROW;
     }
     std::string Text(int column) const {
         const auto* text = sqlite3_column_text(statement_, column);
@@ -54,7 +143,48 @@ public:
 
 private:
     sqlite3_stmt* statement_ = nullptr;
+    int rc_ = SQLITE_OK;
 };
+
+using SchemaRows = std::vector<std::tuple<std::string, std::string, std::string, std::string>>;
+
+// Every object of the schema: type, name, table and SQL, sorted. Empty with `ok` false on failure.
+SchemaRows SchemaOf(sqlite3* db, bool& ok) {
+    SchemaRows rows;
+    Statement list(db, "SELECT type, name, tbl_name, coalesce(sql, '') FROM sqlite_schema");
+    while (list.Ok() && list.Step()) rows.emplace_back(list.Text(0), list.Text(1), list.Text(2), list.Text(3));
+    ok = list.Ok() && list.Done();
+    std::sort(rows.begin(), rows.end());
+    return rows;
+}
+
+// Our schema as SQLite stores it, made once in memory.
+const SchemaRows& OurSchema() {
+    static const SchemaRows schema = [] {
+        sqlite3* db = nullptr;
+        sqlite3_open_v2(":memory:", &db, SQLITE_OPEN_READWRITE, nullptr);
+        sqlite3_exec(db, kSchema, nullptr, nullptr, nullptr);
+        bool ok = false;
+        SchemaRows rows = SchemaOf(db, ok);
+        sqlite3_close(db);
+        return rows;
+    }();
+    return schema;
+}
+
+IndexProblem ProblemOf(int rc) {
+    switch (rc & 0xff) {
+        case SQLITE_CORRUPT:
+        case SQLITE_NOTADB:
+        case SQLITE_CANTOPEN:
+        case SQLITE_PERM:
+            return IndexProblem::Damaged;
+        case SQLITE_INTERRUPT:
+            return IndexProblem::TimedOut;
+        default:
+            return IndexProblem::Failed;
+    }
+}
 
 std::string NameOf(const std::string& path) { return path.substr(path.rfind('/') + 1); }
 
@@ -76,7 +206,39 @@ std::vector<std::pair<std::string, bool>> SnippetPieces(const std::string& snipp
     return pieces;
 }
 
+std::string RealPath(const std::string& path) {
+    char real[PATH_MAX];
+    return realpath(path.c_str(), real) != nullptr ? std::string(real) : std::string();
+}
+
+// The index file as it stands: false when there is none; `acceptable` false when it is not one
+// SQLite may open (see AcceptableFile).
+bool IndexFileStat(const std::string& shareDir, bool writing, struct stat& st, bool& acceptable) {
+    const Fd base(open(shareDir.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+    const Fd fd(base.Valid() ? OpenBeneath(base.Get(), std::string(SearchIndex::kDirName) + "/" + SearchIndex::kFileName,
+                                           O_RDONLY)
+                             : -1);
+    if (!fd.Valid()) {
+        acceptable = errno == ENOENT;
+        return false;
+    }
+    acceptable = fstat(fd.Get(), &st) == 0 && AcceptableFile(fd.Get(), writing ? O_RDWR : O_RDONLY);
+    return true;
+}
+
 }  // namespace
+
+std::string QueryError(const std::string& query) {
+    if (query.size() > kMaxQueryBytes) {
+        return "the query is longer than " + std::to_string(kMaxQueryBytes) + " bytes";
+    }
+    std::istringstream in(query);
+    size_t words = 0;
+    for (std::string word; in >> word;) ++words;
+    if (words > kMaxQueryWords) return "the query has more than " + std::to_string(kMaxQueryWords) + " words";
+    if (MatchExpression(query).empty()) return "the query holds no word";
+    return "";
+}
 
 std::string MatchExpression(const std::string& words) {
     std::istringstream in(words);
@@ -93,84 +255,174 @@ std::string MatchExpression(const std::string& words) {
     return expression;
 }
 
-std::unique_ptr<SearchIndex> SearchIndex::Open(const std::string& dbDir, bool create, std::string& error) {
-    const std::string file = dbDir + "/" + kFileName;
+std::unique_ptr<SearchIndex> SearchIndex::Open(const std::string& shareDir, bool create, IndexProblem& problem,
+                                               std::string& error) {
+    ConfineSqliteFiles();
+    const std::string real = RealPath(shareDir);
+    problem = IndexProblem::Missing;
+    error = "the share directory " + shareDir + " cannot be reached";
+    if (real.empty()) return nullptr;
+    {
+        std::lock_guard<std::mutex> lock(g_dirsMutex);
+        g_shareDirs.insert(real);
+    }
+    struct stat before{};
+    bool acceptable = false;
+    const bool existed = IndexFileStat(real, create, before, acceptable);
+    if (!acceptable) {
+        problem = IndexProblem::Damaged;
+        error = "the index is not a regular file of this service reached without a link";
+        return nullptr;
+    }
+    if (!existed && !create) {
+        error = "the share has no index yet";
+        return nullptr;
+    }
+    const std::string file = real + "/" + kDirName + "/" + kFileName;
     sqlite3* db = nullptr;
     const int flags = (create ? SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE : SQLITE_OPEN_READONLY) | SQLITE_OPEN_NOFOLLOW;
-    if (sqlite3_open_v2(file.c_str(), &db, flags, nullptr) != SQLITE_OK) {
+    const int rc = sqlite3_open_v2(file.c_str(), &db, flags, nullptr);
+    std::unique_ptr<SearchIndex> index(new SearchIndex(db, real, 0, 0));
+    if (rc != SQLITE_OK) {
+        problem = existed ? ProblemOf(rc) : IndexProblem::Failed;
         error = db ? sqlite3_errmsg(db) : "out of memory";
-        sqlite3_close(db);
         return nullptr;
     }
-    sqlite3_busy_timeout(db, 5000);
-    struct stat st;
-    if ((create && sqlite3_exec(db, kSchema, nullptr, nullptr, nullptr) != SQLITE_OK) || stat(file.c_str(), &st) != 0) {
-        error = sqlite3_errmsg(db);
-        sqlite3_close(db);
+    sqlite3_db_config(db, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);
+    sqlite3_db_config(db, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
+    sqlite3_progress_handler(db, kProgressSteps, &SearchIndex::OnProgress, index.get());
+    sqlite3_busy_timeout(db, 1000);
+    index->SetDeadline(std::chrono::steady_clock::now() + kOpenBudget);
+    const bool made = !create || (index->Exec(kPragmas) && index->Exec(kSchema));
+    bool listed = false;
+    const bool ours = made && SchemaOf(db, listed) == OurSchema();
+    struct stat after{};
+    const bool same = IndexFileStat(real, create, after, acceptable) && acceptable &&
+                      (!existed || (after.st_dev == before.st_dev && after.st_ino == before.st_ino));
+    if (!ours || !same) {
+        problem = !made || !listed ? (index->problem_ == IndexProblem::None ? ProblemOf(sqlite3_extended_errcode(db))
+                                                                            : index->problem_)
+                                   : IndexProblem::Damaged;
+        error = !made || !listed ? sqlite3_errmsg(db) : "the index's schema is not this service's";
         return nullptr;
     }
-    return std::unique_ptr<SearchIndex>(new SearchIndex(db, file, st.st_dev, st.st_ino));
+    index->dev_ = after.st_dev;
+    index->ino_ = after.st_ino;
+    index->SetDeadline(std::chrono::steady_clock::time_point::max());
+    problem = IndexProblem::None;
+    error.clear();
+    return index;
+}
+
+std::string SearchIndex::SetAside(const std::string& shareDir) {
+    const std::string real = RealPath(shareDir);
+    const Fd base(real.empty() ? -1 : open(real.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+    if (!base.Valid()) return "";
+    const std::string suffix = ".set-aside." + std::to_string(time(nullptr)) + "." + std::to_string(getpid());
+    const Fd dir(OpenBeneath(base.Get(), kDirName, O_RDONLY | O_DIRECTORY));
+    if (!dir.Valid()) {
+        // The database directory itself is of the wrong kind: move it aside in "@eaDir".
+        const Fd eaDir(OpenBeneath(base.Get(), "@eaDir", O_RDONLY | O_DIRECTORY));
+        const std::string name = NameOf(kDirName);
+        if (!eaDir.Valid() || errno == ENOENT || renameat(eaDir.Get(), name.c_str(), eaDir.Get(), (name + suffix).c_str()) != 0) {
+            return "";
+        }
+        return real + "/@eaDir/" + name + suffix;
+    }
+    const std::string name = kFileName;
+    if (renameat(dir.Get(), name.c_str(), dir.Get(), (name + suffix).c_str()) != 0) return "";
+    for (const char* extra : {"-wal", "-shm"}) unlinkat(dir.Get(), (name + extra).c_str(), 0);
+    return real + "/" + kDirName + "/" + name + suffix;
 }
 
 SearchIndex::~SearchIndex() { sqlite3_close(db_); }
 
-bool SearchIndex::StillOnDisk() const {
-    struct stat st;
-    return stat(file_.c_str(), &st) == 0 && st.st_dev == dev_ && st.st_ino == ino_;
+int SearchIndex::OnProgress(void* self) {
+    const auto* index = static_cast<const SearchIndex*>(self);
+    return (index->stop_ != nullptr && *index->stop_ != 0) || std::chrono::steady_clock::now() >= index->deadline_;
 }
 
-bool SearchIndex::Exec(const char* sql) { return sqlite3_exec(db_, sql, nullptr, nullptr, nullptr) == SQLITE_OK; }
+void SearchIndex::SetDeadline(std::chrono::steady_clock::time_point deadline, const volatile sig_atomic_t* stop) {
+    deadline_ = deadline;
+    stop_ = stop;
+}
 
-bool SearchIndex::Begin() { return Exec("BEGIN IMMEDIATE"); }
+bool SearchIndex::StillOnDisk() const {
+    struct stat st{};
+    bool acceptable = false;
+    return IndexFileStat(shareDir_, false, st, acceptable) && st.st_dev == dev_ && st.st_ino == ino_;
+}
+
+bool SearchIndex::Check(int rc) {
+    if (rc == SQLITE_OK || rc == SQLITE_DONE || rc == SQLITE_ROW) return true;
+    problem_ = ProblemOf(sqlite3_extended_errcode(db_));
+    return false;
+}
+
+bool SearchIndex::Exec(const char* sql) { return Check(sqlite3_exec(db_, sql, nullptr, nullptr, nullptr)); }
+
+bool SearchIndex::Begin() {
+    problem_ = IndexProblem::None;
+    return Exec("BEGIN IMMEDIATE");
+}
 
 bool SearchIndex::Commit() { return Exec("COMMIT"); }
+
+void SearchIndex::Rollback() {
+    if (sqlite3_get_autocommit(db_) == 0) sqlite3_exec(db_, "ROLLBACK", nullptr, nullptr, nullptr);
+}
 
 bool SearchIndex::Put(const IndexedFile& file) {
     Statement upsert(db_,
                      "INSERT INTO files(path, type, size, mtime) VALUES(?1, ?2, ?3, ?4) ON CONFLICT(path) DO UPDATE SET"
                      " type = excluded.type, size = excluded.size, mtime = excluded.mtime RETURNING id");
     if (!upsert.Ok() || !upsert.Bind(1, file.path).Bind(2, file.type).Bind(3, file.size).Bind(4, file.mtime).Step()) {
-        return false;
+        return Check(SQLITE_ERROR);
     }
     const long long id = upsert.Number(0);
+    // Finished before the next statement: a RETURNING statement left open and finalized later,
+    // after other writes, rolls the whole transaction back in defensive mode.
+    if (!upsert.Reset()) return Check(SQLITE_ERROR);
     Statement drop(db_, "DELETE FROM search WHERE rowid = ?1");
     Statement add(db_, "INSERT INTO search(rowid, name, path, body) VALUES(?1, ?2, ?3, ?4)");
-    return drop.Ok() && add.Ok() && drop.Bind(1, id).Run() &&
-           add.Bind(1, id).Bind(2, NameOf(file.path)).Bind(3, file.path).Bind(4, file.text).Run();
+    return (drop.Ok() && add.Ok() && drop.Bind(1, id).Run() &&
+            add.Bind(1, id).Bind(2, NameOf(file.path)).Bind(3, file.path).Bind(4, file.text).Run()) ||
+           Check(SQLITE_ERROR);
 }
 
 bool SearchIndex::Remove(const std::string& path) {
     Statement search(db_, std::string("DELETE FROM search WHERE rowid IN (SELECT id FROM files WHERE ") + kUnder + ")");
     Statement files(db_, std::string("DELETE FROM files WHERE ") + kUnder);
-    return search.Ok() && files.Ok() && search.Bind(1, path).Run() && files.Bind(1, path).Run();
+    return (search.Ok() && files.Ok() && search.Bind(1, path).Run() && files.Bind(1, path).Run()) || Check(SQLITE_ERROR);
 }
 
 bool SearchIndex::Rename(const std::string& from, const std::string& to) {
     if (from == to) return true;
     if (!Remove(to)) return false;
     Statement rows(db_, std::string("SELECT id, path FROM files WHERE ") + kUnder);
-    if (!rows.Ok()) return false;
+    if (!rows.Ok()) return Check(SQLITE_ERROR);
     rows.Bind(1, from);
     std::vector<std::pair<long long, std::string>> moved;
     while (rows.Step()) moved.emplace_back(rows.Number(0), to + rows.Text(1).substr(from.size()));
+    if (!rows.Done()) return Check(SQLITE_ERROR);
     for (const auto& [id, path] : moved) {
         Statement file(db_, "UPDATE files SET path = ?2 WHERE id = ?1");
         Statement search(db_, "UPDATE search SET name = ?2, path = ?3 WHERE rowid = ?1");
         if (!file.Ok() || !search.Ok() || !file.Bind(1, id).Bind(2, path).Run() ||
             !search.Bind(1, id).Bind(2, NameOf(path)).Bind(3, path).Run()) {
-            return false;
+            return Check(SQLITE_ERROR);
         }
     }
     return true;
 }
 
-std::map<std::string, std::pair<long long, long long>> SearchIndex::Under(const std::string& path) {
-    std::map<std::string, std::pair<long long, long long>> stored;
+bool SearchIndex::Under(const std::string& path, std::map<std::string, std::pair<long long, long long>>& stored) {
+    stored.clear();
     Statement rows(db_, std::string("SELECT path, size, mtime FROM files WHERE ") + kUnder);
-    if (!rows.Ok()) return stored;
+    if (!rows.Ok()) return Check(SQLITE_ERROR);
     rows.Bind(1, path);
     while (rows.Step()) stored[rows.Text(0)] = {rows.Number(1), rows.Number(2)};
-    return stored;
+    return rows.Done() || Check(SQLITE_ERROR);
 }
 
 long long SearchIndex::Count() {
@@ -180,24 +432,22 @@ long long SearchIndex::Count() {
 
 bool SearchIndex::Search(const std::string& query, const std::string& type, int limit, std::vector<SearchHit>& hits,
                          std::string& error) {
-    const std::string expression = MatchExpression(query);
-    if (expression.empty()) {
-        error = "the query holds no word";
-        return false;
-    }
+    error = QueryError(query);
+    if (!error.empty()) return false;
     Statement rows(db_,
                    "SELECT f.path, f.type, f.size, f.mtime, bm25(search, 10.0, 2.0, 1.0) AS rank,"
                    " snippet(search, -1, char(2), char(3), '…', 12) FROM search JOIN files f ON f.id = search.rowid"
                    " WHERE search MATCH ?1 AND (?2 = '' OR f.type = ?2) ORDER BY rank LIMIT ?3");
-    if (!rows.Ok()) {
-        error = sqlite3_errmsg(db_);
-        return false;
+    if (rows.Ok()) {
+        rows.Bind(1, MatchExpression(query)).Bind(2, type).Bind(3, static_cast<long long>(limit));
+        while (rows.Step()) {
+            hits.push_back({rows.Text(0), rows.Text(1), rows.Number(2), rows.Number(3), rows.Real(4), SnippetPieces(rows.Text(5))});
+        }
+        if (rows.Done()) return true;
     }
-    rows.Bind(1, expression).Bind(2, type).Bind(3, static_cast<long long>(limit));
-    while (rows.Step()) {
-        hits.push_back({rows.Text(0), rows.Text(1), rows.Number(2), rows.Number(3), rows.Real(4), SnippetPieces(rows.Text(5))});
-    }
-    return true;
+    Check(SQLITE_ERROR);
+    error = problem_ == IndexProblem::TimedOut ? "the search took too long" : sqlite3_errmsg(db_);
+    return false;
 }
 
 }  // namespace tools

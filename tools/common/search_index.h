@@ -1,11 +1,20 @@
-// One share's search index: an SQLite database in the share's index database directory (the
-// directory FILEIDXDBPathGet gives), with an FTS5 table over each indexed file's name, share path
-// and, for plain-text documents, its text. The daemon stand-in writes it; fileindexctl and the
-// console search it. Accents and letter case do not matter in a search, and every term is a prefix.
+// One share's search index: an SQLite database "index.sqlite" in the share's index database
+// directory ("<share>/@eaDir/QIRA@.fileindexdb"), with an FTS5 table over each indexed file's
+// name, share path and, for plain-text documents, its text. The daemon stand-in writes it;
+// fileindexctl and the console search it. Accents and letter case do not matter in a search, and
+// every term is a prefix.
+//
+// The share's users can write in "@eaDir", so the index is treated as hostile. Every file SQLite
+// opens for it is reached beneath the share directory without a link on the way (openat2),
+// without blocking, and must be a regular file with one link (a writable one also owned by this
+// process's user). The schema must be exactly ours (no view, no trigger), SQLite runs in defensive
+// mode without trusting the schema, and every statement runs under a deadline.
 #pragma once
 
 #include <sys/types.h>
 
+#include <chrono>
+#include <csignal>
 #include <map>
 #include <memory>
 #include <string>
@@ -33,48 +42,84 @@ struct SearchHit {
     std::vector<std::pair<std::string, bool>> snippet;  // pieces of text, true for the matched ones
 };
 
+// Why an index could not be opened or used.
+enum class IndexProblem {
+    None,
+    Missing,  // no index file (yet)
+    Damaged,  // not a regular file of ours, a link on the way, not SQLite, corrupt, or a schema not ours
+    TimedOut, // a statement ran past its deadline or was stopped
+    Failed,   // anything else (locked, out of memory, ...)
+};
+
+// A query is refused beyond these bounds, with an error naming the bound.
+constexpr size_t kMaxQueryBytes = 1024;
+constexpr size_t kMaxQueryWords = 32;
+
 class SearchIndex {
 public:
     static constexpr const char* kFileName = "index.sqlite";
+    static constexpr const char* kDirName = "@eaDir/QIRA@.fileindexdb";
 
-    // Opens the index in `dbDir`; `create` makes it (write-ahead log, schema) when it is missing,
-    // otherwise a missing index is an error. Null with `error` set on failure.
-    static std::unique_ptr<SearchIndex> Open(const std::string& dbDir, bool create, std::string& error);
+    // Opens the index of the share whose directory is `shareDir`: read-write with `create` (the
+    // file and schema are made when missing), read-only otherwise. Null with `problem` and `error`
+    // set on failure; nothing is written to a file that fails the checks.
+    static std::unique_ptr<SearchIndex> Open(const std::string& shareDir, bool create, IndexProblem& problem,
+                                             std::string& error);
+    // Moves the share's index file (or a database directory of the wrong kind) aside under a new
+    // name in the same directory, never following a link, with the write-ahead log and shared
+    // memory files. The name it was moved to, or "" when there was nothing to move or it failed.
+    static std::string SetAside(const std::string& shareDir);
+
     ~SearchIndex();
     SearchIndex(const SearchIndex&) = delete;
     SearchIndex& operator=(const SearchIndex&) = delete;
 
     // True while the index file is the one opened: not removed or replaced since.
     bool StillOnDisk() const;
+    // Statements fail with TimedOut once `deadline` passes or `*stop` becomes nonzero.
+    void SetDeadline(std::chrono::steady_clock::time_point deadline, const volatile sig_atomic_t* stop = nullptr);
+    // What made the last failing call fail.
+    IndexProblem LastProblem() const { return problem_; }
 
     bool Begin();
     bool Commit();
+    void Rollback();
     bool Put(const IndexedFile& file);
     // Removes `path` and everything beneath it.
     bool Remove(const std::string& path);
     // Moves `from` and everything beneath it to `to`.
     bool Rename(const std::string& from, const std::string& to);
-    // Every stored path at or beneath `path`, with its size and modification time.
-    std::map<std::string, std::pair<long long, long long>> Under(const std::string& path);
+    // Every stored path at or beneath `path`, with its size and modification time; false on failure.
+    bool Under(const std::string& path, std::map<std::string, std::pair<long long, long long>>& stored);
     long long Count();
 
     // The best hits for `query` (words, each a prefix, all required), of one type when `type` is
-    // not empty. False, with `error` set, when the query holds no word.
+    // not empty. False, with `error` set, when the query fails QueryError or the statement fails.
     bool Search(const std::string& query, const std::string& type, int limit, std::vector<SearchHit>& hits,
                 std::string& error);
 
 private:
-    SearchIndex(sqlite3* db, std::string file, dev_t dev, ino_t ino) : db_(db), file_(std::move(file)), dev_(dev), ino_(ino) {}
+    SearchIndex(sqlite3* db, std::string shareDir, dev_t dev, ino_t ino)
+        : db_(db), shareDir_(std::move(shareDir)), dev_(dev), ino_(ino) {}
     bool Exec(const char* sql);
+    bool Check(int rc);
+    static int OnProgress(void* self);
 
     sqlite3* db_;
-    std::string file_;
+    std::string shareDir_;
     dev_t dev_;
     ino_t ino_;
+    std::chrono::steady_clock::time_point deadline_ = std::chrono::steady_clock::time_point::max();
+    const volatile sig_atomic_t* stop_ = nullptr;
+    IndexProblem problem_ = IndexProblem::None;
 };
 
 // The FTS5 query for a person's words: each word quoted and a prefix, all required; "" when there
 // is no word (punctuation alone is none).
 std::string MatchExpression(const std::string& words);
+
+// Why `query` cannot be searched ("" when it can): longer than kMaxQueryBytes, more than
+// kMaxQueryWords words, or no word at all.
+std::string QueryError(const std::string& query);
 
 }  // namespace tools

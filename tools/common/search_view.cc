@@ -1,15 +1,23 @@
 #include "search_view.h"
 
+#include <fcntl.h>
+#include <unistd.h>
+
 #include <algorithm>
-#include <vector>
+#include <chrono>
 
 #include "fileindex/fileindex.h"
 #include "output.h"
 #include "search_index.h"
 #include "service_view.h"
+#include "text_safety.h"
 
 namespace tools {
 namespace {
+
+// How long one share's search may take.
+constexpr std::chrono::seconds kSearchBudget{2};
+const char kReplacement[] = "\xEF\xBF\xBD";  // U+FFFD
 
 // The shares to search: the one asked for, or every share holding indexed folders.
 std::vector<std::string> SharesToSearch(const std::string& share) {
@@ -23,11 +31,71 @@ Json::Value SnippetJson(const std::vector<std::pair<std::string, bool>>& pieces)
     Json::Value snippet(Json::arrayValue);
     for (const auto& [text, match] : pieces) {
         Json::Value piece(Json::objectValue);
-        piece["text"] = text;
+        piece["text"] = ValidUtf8(text, kReplacement);
         piece["match"] = match;
         snippet.append(piece);
     }
     return snippet;
+}
+
+Json::Value HitJson(const std::string& share, const SearchHit& hit) {
+    Json::Value entry(Json::objectValue);
+    entry["share"] = share;
+    entry["path"] = ValidUtf8(hit.path, kReplacement);
+    if (!IsValidUtf8(hit.path) || hit.path.find('\0') != std::string::npos) entry["path_hex"] = Hex(hit.path);
+    entry["type"] = hit.type;
+    entry["size"] = static_cast<Json::Int64>(hit.size);
+    entry["mtime"] = static_cast<Json::Int64>(hit.mtime);
+    entry["mtime_utc"] = FormatUtc(hit.mtime);
+    entry["snippet"] = SnippetJson(hit.snippet);
+    return entry;
+}
+
+Cause IndexCause(IndexProblem problem, const std::string& share, const std::string& error) {
+    switch (problem) {
+        case IndexProblem::Missing:
+            return {"INDEX_MISSING", 0, "share " + share + " has no index yet: " + error, 404};
+        case IndexProblem::Damaged:
+            return {"INDEX_DAMAGED", 0,
+                    "the index of share " + share + " is damaged or not this service's (" + error +
+                        "); the indexing daemon sets it aside and rebuilds it",
+                    503};
+        case IndexProblem::TimedOut:
+            return {"SEARCH_TIMED_OUT", 0, "the search of share " + share + " took too long: " + error, 503};
+        default:
+            return {"INDEX_UNREADABLE", 0, "the index of share " + share + " cannot be read: " + error, 503};
+    }
+}
+
+Json::Value CauseJson(const std::string& share, const Cause& cause) {
+    Json::Value entry(Json::objectValue);
+    entry["share"] = share;
+    entry["cause"] = cause.name;
+    entry["message"] = cause.text;
+    return entry;
+}
+
+// One share's hits; false with `cause` when its index cannot be read.
+bool SearchOne(const SearchRequest& request, const SearchTarget& target, std::vector<SearchHit>& hits, Cause& cause) {
+    if (target.shareDir.empty()) {
+        cause = {"SHARE_UNKNOWN", 0, "no share is named \"" + target.share + "\"", 404};
+        return false;
+    }
+    if (faccessat(AT_FDCWD, target.shareDir.c_str(), R_OK | X_OK, AT_EACCESS) != 0) {
+        cause = {"NOT_PERMITTED", 0, "you may not read the directory of share " + target.share, 403};
+        return false;
+    }
+    IndexProblem problem = IndexProblem::None;
+    std::string error;
+    const auto index = SearchIndex::Open(target.shareDir, false, problem, error);
+    if (!index) {
+        cause = IndexCause(problem, target.share, error);
+        return false;
+    }
+    index->SetDeadline(std::chrono::steady_clock::now() + kSearchBudget);
+    if (index->Search(request.query, request.type, request.limit, hits, error)) return true;
+    cause = IndexCause(index->LastProblem(), target.share, error);
+    return false;
 }
 
 }  // namespace
@@ -36,41 +104,59 @@ bool IsSearchType(const std::string& type) {
     return type.empty() || type == "document" || type == "audio" || type == "video" || type == "photo";
 }
 
-bool SearchShares(const SearchRequest& request, Json::Value& out, std::string& error) {
+bool SearchTargets(const SearchRequest& request, std::vector<SearchTarget>& targets, Cause& cause) {
     if (!IsSearchType(request.type)) {
-        error = "unknown type \"" + request.type + "\"; use document, audio, video or photo";
+        cause = {"BAD_QUERY", 0, "unknown type \"" + request.type + "\"; use document, audio, video or photo", 400};
         return false;
     }
-    if (MatchExpression(request.query).empty()) {
-        error = "the query holds no word";
+    const std::string error = QueryError(request.query);
+    if (!error.empty()) {
+        cause = {"BAD_QUERY", 0, error, 400};
         return false;
     }
-    std::vector<std::pair<std::string, SearchHit>> hits;
+    targets.clear();
     for (const auto& share : SharesToSearch(request.share)) {
-        char dbDir[4096];
-        if (FILEIDXDBPathGet(share.c_str(), dbDir, sizeof dbDir) < 0) continue;
-        std::string openError;
-        const auto index = SearchIndex::Open(dbDir, false, openError);
-        std::vector<SearchHit> found;
-        if (!index || !index->Search(request.query, request.type, request.limit, found, error)) continue;
-        for (auto& hit : found) hits.emplace_back(share, std::move(hit));
-    }
-    std::stable_sort(hits.begin(), hits.end(), [](const auto& a, const auto& b) { return a.second.rank < b.second.rank; });
-    if (hits.size() > static_cast<size_t>(request.limit)) hits.resize(static_cast<size_t>(request.limit));
-    out = Json::Value(Json::objectValue);
-    out["hits"] = Json::Value(Json::arrayValue);
-    for (const auto& [share, hit] : hits) {
-        Json::Value entry(Json::objectValue);
-        entry["share"] = share;
-        entry["path"] = hit.path;
-        entry["type"] = hit.type;
-        entry["size"] = static_cast<Json::Int64>(hit.size);
-        entry["mtime"] = static_cast<Json::Int64>(hit.mtime);
-        entry["mtime_utc"] = FormatUtc(hit.mtime);
-        entry["snippet"] = SnippetJson(hit.snippet);
-        out["hits"].append(entry);
+        SearchTarget target{share, "", QIRA::FILEINDEX::StatusMgr::ShareIsNeedReindex(share)};
+        if (!QIRA::FILEINDEX::GetFullPath(target.shareDir, "/" + share)) target.shareDir.clear();
+        targets.push_back(target);
     }
     return true;
+}
+
+bool SearchIndexes(const SearchRequest& request, const std::vector<SearchTarget>& targets, Json::Value& out,
+                   Cause& cause) {
+    std::vector<std::pair<std::string, SearchHit>> hits;
+    out = Json::Value(Json::objectValue);
+    out["incomplete"] = Json::Value(Json::arrayValue);
+    bool searched = false;
+    for (const auto& target : targets) {
+        std::vector<SearchHit> found;
+        Cause failed;
+        if (!SearchOne(request, target, found, failed)) {
+            if (out["incomplete"].empty()) cause = failed;
+            out["incomplete"].append(CauseJson(target.share, failed));
+            continue;
+        }
+        searched = true;
+        if (target.rebuilding) {
+            out["incomplete"].append(CauseJson(target.share, {"INDEX_REBUILDING", 0,
+                                                              "the index of share " + target.share +
+                                                                  " is being rebuilt: some files may be missing",
+                                                              200}));
+        }
+        for (auto& hit : found) hits.emplace_back(target.share, std::move(hit));
+    }
+    if (!searched && !targets.empty()) return false;
+    std::stable_sort(hits.begin(), hits.end(), [](const auto& a, const auto& b) { return a.second.rank < b.second.rank; });
+    if (hits.size() > static_cast<size_t>(request.limit)) hits.resize(static_cast<size_t>(request.limit));
+    out["hits"] = Json::Value(Json::arrayValue);
+    for (const auto& [share, hit] : hits) out["hits"].append(HitJson(share, hit));
+    return true;
+}
+
+bool SearchShares(const SearchRequest& request, Json::Value& out, Cause& cause) {
+    std::vector<SearchTarget> targets;
+    return SearchTargets(request, targets, cause) && SearchIndexes(request, targets, out, cause);
 }
 
 }  // namespace tools

@@ -223,22 +223,29 @@ void AddApiRoutes(HttpServer& server, const std::string& token) {
         Run(res, "progress", [](Json::Value& result) { return QIRA::FILEINDEX::GetProgress(result); });
     });
     server.Get("/api/status", [](const Request&, Response& res) { Run(res, "status", ServiceStatus); });
-    server.Get("/api/search", [](const Request& req, Response& res) {
+    // Answered beside other requests: the library is held only while the shares are found, and
+    // the indexes, which a share's users can write, are read without it.
+    server.GetSlow("/api/search", [token](const Request& req, Response& res) {
+        if (!req.HasHeader("X-Fileindex-Token") || !TokenMatches(req.Header("X-Fileindex-Token"), token)) {
+            return Refuse(res, 403, "a search reads the files' text: it needs the console's token in X-Fileindex-Token");
+        }
         tools::SearchRequest request;
         request.query = Param(req, "q");
         request.type = Param(req, "type");
         request.share = Param(req, "share");
         request.limit = static_cast<int>(std::min<unsigned long>(Number(req, "limit", 20), 200));
-        std::optional<tools::Cause> refused;
-        Run(
-            res, "search",
-            [&](Json::Value& result) {
-                std::string error;
-                if (tools::SearchShares(request, result, error)) return true;
-                refused = tools::Cause{"BAD_QUERY", 0, error, 400};
-                return false;
-            },
-            refused);
+        std::vector<tools::SearchTarget> targets;
+        tools::Cause cause;
+        bool found = false;
+        {
+            std::lock_guard<std::mutex> lock(g_library);
+            found = tools::SearchTargets(request, targets, cause);
+        }
+        Json::Value result;
+        if (!found || !tools::SearchIndexes(request, targets, result, cause)) {
+            return Refuse(res, cause, tools::FailureMessage("search", cause, {}));
+        }
+        Send(res, 200, tools::SuccessEnvelope(result, false));
     });
 
     server.Post("/api/folders", [token](const Request& req, Response& res) {

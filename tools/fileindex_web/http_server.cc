@@ -6,6 +6,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cctype>
 #include <cstring>
 #include <memory>
@@ -19,6 +20,8 @@ namespace {
 struct Pending {
     Request request;
     bool tooLarge = false;
+    std::atomic<bool> done{false};   // the worker's answer is in `response`
+    Response response;
 };
 
 MHD_Result Collect(void* into, MHD_ValueKind, const char* key, const char* value) {
@@ -105,7 +108,7 @@ int HttpServer::Listen(const std::string& host, int port) {
     sockaddr_storage address{};
     socklen_t length = 0;
     if (!AddressOf(host, port, address, length)) return -1;
-    unsigned flags = MHD_USE_EPOLL_INTERNAL_THREAD | MHD_USE_TURBO;
+    unsigned flags = MHD_USE_EPOLL_INTERNAL_THREAD | MHD_USE_TURBO | MHD_ALLOW_SUSPEND_RESUME;
     if (address.ss_family == AF_INET6) flags |= MHD_USE_IPv6;
     daemon_ = MHD_start_daemon(flags, static_cast<uint16_t>(port), nullptr, nullptr, &Dispatch, this,
                                MHD_OPTION_SOCK_ADDR, reinterpret_cast<sockaddr*>(&address),
@@ -117,13 +120,66 @@ int HttpServer::Listen(const std::string& host, int port) {
                                MHD_OPTION_NOTIFY_COMPLETED, &Completed, nullptr,
                                MHD_OPTION_END);
     if (daemon_ == nullptr) return -1;
+    {
+        std::lock_guard<std::mutex> lock(jobsMutex_);
+        stopping_ = false;
+    }
+    for (unsigned i = 0; i < limits_.workers; ++i) workers_.emplace_back([this] { Work(); });
     const MHD_DaemonInfo* info = MHD_get_daemon_info(daemon_, MHD_DAEMON_INFO_BIND_PORT);
     return info != nullptr ? info->port : -1;
 }
 
 void HttpServer::Stop() {
+    StopWorkers();  // every suspended connection is resumed before the daemon stops
     if (daemon_ != nullptr) MHD_stop_daemon(daemon_);
     daemon_ = nullptr;
+}
+
+// Suspends the connection while a worker routes the request; resumed, it is answered with the
+// worker's response. False when no worker can take it.
+bool HttpServer::AnswerLater(MHD_Connection* connection, void* state) {
+    auto& pending = *static_cast<Pending*>(state);
+    MHD_suspend_connection(connection);
+    const bool taken = Offload([this, connection, &pending] {
+        pending.response = Route(pending.request);
+        pending.done = true;
+        MHD_resume_connection(connection);
+    });
+    if (!taken) MHD_resume_connection(connection);
+    return taken;
+}
+
+bool HttpServer::Offload(std::function<void()> job) {
+    std::lock_guard<std::mutex> lock(jobsMutex_);
+    if (stopping_ || jobs_.size() >= limits_.queuedSlow) return false;
+    jobs_.push_back(std::move(job));
+    jobsReady_.notify_one();
+    return true;
+}
+
+void HttpServer::Work() {
+    while (true) {
+        std::function<void()> job;
+        {
+            std::unique_lock<std::mutex> lock(jobsMutex_);
+            jobsReady_.wait(lock, [this] { return stopping_ || !jobs_.empty(); });
+            if (jobs_.empty()) return;
+            job = std::move(jobs_.front());
+            jobs_.pop_front();
+        }
+        job();
+    }
+}
+
+// Lets the workers finish what waits, then ends them.
+void HttpServer::StopWorkers() {
+    {
+        std::lock_guard<std::mutex> lock(jobsMutex_);
+        stopping_ = true;
+    }
+    jobsReady_.notify_all();
+    for (auto& worker : workers_) worker.join();
+    workers_.clear();
 }
 
 // Called first with no state (the head has arrived), then with each piece of the body, then once
@@ -147,11 +203,20 @@ int HttpServer::Answer(MHD_Connection* connection, const char* url, const char* 
         return MHD_YES;
     }
     Response response;
-    if (pending.tooLarge) {
+    if (pending.done) {
+        response = std::move(pending.response);
+    } else if (pending.tooLarge) {
         response.status = MHD_HTTP_CONTENT_TOO_LARGE;
         response.body = "the request body is over " + std::to_string(limits_.maxBody) + " bytes\n";
     } else if (!guard_ || !guard_(pending.request, response)) {
-        response = Route(pending.request);
+        if (pending.request.method == "GET" && slow_.count(pending.request.path) != 0) {
+            if (AnswerLater(connection, &pending)) return MHD_YES;
+            response.status = MHD_HTTP_SERVICE_UNAVAILABLE;
+            response.body = "too many slow requests wait; try again\n";
+            response.headers.emplace_back("Retry-After", "1");
+        } else {
+            response = Route(pending.request);
+        }
     }
     MHD_Response* answer =
         MHD_create_response_from_buffer(response.body.size(), response.body.data(), MHD_RESPMEM_MUST_COPY);

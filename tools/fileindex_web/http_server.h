@@ -4,9 +4,14 @@
 // connections and the memory of each are limited, and a request body over the limit is refused.
 #pragma once
 
+#include <condition_variable>
+#include <deque>
 #include <functional>
 #include <map>
+#include <mutex>
+#include <set>
 #include <string>
+#include <thread>
 #include <utility>
 #include <vector>
 
@@ -56,6 +61,8 @@ struct ServerLimits {
     size_t memoryPerConnection = 32 * 1024;   // for the request's head; a longer head is refused
     unsigned threads = 4;
     unsigned backlog = 1024;
+    unsigned workers = 4;        // for slow routes (GetSlow), beside the serving threads
+    size_t queuedSlow = 64;      // slow requests waiting for a worker; more are answered 503
 };
 
 class HttpServer {
@@ -67,6 +74,12 @@ public:
 
     void Get(const std::string& path, Handler handler) { routes_[{"GET", path}] = std::move(handler); }
     void Post(const std::string& path, Handler handler) { routes_[{"POST", path}] = std::move(handler); }
+    // A route that may take long: its connection is set aside while a worker answers it, so the
+    // serving threads go on answering every other request.
+    void GetSlow(const std::string& path, Handler handler) {
+        Get(path, std::move(handler));
+        slow_.insert(path);
+    }
     // GET of a file directly in `dir` (a name of letters, digits, ".", "-" and "_", not starting
     // with "."), "/" being its index.html; links are not followed.
     void ServeFiles(const std::string& dir) { files_ = dir; }
@@ -84,6 +97,11 @@ public:
                size_t* uploadSize, void** state);
 
 private:
+    bool AnswerLater(MHD_Connection* connection, void* pending);
+    // Runs `job` on a worker; false when too many wait already.
+    bool Offload(std::function<void()> job);
+    void Work();
+    void StopWorkers();
     Response Route(const Request& request) const;
     Response ServeFile(const std::string& path) const;
 
@@ -92,7 +110,13 @@ private:
     std::string files_;
     Guard guard_;
     std::vector<std::pair<std::string, std::string>> defaults_;
+    std::set<std::string> slow_;
     MHD_Daemon* daemon_ = nullptr;
+    std::mutex jobsMutex_;
+    std::condition_variable jobsReady_;
+    std::deque<std::function<void()>> jobs_;
+    std::vector<std::thread> workers_;
+    bool stopping_ = false;
 };
 
 }  // namespace web

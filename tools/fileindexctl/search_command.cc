@@ -6,6 +6,7 @@
 #include "commands.h"
 #include "cli.h"
 #include "search_view.h"
+#include "text_safety.h"
 
 namespace fileindexctl {
 namespace {
@@ -17,6 +18,7 @@ std::string SnippetText(const Json::Value& snippet) {
     for (const auto& piece : snippet) {
         std::string part = piece["text"].asString();
         std::replace(part.begin(), part.end(), '\n', ' ');
+        part = tools::EscapeForTerminal(part);
         if (!piece["match"].asBool()) text += part;
         else text += terminal ? "\033[1m" + part + "\033[0m" : "[" + part + "]";
     }
@@ -25,11 +27,16 @@ std::string SnippetText(const Json::Value& snippet) {
 
 int Search(Context& ctx, const tools::SearchRequest& request) {
     Json::Value out;
-    std::string error;
-    if (!tools::SearchShares(request, out, error)) return ctx.Fail("search", {"BAD_QUERY", 0, error, 400}, tools::kExitUsage);
+    tools::Cause cause;
+    if (!tools::SearchShares(request, out, cause)) {
+        return ctx.Fail("search", cause, cause.name == "BAD_QUERY" ? tools::kExitUsage : tools::kExitFailure);
+    }
+    for (const auto& share : out["incomplete"]) ctx.out.Warn(share["message"].asString());
     Table table = {{"PATH", "TYPE", "SIZE", "MODIFIED", "MATCH"}};
     for (const auto& hit : out["hits"]) {
-        table.push_back({hit["path"].asString(), hit["type"].asString(), std::to_string(hit["size"].asInt64()),
+        // The name's own bytes, escaped: a name cannot move the cursor or split a row.
+        const std::string path = hit.isMember("path_hex") ? tools::FromHex(hit["path_hex"].asString()) : hit["path"].asString();
+        table.push_back({tools::EscapeForTerminal(path), hit["type"].asString(), std::to_string(hit["size"].asInt64()),
                          FormatLocalTime(hit["mtime"].asInt64()), SnippetText(hit["snippet"])});
     }
     table.push_back({"(" + std::to_string(out["hits"].size()) + " found)"});

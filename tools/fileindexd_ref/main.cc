@@ -14,6 +14,7 @@
 #include <ctime>
 #include <iostream>
 #include <map>
+#include <memory>
 #include <vector>
 
 #include <CLI/CLI.hpp>
@@ -32,6 +33,9 @@ volatile sig_atomic_t g_stop = 0;
 
 // Records applied to a share's index in one transaction.
 constexpr size_t kBatchSize = 1000;
+// How long one share is served before the next one's turn, and how long a pass goes on serving.
+constexpr std::chrono::milliseconds kSlice{250};
+constexpr std::chrono::seconds kPassBudget{2};
 
 void OnTerm(int) { g_stop = 1; }
 
@@ -112,39 +116,81 @@ private:
         if (type == "resume") resume_time_ = -1;
     }
 
-    // One pass over the shares holding indexed folders: take each queue, apply its records to the
-    // share's index, and walk the share again when it is marked need-reindex.
+    struct ShareWork {
+        fileindexd_ref::ShareIndexer indexer;
+        fileindexd_ref::QueueTake queue;
+    };
+
+    // One pass over the shares holding indexed folders: take each queue, apply the records to the
+    // shares' indexes in turn, a slice of each share at a time, so that a flood in one share holds
+    // the others back by a slice only; then walk again the shares marked need-reindex.
     void DrainAll() {
         std::vector<QIRA::FILEINDEX::Folder> folders;
         if (!QIRA::FILEINDEX::IndexMgr::List(folders)) return;
         const std::vector<std::string> shares = tools::SharesOf(folders);
         ForgetSharesNoLongerIndexed(shares);
+        std::vector<ShareWork*> serving;
         for (const auto& share : shares) {
-            auto& indexer = indexers_.try_emplace(share, share).first->second;
-            indexer.ForgetIfRemoved();
-            char queue[4096];
-            if (FILEIDXQueuePathGet(share.c_str(), queue, sizeof queue) < 0) continue;
-            fileindexd_ref::TakeQueue(queue);
-            // A pause sent before a taken record was queued is in the backlog by now: obey it
-            // first, and leave the taken records waiting in the companion.
-            AcceptPending();
-            if (Paused()) return;
-            const size_t applied = fileindexd_ref::ProcessTaken(
-                queue, kBatchSize, [&](const fileindexd_ref::Batch& batch) { indexer.Apply(batch, folders); });
-            if (applied > 0) Report(share, std::to_string(applied) + " records applied", indexer);
-            if (QIRA::FILEINDEX::StatusMgr::ShareIsNeedReindex(share) &&
-                QIRA::FILEINDEX::StatusMgr::ShareSetNeedReindex(share, false)) {
-                indexer.Reindex(folders);  // a mark set meanwhile stays for the next pass
-                Report(share, "reindexed (it was marked need-reindex)", indexer);
+            std::string shareDir;
+            if (!QIRA::FILEINDEX::GetFullPath(shareDir, "/" + share)) continue;
+            auto& work = shares_[share];
+            if (!work) work.reset(new ShareWork{{share, &g_stop}, {share, shareDir}});
+            work->indexer.ForgetIfRemoved();
+            work->queue.Take();
+            serving.push_back(work.get());
+        }
+        // A pause sent before a taken record was queued is in the backlog by now: obey it first,
+        // and leave the taken records waiting in the companion.
+        AcceptPending();
+        if (Paused()) return;
+        const auto passEnd = std::chrono::steady_clock::now() + kPassBudget;
+        for (bool more = true; more && !g_stop && std::chrono::steady_clock::now() < passEnd;) {
+            more = false;
+            for (ShareWork* work : serving) {
+                more = ServeSlice(*work, folders) || more;
+                AcceptPending();
+                if (Paused() || g_stop) return;
+            }
+        }
+        for (ShareWork* work : serving) {
+            const std::string& share = work->indexer.Share();
+            if (g_stop || !QIRA::FILEINDEX::StatusMgr::ShareIsNeedReindex(share) ||
+                !QIRA::FILEINDEX::StatusMgr::ShareSetNeedReindex(share, false)) {
+                continue;
+            }
+            // A mark set meanwhile stays for the next pass; a walk that failed marks the share again.
+            if (work->indexer.Reindex(folders)) {
+                Report(share, "reindexed (it was marked need-reindex)", work->indexer);
+            } else {
+                QIRA::FILEINDEX::StatusMgr::ShareSetNeedReindex(share, true);
             }
         }
     }
 
+    // Batches of one share for at most kSlice; true when its companion holds more.
+    bool ServeSlice(ShareWork& work, const std::vector<QIRA::FILEINDEX::Folder>& folders) {
+        const auto sliceEnd = std::chrono::steady_clock::now() + kSlice;
+        size_t applied = 0;
+        do {
+            applied += work.queue.ApplyNext(kBatchSize, [&](const fileindexd_ref::Batch& batch) {
+                if (work.indexer.Apply(batch, folders)) return true;
+                if (g_stop || work.indexer.LastProblem() != tools::IndexProblem::TimedOut) return false;
+                // Applying it again would take as long: the walk the mark asks for covers it.
+                Report(work.indexer.Share(), std::to_string(batch.size()) + " records ran past the batch's time and were"
+                                             " dropped; the share is marked need-reindex", work.indexer);
+                QIRA::FILEINDEX::StatusMgr::ShareSetNeedReindex(work.indexer.Share(), true);
+                return true;
+            });
+        } while (work.queue.HasMore() && !g_stop && std::chrono::steady_clock::now() < sliceEnd);
+        if (applied > 0) Report(work.indexer.Share(), std::to_string(applied) + " records applied", work.indexer);
+        return work.queue.HasMore();
+    }
+
     void ForgetSharesNoLongerIndexed(const std::vector<std::string>& shares) {
-        for (auto it = indexers_.begin(); it != indexers_.end();) {
+        for (auto it = shares_.begin(); it != shares_.end();) {
             if (std::find(shares.begin(), shares.end(), it->first) == shares.end()) {
                 std::cout << "fileindexd-ref: share " << it->first << " holds no indexed folder; its index is closed" << std::endl;
-                it = indexers_.erase(it);
+                it = shares_.erase(it);
             } else {
                 ++it;
             }
@@ -156,7 +202,7 @@ private:
                   << std::endl;
     }
 
-    std::map<std::string, fileindexd_ref::ShareIndexer> indexers_;
+    std::map<std::string, std::unique_ptr<ShareWork>> shares_;
     int listener_;
     long long resume_time_ = -1;
 };

@@ -5,79 +5,136 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
+#include <chrono>
+#include <ctime>
+#include <iostream>
+#include <thread>
+
 #include "fileindex/status_mgr.h"
-#include "fileindex/utils.h"
+#include "text_safety.h"
 
 namespace fileindexd_ref {
 namespace {
 
-bool AppendAll(const std::string& path, const std::string& text) {
-    const int fd = open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC, 0644);
-    if (fd < 0) return false;
-    const bool ok = write(fd, text.data(), text.size()) == static_cast<ssize_t>(text.size());
-    close(fd);
-    return ok;
+constexpr char kQueue[] = "QIRA@file_index_queue";
+constexpr char kCompanion[] = "QIRA@file_index_queue.tmp";
+constexpr std::chrono::milliseconds kLockPatience{1000};
+
+const char* KindOf(mode_t mode) {
+    if (S_ISDIR(mode)) return "a directory";
+    if (S_ISFIFO(mode)) return "a FIFO";
+    if (S_ISLNK(mode)) return "a symbolic link";
+    if (S_ISSOCK(mode)) return "a socket";
+    if (S_ISREG(mode)) return "a file with several links";
+    return "a device";
 }
 
-std::string ReadAll(int fd) {
-    std::string text;
+bool IsPlainFile(const struct stat& st) { return S_ISREG(st.st_mode) && st.st_nlink == 1; }
+
+int OpenIn(int eaDir, const char* name, int flags) {
+    return openat(eaDir, name, flags | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC, 0644);
+}
+
+// The exclusive lock of `fd`, waiting at most kLockPatience: a share's user can hold it for ever.
+bool LockWithin(int fd) {
+    const auto deadline = std::chrono::steady_clock::now() + kLockPatience;
+    while (flock(fd, LOCK_EX | LOCK_NB) != 0) {
+        if ((errno != EWOULDBLOCK && errno != EINTR) || std::chrono::steady_clock::now() >= deadline) return false;
+        std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    }
+    return true;
+}
+
+// Appends what `from` holds from its start to `to`, block by block.
+bool CopyAll(int from, int to) {
     char buffer[65536];
     ssize_t got;
-    while ((got = read(fd, buffer, sizeof buffer)) > 0) text.append(buffer, static_cast<size_t>(got));
-    return text;
+    off_t at = 0;
+    while ((got = pread(from, buffer, sizeof buffer, at)) > 0) {
+        if (write(to, buffer, static_cast<size_t>(got)) != got) return false;
+        at += got;
+    }
+    return got == 0;
 }
 
-// The share of a queue path ".../<share dir>/@eaDir/QIRA@file_index_queue".
-std::string ShareOfQueue(const std::string& queuePath) {
-    std::string share, inside;
-    return QIRA::FILEINDEX::GetShareNamePathByFullPath(share, inside, queuePath) ? share : "";
+void Say(const std::string& share, const std::string& what) {
+    std::cout << "fileindexd-ref: share " << share << ": " << what << std::endl;
 }
 
 }  // namespace
 
-void TakeQueue(const std::string& queuePath) {
-    const int fd = open(queuePath.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC);
-    if (fd < 0) return;
-    struct stat st;
-    if (fstat(fd, &st) != 0 || !S_ISREG(st.st_mode) || flock(fd, LOCK_EX) != 0) {
-        close(fd);
-        return;
-    }
-    const std::string taken = queuePath + ".tmp";
-    struct stat companion;
-    if (lstat(taken.c_str(), &companion) != 0) {
-        rename(queuePath.c_str(), taken.c_str());
-    } else if (AppendAll(taken, ReadAll(fd))) {
-        unlink(queuePath.c_str());
-    }
-    flock(fd, LOCK_UN);
-    close(fd);
+tools::Fd QueueTake::OpenEaDir() const {
+    const tools::Fd share(open(shareDir_.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+    return tools::Fd(share.Valid() ? tools::OpenBeneath(share.Get(), "@eaDir", O_RDONLY | O_DIRECTORY) : -1);
 }
 
-size_t ProcessTaken(const std::string& queuePath, size_t batchSize, const std::function<void(const Batch&)>& apply) {
-    const std::string taken = queuePath + ".tmp";
+void QueueTake::SetAsideIfWrongKind(int eaDir, const char* name) {
     struct stat st;
-    if (lstat(taken.c_str(), &st) != 0) return 0;
-    Batch batch;
-    size_t read = 0;
-    const auto reading = QIRA::FILEINDEX::ReadQueueRecords(
-        taken,
-        [&](const QIRA::FILEINDEX::QueueRecordView& record) {
-            batch.push_back(record);
-            ++read;
-            if (batch.size() >= batchSize) {
-                apply(batch);
-                batch.clear();
-            }
-        },
-        [](off_t, size_t) {});
-    if (!batch.empty()) apply(batch);
-    if (reading == QIRA::FILEINDEX::QueueReading::Unopened) {
-        const std::string share = ShareOfQueue(queuePath);
-        if (!share.empty()) QIRA::FILEINDEX::StatusMgr::ShareSetNeedReindex(share, true);
+    if (fstatat(eaDir, name, &st, AT_SYMLINK_NOFOLLOW) != 0 || IsPlainFile(st)) return;
+    const std::string aside = std::string(name) + ".set-aside." + std::to_string(time(nullptr)) + "." + std::to_string(getpid());
+    const bool moved = renameat(eaDir, name, eaDir, aside.c_str()) == 0;
+    Say(share_, std::string(name) + " is " + KindOf(st.st_mode) + ", not a queue file; " +
+                    (moved ? "set aside as " + aside : "it could not be set aside") + "; the share is marked need-reindex");
+    QIRA::FILEINDEX::StatusMgr::ShareSetNeedReindex(share_, true);
+}
+
+void QueueTake::Remove(int eaDir, const char* name, dev_t dev, ino_t ino) {
+    struct stat st;
+    if (fstatat(eaDir, name, &st, AT_SYMLINK_NOFOLLOW) == 0 && st.st_dev == dev && st.st_ino == ino) unlinkat(eaDir, name, 0);
+}
+
+void QueueTake::Take() {
+    const tools::Fd eaDir = OpenEaDir();
+    if (!eaDir.Valid()) return;
+    SetAsideIfWrongKind(eaDir.Get(), kQueue);
+    SetAsideIfWrongKind(eaDir.Get(), kCompanion);
+    const tools::Fd queue(OpenIn(eaDir.Get(), kQueue, O_RDONLY));
+    struct stat st;
+    if (!queue.Valid() || fstat(queue.Get(), &st) != 0 || !IsPlainFile(st) || !LockWithin(queue.Get())) return;
+    const tools::Fd companion(OpenIn(eaDir.Get(), kCompanion, O_WRONLY | O_APPEND));
+    struct stat held;
+    if (!companion.Valid()) {
+        if (errno == ENOENT) renameat(eaDir.Get(), kQueue, eaDir.Get(), kCompanion);
+    } else if (fstat(companion.Get(), &held) == 0 && IsPlainFile(held) && CopyAll(queue.Get(), companion.Get())) {
+        Remove(eaDir.Get(), kQueue, st.st_dev, st.st_ino);
     }
-    unlink(taken.c_str());
-    return read;
+    flock(queue.Get(), LOCK_UN);
+}
+
+size_t QueueTake::ApplyNext(size_t batchSize, const std::function<bool(const Batch&)>& apply) {
+    more_ = false;
+    const tools::Fd eaDir = OpenEaDir();
+    const tools::Fd companion(eaDir.Valid() ? OpenIn(eaDir.Get(), kCompanion, O_RDONLY) : -1);
+    struct stat st;
+    if (!companion.Valid() || fstat(companion.Get(), &st) != 0) return 0;
+    if (st.st_dev != dev_ || st.st_ino != ino_) {
+        dev_ = st.st_dev;
+        ino_ = st.st_ino;
+        offset_ = 0;
+    }
+    Batch batch;
+    off_t next = offset_;
+    const auto reading = QIRA::FILEINDEX::ReadQueueSlice(
+        companion.Get(), shareDir_ + "/@eaDir/" + kCompanion, offset_, batchSize,
+        [&](const QIRA::FILEINDEX::QueueRecordView& record) { batch.push_back(record); }, [](off_t, size_t) {}, next);
+    if (reading != QIRA::FILEINDEX::QueueReading::Read) {
+        Remove(eaDir.Get(), kCompanion, st.st_dev, st.st_ino);  // the library marked the share
+        return 0;
+    }
+    if (!batch.empty() && !apply(batch)) {
+        Say(share_, std::to_string(batch.size()) + " records not applied; they stay in " + kCompanion +
+                        " for the next pass and the share is marked need-reindex");
+        QIRA::FILEINDEX::StatusMgr::ShareSetNeedReindex(share_, true);
+        return 0;
+    }
+    offset_ = next;
+    more_ = offset_ < st.st_size;
+    if (!more_) {
+        Remove(eaDir.Get(), kCompanion, st.st_dev, st.st_ino);
+        offset_ = 0;
+    }
+    return batch.size();
 }
 
 }  // namespace fileindexd_ref

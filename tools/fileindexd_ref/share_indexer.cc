@@ -4,12 +4,17 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include <algorithm>
+#include <chrono>
 #include <cstring>
 #include <iostream>
 
 #include "file_types.h"
+#include "fileindex/entry_rules.h"
 #include "fileindex/fileidx.h"
+#include "fileindex/status_mgr.h"
 #include "fileindex/utils.h"
+#include "text_safety.h"
 
 namespace fileindexd_ref {
 namespace {
@@ -18,202 +23,216 @@ using QIRA::FILEINDEX::QueueRecordView;
 
 constexpr unsigned kCreated = 1;
 constexpr unsigned kWritten = 2;
-constexpr unsigned kAttributes = 4;
-constexpr unsigned kDeleted = 8;
 constexpr unsigned kMoved = 256;
 constexpr unsigned kReindex = 0x10000;
-constexpr unsigned kSettingChanged = 0x20000;
-// Deeper trees are indexed to this depth, each level holding one descriptor.
-constexpr int kMaxDepth = 64;
-const char kEaDir[] = "@eaDir";
-
-bool IsWithin(const std::string& path, const std::string& dir) {
-    return path.compare(0, dir.size(), dir) == 0 && (path.size() == dir.size() || path[dir.size()] == '/');
-}
-
-// A directory below `base` reached one component at a time, never through a link. -1 otherwise.
-int OpenBelow(const std::string& base, const std::string& relative) {
-    int fd = open(base.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-    size_t begin = 0;
-    while (fd >= 0 && begin < relative.size()) {
-        const size_t end = relative.find('/', begin);
-        const std::string component = relative.substr(begin, end == std::string::npos ? std::string::npos : end - begin);
-        begin = end == std::string::npos ? relative.size() : end + 1;
-        if (component.empty()) continue;
-        const int next = openat(fd, component.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC);
-        close(fd);
-        fd = next;
-    }
-    return fd;
-}
-
-// Valid UTF-8 of `text`, with every byte of a broken sequence replaced by a space.
-std::string ValidUtf8(const std::string& text) {
-    std::string out;
-    out.reserve(text.size());
-    for (size_t i = 0; i < text.size();) {
-        const auto c = static_cast<unsigned char>(text[i]);
-        const size_t length = c < 0x80 ? 1 : (c >> 5) == 0x6 ? 2 : (c >> 4) == 0xE ? 3 : (c >> 3) == 0x1E ? 4 : 0;
-        bool valid = length > 0 && i + length <= text.size();
-        for (size_t k = 1; valid && k < length; ++k) valid = (static_cast<unsigned char>(text[i + k]) >> 6) == 0x2;
-        if (valid && c != 0) {
-            out.append(text, i, length);
-            i += length;
-        } else {
-            out += ' ';
-            ++i;
-        }
-    }
-    return out;
-}
+// How long one batch may take in the index before it is given up.
+constexpr std::chrono::seconds kBatchBudget{30};
+constexpr int kDirFlags = O_RDONLY | O_DIRECTORY;
 
 // The first kTextCap bytes of a regular file in `dirFd`, opened without following a link or blocking.
 std::string ReadText(int dirFd, const std::string& name) {
-    const int fd = openat(dirFd, name.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC);
-    if (fd < 0) return "";
+    const tools::Fd fd(openat(dirFd, name.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
     struct stat st;
     std::string text;
-    if (fstat(fd, &st) == 0 && S_ISREG(st.st_mode)) {
+    if (fd.Valid() && fstat(fd.Get(), &st) == 0 && S_ISREG(st.st_mode)) {
         text.resize(kTextCap);
-        const ssize_t got = read(fd, &text[0], text.size());
+        const ssize_t got = read(fd.Get(), &text[0], text.size());
         text.resize(got > 0 ? static_cast<size_t>(got) : 0);
     }
-    close(fd);
-    return ValidUtf8(text);
+    return tools::ValidUtf8(text, " ");
+}
+
+bool IsTooDeep(const char* refusal) { return refusal != nullptr && std::strcmp(refusal, "too_deep") == 0; }
+
+void Say(const std::string& share, const std::string& what) {
+    std::cout << "fileindexd-ref: share " << share << ": " << what << std::endl;
 }
 
 }  // namespace
 
 bool ShareIndexer::Open() {
     if (index_) return true;
-    std::string shareDir;
     char dbDir[4096];
-    if (!QIRA::FILEINDEX::GetFullPath(shareDir, "/" + share_) || FILEIDXDBPathGet(share_.c_str(), dbDir, sizeof dbDir) < 0) {
+    if (!QIRA::FILEINDEX::GetFullPath(shareDir_, "/" + share_) || FILEIDXDBPathGet(share_.c_str(), dbDir, sizeof dbDir) < 0) {
+        problem_ = tools::IndexProblem::Failed;
         return false;
     }
-    volume_ = shareDir.substr(0, shareDir.size() - share_.size() - 1);
+    volume_ = shareDir_.substr(0, shareDir_.size() - share_.size() - 1);
+    shareFd_ = tools::Fd(open(shareDir_.c_str(), kDirFlags | O_CLOEXEC));
     std::string error;
-    index_ = tools::SearchIndex::Open(dbDir, true, error);
-    if (!index_) std::cout << "fileindexd-ref: cannot open the index of share " << share_ << ": " << error << std::endl;
-    return index_ != nullptr;
+    index_ = tools::SearchIndex::Open(shareDir_, true, problem_, error);
+    if (!index_ && problem_ == tools::IndexProblem::Damaged) {
+        const std::string aside = tools::SearchIndex::SetAside(shareDir_);
+        Say(share_, "the index is damaged or not this service's (" + error + "); " +
+                        (aside.empty() ? "it could not be set aside" : "set aside as " + tools::EscapeForTerminal(aside)) +
+                        "; the share is rebuilt from a walk");
+        QIRA::FILEINDEX::StatusMgr::ShareSetNeedReindex(share_, true);
+        FILEIDXDBPathGet(share_.c_str(), dbDir, sizeof dbDir);  // again, when the directory itself went aside
+        index_ = tools::SearchIndex::Open(shareDir_, true, problem_, error);
+    }
+    if (!index_) Say(share_, "cannot open the index: " + error);
+    return index_ != nullptr && shareFd_.Valid();
+}
+
+// Ends the transaction: committed when `done` and nothing failed in it, rolled back otherwise. An
+// index found damaged meanwhile is set aside and the share marked need-reindex.
+bool ShareIndexer::Finish(bool done) {
+    folders_ = nullptr;
+    synced_.clear();
+    problem_ = index_->LastProblem();
+    if (done && problem_ == tools::IndexProblem::None && (stop_ == nullptr || *stop_ == 0) && index_->Commit()) return true;
+    problem_ = index_->LastProblem() == tools::IndexProblem::None ? tools::IndexProblem::TimedOut : index_->LastProblem();
+    index_->Rollback();
+    if (problem_ == tools::IndexProblem::Damaged) {
+        index_.reset();
+        const std::string aside = tools::SearchIndex::SetAside(shareDir_);
+        Say(share_, "the index turned out damaged; set aside as " + tools::EscapeForTerminal(aside) + "; the share is rebuilt from a walk");
+        QIRA::FILEINDEX::StatusMgr::ShareSetNeedReindex(share_, true);
+    }
+    return false;
 }
 
 void ShareIndexer::ForgetIfRemoved() {
     if (index_ && !index_->StillOnDisk()) {
         index_.reset();
-        std::cout << "fileindexd-ref: the index of share " << share_ << " was removed; closed" << std::endl;
+        shareFd_ = tools::Fd();
+        Say(share_, "the index was removed; closed");
     }
 }
 
 long long ShareIndexer::Count() { return index_ ? index_->Count() : -1; }
 
 bool ShareIndexer::Apply(const std::vector<QueueRecordView>& records, const std::vector<QIRA::FILEINDEX::Folder>& folders) {
-    if (!Open() || !index_->Begin()) return false;
+    if (!Open()) return false;
+    index_->SetDeadline(std::chrono::steady_clock::now() + kBatchBudget, stop_);
+    if (!index_->Begin()) return Finish(false);
     folders_ = &folders;
-    for (const auto& record : records) ApplyOne(record);
-    folders_ = nullptr;
-    return index_->Commit();
+    size_t refused = 0;
+    std::string firstRefused;
+    for (const auto& record : records) {
+        if (!QIRA::FILEINDEX::IsCanonicalBeneath(shareDir_, record.path)) {
+            if (refused++ == 0) firstRefused = record.path;
+            continue;
+        }
+        ApplyOne(record);
+    }
+    if (refused > 0) {
+        Say(share_, std::to_string(refused) + " records refused: their path is not in canonical form beneath the share (first: " +
+                        tools::EscapeForTerminal(firstRefused) + ")");
+    }
+    return Finish(true);
 }
 
 bool ShareIndexer::Reindex(const std::vector<QIRA::FILEINDEX::Folder>& folders) {
-    if (!Open() || !index_->Begin()) return false;
+    if (!Open()) return false;
+    index_->SetDeadline(std::chrono::steady_clock::time_point::max(), stop_);
+    if (!index_->Begin()) return Finish(false);
     folders_ = &folders;
     for (const auto& folder : folders) {
         std::string share;
         if (QIRA::FILEINDEX::GetShareNameByPath(share, folder.path) && share == share_) Sync(folder.GetFullPath(), true);
     }
-    folders_ = nullptr;
-    return index_->Commit();
-}
-
-bool ShareIndexer::InShare(const std::string& fullPath) const {
-    const std::string shareDir = volume_ + "/" + share_;
-    if (!IsWithin(fullPath, shareDir)) return false;
-    const std::string inside = fullPath.substr(shareDir.size()) + "/";
-    return inside.find(std::string("/") + kEaDir + "/") == std::string::npos;
+    return Finish(true);
 }
 
 void ShareIndexer::ApplyOne(const QueueRecordView& record) {
-    if (!InShare(record.path)) return;
-    switch (record.event) {
-        case kDeleted:
-            index_->Remove(SharePathOf(record.path));
-            break;
-        case kMoved:
-            if (InShare(record.path_old)) index_->Rename(SharePathOf(record.path_old), SharePathOf(record.path));
-            Sync(record.path, false);
-            break;
-        case kAttributes:
-        case kSettingChanged:
-            Sync(record.path, false);
-            break;
-        case kCreated:
-        case kWritten:
-        case kReindex:
-        default:
-            Sync(record.path, true);
-            break;
+    if (record.event == kMoved && record.path_old != record.path &&
+        QIRA::FILEINDEX::IsCanonicalBeneath(shareDir_, record.path_old)) {
+        index_->Rename(SharePathOf(record.path_old), SharePathOf(record.path));
+        synced_.clear();  // what was applied before the move no longer stands where it was
+        synced_[record.path] = false;
+        return Sync(record.path, false);
     }
+    const bool force = record.event == kCreated || record.event == kWritten || record.event == kReindex ||
+                       record.event == kMoved;
+    const auto found = synced_.find(record.path);
+    if (found != synced_.end() && (found->second || !force)) return;  // applied already in this batch
+    synced_[record.path] = force;
+    Sync(record.path, force);
+}
+
+std::string ShareIndexer::Relative(const std::string& fullPath) const {
+    return fullPath.size() > shareDir_.size() ? fullPath.substr(shareDir_.size() + 1) : "";
+}
+
+int ShareIndexer::Depth(const std::string& fullPath) const {
+    return static_cast<int>(std::count(fullPath.begin() + static_cast<long>(shareDir_.size()), fullPath.end(), '/'));
 }
 
 void ShareIndexer::Sync(const std::string& fullPath, bool force) {
-    const std::string sharePath = SharePathOf(fullPath);
-    const auto stored = index_->Under(sharePath);
+    Stored stored;
+    if (!index_->Under(SharePathOf(fullPath), stored)) return;
     std::set<std::string> seen;
-    const std::string shareDir = volume_ + "/" + share_;
-    const size_t slash = fullPath.rfind('/');
-    const std::string parent = fullPath.substr(0, slash);
-    const std::string name = fullPath.substr(slash + 1);
-    const int parentFd = IsWithin(parent, shareDir) ? OpenBelow(shareDir, parent.substr(shareDir.size())) : -1;
-    struct stat st;
-    if (parentFd >= 0 && fstatat(parentFd, name.c_str(), &st, AT_SYMLINK_NOFOLLOW) == 0) {
-        if (S_ISDIR(st.st_mode)) {
-            WalkDirectory(fullPath, force, seen, stored);
-        } else if (S_ISREG(st.st_mode)) {
-            IndexFile(parentFd, name, fullPath, st, QIRA::FILEINDEX::GetMostSuitableCfg(*folders_, fullPath), force, stored, seen);
+    if (fullPath == shareDir_) {
+        Walk(tools::OpenBeneath(shareFd_.Get(), "", kDirFlags), fullPath, 0, force, seen, stored);
+    } else {
+        const size_t slash = fullPath.rfind('/');
+        const std::string parent = fullPath.substr(0, slash);
+        const std::string name = fullPath.substr(slash + 1);
+        const tools::Fd parentFd(QIRA::FILEINDEX::EntryRefusal(shareDir_, parent, true) == nullptr
+                                     ? tools::OpenBeneath(shareFd_.Get(), Relative(parent), kDirFlags)
+                                     : -1);
+        struct stat st;
+        if (parentFd.Valid() && fstatat(parentFd.Get(), name.c_str(), &st, AT_SYMLINK_NOFOLLOW) == 0) {
+            const char* refusal = QIRA::FILEINDEX::ChildRefusal(fullPath, name, Depth(fullPath), S_ISDIR(st.st_mode));
+            if (refusal != nullptr) {
+                if (IsTooDeep(refusal)) Walk(-1, fullPath, Depth(fullPath), force, seen, stored);
+            } else if (S_ISDIR(st.st_mode)) {
+                Walk(tools::OpenBeneath(parentFd.Get(), name, kDirFlags), fullPath, Depth(fullPath), force, seen, stored);
+            } else if (S_ISREG(st.st_mode)) {
+                IndexFile(parentFd.Get(), name, fullPath, st, QIRA::FILEINDEX::GetMostSuitableCfg(*folders_, fullPath), force,
+                          stored, seen);
+            }
         }
     }
-    if (parentFd >= 0) close(parentFd);
     for (const auto& entry : stored) {
         if (seen.count(entry.first) == 0) index_->Remove(entry.first);
     }
 }
 
-void ShareIndexer::WalkDirectory(const std::string& fullPath, bool force, std::set<std::string>& seen,
-                                 const std::map<std::string, std::pair<long long, long long>>& stored) {
-    const std::string shareDir = volume_ + "/" + share_;
-    Walk(OpenBelow(shareDir, fullPath.substr(shareDir.size())), fullPath, 0, force, seen, stored);
-}
-
-// Takes ownership of `fd`; holds one descriptor per level of the tree.
+// Takes ownership of `fd` (-1: a directory past the depth bound, only logged); holds one
+// descriptor per level of the tree. `depth` is that of `path` below the share directory.
 void ShareIndexer::Walk(int fd, const std::string& path, int depth, bool force, std::set<std::string>& seen,
-                        const std::map<std::string, std::pair<long long, long long>>& stored) {
-    DIR* dir = fd >= 0 ? fdopendir(fd) : nullptr;
-    if (dir == nullptr) {
-        if (fd >= 0) close(fd);
+                        const Stored& stored) {
+    const Json::Value governing = QIRA::FILEINDEX::GetMostSuitableCfg(*folders_, path);
+    if (fd < 0) {
+        if (depth > QIRA::FILEINDEX::MaxEntryDepth() && governing.isMember("path") &&
+            tooDeepLogged_.insert(governing["path"].asString()).second) {
+            Say(share_, "folder " + governing["path"].asString() + " holds entries too deep to index (first: " +
+                            tools::EscapeForTerminal(SharePathOf(path)) + "): " +
+                            QIRA::FILEINDEX::EntryRefusalWords("too_deep"));
+        }
         return;
     }
-    const Json::Value governing = QIRA::FILEINDEX::GetMostSuitableCfg(*folders_, path);
+    DIR* dir = fdopendir(fd);
+    if (dir == nullptr) {
+        close(fd);
+        return;
+    }
     while (const dirent* entry = readdir(dir)) {
+        if (stop_ != nullptr && *stop_ != 0) break;
         const std::string name = entry->d_name;
-        if (name == "." || name == ".." || name == kEaDir || QIRA::FILEINDEX::IsSystemPreservedFileName(name)) continue;
+        if (name == "." || name == "..") continue;
         const std::string childPath = path + "/" + name;
         struct stat st;
         if (fstatat(dirfd(dir), name.c_str(), &st, AT_SYMLINK_NOFOLLOW) != 0) continue;
-        if (S_ISREG(st.st_mode)) {
+        const char* refusal = QIRA::FILEINDEX::ChildRefusal(childPath, name, depth + 1, S_ISDIR(st.st_mode));
+        if (IsTooDeep(refusal)) {
+            Walk(-1, childPath, depth + 1, force, seen, stored);
+        } else if (refusal != nullptr) {
+            continue;
+        } else if (S_ISREG(st.st_mode)) {
             IndexFile(dirfd(dir), name, childPath, st, governing, force, stored, seen);
-        } else if (S_ISDIR(st.st_mode) && depth < kMaxDepth && !QIRA::FILEINDEX::IsSkipIndex(childPath)) {
-            Walk(openat(dirfd(dir), name.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC), childPath,
-                 depth + 1, force, seen, stored);
+        } else if (S_ISDIR(st.st_mode)) {
+            Walk(openat(dirfd(dir), name.c_str(), kDirFlags | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC), childPath, depth + 1, force,
+                 seen, stored);
         }
     }
     closedir(dir);
 }
 
 void ShareIndexer::IndexFile(int dirFd, const std::string& name, const std::string& fullPath, const struct stat& st,
-                             const Json::Value& governing, bool force,
-                             const std::map<std::string, std::pair<long long, long long>>& stored,
-                             std::set<std::string>& seen) {
+                             const Json::Value& governing, bool force, const Stored& stored, std::set<std::string>& seen) {
     const std::string type = tools::FileTypeOf(name);
     if (type.empty() || !governing.get(type, false).asBool()) return;  // unseen: removed when stored
     const std::string sharePath = SharePathOf(fullPath);

@@ -1,9 +1,15 @@
 // One share's search index kept in step with its queue records: each record under an indexed
 // folder is applied, with the four switches of the folder that governs it deciding what is indexed.
+//
+// Everything a record names is written by the share's users. A record's path is taken only in
+// canonical form beneath the share directory; every file and directory is opened beneath the share
+// directory's descriptor without following a link or blocking; live records and walks keep out the
+// same entries (the library's entry rules), so that applying changes and walking agree.
 #pragma once
 
 #include <sys/stat.h>
 
+#include <csignal>
 #include <map>
 #include <memory>
 #include <set>
@@ -13,6 +19,7 @@
 
 #include <json/value.h>
 
+#include "beneath.h"
 #include "fileindex/folder.h"
 #include "fileindex/queue_reader.h"
 #include "search_index.h"
@@ -22,42 +29,55 @@ namespace fileindexd_ref {
 // Text of plain-text documents is indexed up to this many bytes.
 constexpr size_t kTextCap = 256 * 1024;
 
+using Stored = std::map<std::string, std::pair<long long, long long>>;  // share path -> size, mtime
+
 class ShareIndexer {
 public:
-    explicit ShareIndexer(std::string share) : share_(std::move(share)) {}
+    // Statements and walks stop once `*stop` becomes nonzero.
+    ShareIndexer(std::string share, const volatile sig_atomic_t* stop) : share_(std::move(share)), stop_(stop) {}
 
-    // Applies the records in one transaction: 1 created and 2 written index the path afresh, 4
-    // (attributes) and 131072 (settings) re-apply the governing folder's settings beneath it,
-    // 65536 walks it again from scratch, 8 removes it and what lies beneath, 256 moves it from
-    // "path_old". Records outside the share or in an "@eaDir" are ignored. False when the index
-    // cannot be opened or written.
+    // Applies the records in one transaction, each path once (a move starts afresh): 1 created, 2
+    // written and 65536 reindex read the path afresh, 4 (attributes), 8 (deleted) and 131072
+    // (settings) bring the index in step with what is there now, 256 moves it from "path_old".
+    // A record whose path is not canonical beneath the share is refused (counted in one log line
+    // per batch) and changes nothing. False when the index cannot be opened or written, or the
+    // batch ran past its budget: nothing of the batch stays written.
     bool Apply(const std::vector<QIRA::FILEINDEX::QueueRecordView>& records, const std::vector<QIRA::FILEINDEX::Folder>& folders);
-    // Walks every folder of the share from scratch.
+    // Walks every folder of the share from scratch, in one transaction.
     bool Reindex(const std::vector<QIRA::FILEINDEX::Folder>& folders);
     // The library removed the index data (the share's last folder went, or the share): close it.
     void ForgetIfRemoved();
     // Files in the index; -1 when it is not open.
     long long Count();
+    // Why the last Apply or Reindex failed.
+    tools::IndexProblem LastProblem() const { return problem_; }
+    const std::string& Share() const { return share_; }
 
 private:
+    // Opens the index; one that fails the checks is set aside, the share marked need-reindex, and a
+    // new one made.
     bool Open();
+    bool Finish(bool done);
     void ApplyOne(const QIRA::FILEINDEX::QueueRecordView& record);
     // Brings the index in step with the file or tree at `fullPath`; `force` reads every file again.
     void Sync(const std::string& fullPath, bool force);
-    void WalkDirectory(const std::string& fullPath, bool force, std::set<std::string>& seen,
-                       const std::map<std::string, std::pair<long long, long long>>& stored);
-    void Walk(int fd, const std::string& path, int depth, bool force, std::set<std::string>& seen,
-              const std::map<std::string, std::pair<long long, long long>>& stored);
+    void Walk(int fd, const std::string& path, int depth, bool force, std::set<std::string>& seen, const Stored& stored);
     void IndexFile(int dirFd, const std::string& name, const std::string& fullPath, const struct stat& st,
-                   const Json::Value& governing, bool force, const std::map<std::string, std::pair<long long, long long>>& stored,
-                   std::set<std::string>& seen);
-    bool InShare(const std::string& fullPath) const;
+                   const Json::Value& governing, bool force, const Stored& stored, std::set<std::string>& seen);
+    int Depth(const std::string& fullPath) const;
     std::string SharePathOf(const std::string& fullPath) const { return fullPath.substr(volume_.size()); }
+    std::string Relative(const std::string& fullPath) const;
 
     std::string share_;
-    std::string volume_;     // the share directory's parent: full path = volume_ + share path
+    const volatile sig_atomic_t* stop_;
+    std::string shareDir_;  // the share directory: full path = volume_ + share path
+    std::string volume_;
+    tools::Fd shareFd_;
     std::unique_ptr<tools::SearchIndex> index_;
+    tools::IndexProblem problem_ = tools::IndexProblem::None;
     const std::vector<QIRA::FILEINDEX::Folder>* folders_ = nullptr;  // during Apply and Reindex
+    std::set<std::string> tooDeepLogged_;  // folders whose depth bound was logged
+    std::map<std::string, bool> synced_;   // paths applied in this batch, and whether read afresh
 };
 
 }  // namespace fileindexd_ref

@@ -34,9 +34,9 @@ class ApiError extends Error {
 // One API call; a held lock (409) is retried after Retry-After, a few times.
 async function api(method, url, body) {
   for (let attempt = 0; ; attempt++) {
-    const options = { method, headers: {} };
+    // The token goes with every call: searches read the files' text and need it as changes do.
+    const options = { method, headers: { 'X-Fileindex-Token': localStorage.getItem('fileindexToken') || '' } };
     if (method !== 'GET') {
-      options.headers['X-Fileindex-Token'] = localStorage.getItem('fileindexToken') || '';
       options.headers['Content-Type'] = 'application/json';
       options.body = JSON.stringify(body === undefined ? {} : body);
     }
