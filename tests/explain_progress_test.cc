@@ -86,7 +86,7 @@ TEST_F(ExplainTest, TellsTheGoverningFolderByTheLastMatchAndWhatIsPending) {
                                               "video": false, "photo": true})"));
     EXPECT_TRUE(inner["inside_indexed_folder"].asBool());
     EXPECT_FALSE(inner["contains_indexed_folder"].asBool());
-    EXPECT_EQ(inner["pending"], J(R"({"queue": 1, "companion": 1, "unread": []})"));
+    EXPECT_EQ(inner["pending"], J(R"({"queue": 1, "companion": 1, "unread": [], "wrong_kind": {}})"));
     EXPECT_EQ(inner["status"].asString(), "processing");
     EXPECT_EQ(Explain("/music/c")["governing_folder"]["name"].asString(), "all");
     EXPECT_EQ(Explain("/music/ab")["governing_folder"]["name"].asString(), "all");

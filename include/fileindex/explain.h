@@ -20,8 +20,9 @@ namespace FILEINDEX {
 //   (the folder whose settings govern the path: "path", "name" and the four flags, or null),
 //   "inside_indexed_folder", "contains_indexed_folder", "share_flags" ("no_space",
 //   "need_reindex"), "status" (the folder status word) and "pending" (records for the path or
-//   beneath it in the share's queue: "queue", "companion", and "unread": which of the two were
-//   not read because they are sparse or larger than 1 GiB, counting 0).
+//   beneath it in the share's queue: "queue", "companion", "unread": which of the two were
+//   not read because they are sparse or larger than 1 GiB, counting 0, and "wrong_kind": what
+//   stands at the queue paths that is not a queue file, as QueueFileProblems tells).
 // The indexability verdict comes from the rules CanFullPathBeIndexed runs, with their platform
 // calls and log lines, and from the entry rules: a path the daemon would never index is not
 // called indexable. Takes no lock. False, with the error code of the load, when folder.conf

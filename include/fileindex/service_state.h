@@ -22,5 +22,12 @@ FILEINDEX_EXPORT bool DaemonAnswers();
 // or the load's error code, when it cannot be built. No lock.
 FILEINDEX_EXPORT bool DescribeMonitorQueue(const std::string& share, Json::Value& out);
 
+// What stands at the share's queue paths in its "@eaDir" when it is not a queue file: {"queue":
+// "a directory"}, {"companion": "a FIFO"}, {"@eaDir": "a symbolic link"}, ... (a regular file with
+// several links counts too); an empty object when both are regular files or absent. Such a file
+// holds the share's changes back until the indexing daemon sets it aside. Nothing is opened but the
+// share directory and "@eaDir", without following a link. No lock.
+FILEINDEX_EXPORT Json::Value QueueFileProblems(const std::string& share);
+
 }  // namespace FILEINDEX
 }  // namespace QIRA

@@ -6,6 +6,7 @@
 
 #include "fileindex/folders.h"
 #include "fileindex/index_mgr.h"
+#include "fileindex/service_state.h"
 #include "fileindex/status_mgr.h"
 #include "fileindex/utils.h"
 #include "indexability_rules.h"
@@ -110,6 +111,7 @@ Json::Value Pending(const std::string& share, const std::string& fullPath) {
     pending["unread"] = Json::Value(Json::arrayValue);
     std::string queuePath;
     if (fullPath.empty() || !detail::ShareQueuePath(share, queuePath)) return pending;
+    pending["wrong_kind"] = QueueFileProblems(share);
     const std::string prefix = fullPath + "/";
     for (const auto& [role, file] : {std::pair{"queue", queuePath}, std::pair{"companion", queuePath + ".tmp"}}) {
         bool refused = false;

@@ -2,6 +2,7 @@
 
 #include <cerrno>
 #include <cstring>
+#include <map>
 #include <set>
 
 #include "fileindex/fileindex.h"
@@ -39,9 +40,21 @@ Json::Value WatchedShares(const std::vector<QIRA::FILEINDEX::Folder>& folders) {
         } else {
             entry["error"] = "the registration cannot be built (a folder's path does not resolve)";
         }
+        const Json::Value problems = QIRA::FILEINDEX::QueueFileProblems(share);
+        if (!problems.empty()) entry["queue_problems"] = problems;
         watched.append(entry);
     }
     return watched;
+}
+
+std::string QueueProblemText(const Json::Value& problems) {
+    static const std::map<std::string, std::string> kWhat = {
+        {"@eaDir", "its \"@eaDir\""}, {"queue", "its queue"}, {"companion", "its queue's companion"}};
+    std::string text;
+    for (const auto& role : problems.getMemberNames()) {
+        text += (text.empty() ? "" : "; ") + kWhat.at(role) + " is " + problems[role].asString() + ", not a queue file";
+    }
+    return text.empty() ? text : text + " (the indexing daemon sets it aside)";
 }
 
 std::string NotDoneReason(const std::string& word, const std::vector<QIRA::FILEINDEX::Folder>& folders,
@@ -52,6 +65,8 @@ std::string NotDoneReason(const std::string& word, const std::vector<QIRA::FILEI
         if (left.empty() && QIRA::FILEINDEX::StatusMgr::ShareIsNeedReindex(share)) {
             left = "share " + share + " waits for a full reindex";
         }
+        const std::string problem = QueueProblemText(QIRA::FILEINDEX::QueueFileProblems(share));
+        if (!problem.empty()) left += (left.empty() ? "" : "; ") + ("share " + share + ": " + problem);
     }
     stuck = !folders.empty() && !daemon["answers"].asBool();
     if (stuck) {

@@ -141,6 +141,7 @@ bool ServiceStatus(Json::Value& result) {
         flags["share"] = share;
         flags["no_space"] = StatusMgr::ShareIsNoSpace(share);
         flags["need_reindex"] = StatusMgr::ShareIsNeedReindex(share);
+        flags["queue_problems"] = QIRA::FILEINDEX::QueueFileProblems(share);
         result["shares"].append(flags);
     }
     return true;

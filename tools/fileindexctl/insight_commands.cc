@@ -75,6 +75,8 @@ void PrintExplanation(const Json::Value& e) {
               << " in the queue, " << e["pending"]["companion"].asUInt64() << " in its companion"
               << (e["pending"]["unread"].empty() ? "" : " (not read, sparse or too large: " + Join(e["pending"]["unread"]) + ")")
               << "\n";
+    const std::string problem = tools::QueueProblemText(e["pending"]["wrong_kind"]);
+    if (!problem.empty()) std::cout << "the share's queue: " << problem << "\n";
 }
 
 // Adds to `now` the drain rate (records per second) and the estimated seconds left of every share

@@ -41,6 +41,9 @@ void AddWatchedRows(const Json::Value& watched, Table& table) {
     for (const auto& share : watched) {
         std::string folders = share.isMember("error") ? share["error"].asString() : Join(share["folders"]);
         table.push_back({"watched in " + share["share"].asString(), folders});
+        if (share.isMember("queue_problems")) {
+            table.push_back({"queue of " + share["share"].asString(), tools::QueueProblemText(share["queue_problems"])});
+        }
     }
 }
 
