@@ -5,7 +5,9 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
+#include <ctime>
 
 namespace tools {
 namespace {
@@ -63,6 +65,12 @@ int OpenBeneath(int dirFd, const std::string& relative, int flags, mode_t mode) 
     const int fd = OpenAt2(dirFd, relative, flags, mode);
     if (fd >= 0 || errno != ENOSYS) return fd;
     return OpenByComponents(dirFd, relative, flags, mode);
+}
+
+std::string SetAsideName(const std::string& name) {
+    static std::atomic<unsigned> count{0};
+    return name + ".set-aside." + std::to_string(time(nullptr)) + "." + std::to_string(getpid()) + "." +
+           std::to_string(count++);
 }
 
 Fd::~Fd() {

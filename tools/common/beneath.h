@@ -14,6 +14,10 @@ namespace tools {
 // always added: a FIFO never holds the caller. -1 with errno otherwise.
 int OpenBeneath(int dirFd, const std::string& relative, int flags, mode_t mode = 0);
 
+// A new name for `name` set aside in the same directory: "<name>.set-aside.<time>.<pid>.<n>",
+// never the same twice in a process.
+std::string SetAsideName(const std::string& name);
+
 // A descriptor closed when it goes out of scope.
 class Fd {
 public:

@@ -222,7 +222,7 @@ bool IndexFileStat(const std::string& shareDir, bool writing, struct stat& st, b
         acceptable = errno == ENOENT;
         return false;
     }
-    acceptable = fstat(fd.Get(), &st) == 0 && AcceptableFile(fd.Get(), writing ? O_RDWR : O_RDONLY);
+    acceptable = fstat(fd.Get(), &st) == 0 && S_ISREG(st.st_mode) && AcceptableFile(fd.Get(), writing ? O_RDWR : O_RDONLY);
     return true;
 }
 
@@ -318,21 +318,28 @@ std::string SearchIndex::SetAside(const std::string& shareDir) {
     const std::string real = RealPath(shareDir);
     const Fd base(real.empty() ? -1 : open(real.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
     if (!base.Valid()) return "";
-    const std::string suffix = ".set-aside." + std::to_string(time(nullptr)) + "." + std::to_string(getpid());
     const Fd dir(OpenBeneath(base.Get(), kDirName, O_RDONLY | O_DIRECTORY));
     if (!dir.Valid()) {
         // The database directory itself is of the wrong kind: move it aside in "@eaDir".
         const Fd eaDir(OpenBeneath(base.Get(), "@eaDir", O_RDONLY | O_DIRECTORY));
         const std::string name = NameOf(kDirName);
-        if (!eaDir.Valid() || errno == ENOENT || renameat(eaDir.Get(), name.c_str(), eaDir.Get(), (name + suffix).c_str()) != 0) {
+        const std::string aside = SetAsideName(name);
+        if (!eaDir.Valid() || errno == ENOENT || renameat(eaDir.Get(), name.c_str(), eaDir.Get(), aside.c_str()) != 0) {
             return "";
         }
-        return real + "/@eaDir/" + name + suffix;
+        return real + "/@eaDir/" + aside;
     }
-    const std::string name = kFileName;
-    if (renameat(dir.Get(), name.c_str(), dir.Get(), (name + suffix).c_str()) != 0) return "";
-    for (const char* extra : {"-wal", "-shm"}) unlinkat(dir.Get(), (name + extra).c_str(), 0);
-    return real + "/" + kDirName + "/" + name + suffix;
+    const std::string aside = SetAsideName(kFileName);
+    if (renameat(dir.Get(), kFileName, dir.Get(), aside.c_str()) != 0) return "";
+    // The write-ahead log and shared memory belong to what went aside; anything else at their
+    // names goes aside too.
+    for (const char* extra : {"-wal", "-shm"}) {
+        const std::string name = std::string(kFileName) + extra;
+        if (unlinkat(dir.Get(), name.c_str(), 0) != 0 && errno == EISDIR) {
+            renameat(dir.Get(), name.c_str(), dir.Get(), SetAsideName(name).c_str());
+        }
+    }
+    return real + "/" + kDirName + "/" + aside;
 }
 
 SearchIndex::~SearchIndex() { sqlite3_close(db_); }

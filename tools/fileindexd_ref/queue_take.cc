@@ -7,7 +7,6 @@
 
 #include <cerrno>
 #include <chrono>
-#include <ctime>
 #include <iostream>
 #include <thread>
 
@@ -72,7 +71,7 @@ tools::Fd QueueTake::OpenEaDir() const {
 void QueueTake::SetAsideIfWrongKind(int eaDir, const char* name) {
     struct stat st;
     if (fstatat(eaDir, name, &st, AT_SYMLINK_NOFOLLOW) != 0 || IsPlainFile(st)) return;
-    const std::string aside = std::string(name) + ".set-aside." + std::to_string(time(nullptr)) + "." + std::to_string(getpid());
+    const std::string aside = tools::SetAsideName(name);
     const bool moved = renameat(eaDir, name, eaDir, aside.c_str()) == 0;
     Say(share_, std::string(name) + " is " + KindOf(st.st_mode) + ", not a queue file; " +
                     (moved ? "set aside as " + aside : "it could not be set aside") + "; the share is marked need-reindex");

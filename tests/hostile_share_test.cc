@@ -1,0 +1,365 @@
+// What a share's users can write reaches the daemon stand-in's queue take and record applier, the
+// search index and the views as it is: records climbing out of the share, links, FIFOs and foreign
+// databases where the index and the queue belong, names with control characters. Nothing outside
+// the share is opened (an inotify watch on the canaries tells), nothing blocks, nothing is lost.
+#include "testkit.h"
+
+#include <fcntl.h>
+#include <sqlite3.h>
+#include <sys/inotify.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <csignal>
+#include <filesystem>
+#include <set>
+
+#include "fileindex/fileindex.h"
+#include "queue_take.h"
+#include "search_index.h"
+#include "share_indexer.h"
+#include "text_safety.h"
+
+namespace {
+
+using fileindexd_ref::Batch;
+using QIRA::FILEINDEX::QueueRecordView;
+using Paths = std::set<std::string>;
+
+// Every open or read of what lies in the watched directories, as inotify reports it.
+class OpenWatch {
+public:
+    explicit OpenWatch(const std::vector<std::string>& dirs, uint32_t mask = IN_OPEN | IN_ACCESS)
+        : fd_(inotify_init1(IN_NONBLOCK | IN_CLOEXEC)) {
+        for (const auto& dir : dirs) inotify_add_watch(fd_, dir.c_str(), mask);
+    }
+    ~OpenWatch() { close(fd_); }
+    // The names opened or read since the last call ("." for a directory itself).
+    std::vector<std::string> Opened() {
+        std::vector<std::string> names;
+        alignas(inotify_event) char buffer[4096];
+        ssize_t got;
+        while ((got = read(fd_, buffer, sizeof buffer)) > 0) {
+            for (ssize_t at = 0; at < got;) {
+                const auto* event = reinterpret_cast<const inotify_event*>(buffer + at);
+                names.push_back(event->len > 0 ? event->name : ".");
+                at += static_cast<ssize_t>(sizeof(inotify_event) + event->len);
+            }
+        }
+        return names;
+    }
+
+private:
+    int fd_;
+};
+
+class HostileShareTest : public testkit::IndexFixture {
+protected:
+    void SetUp() override {
+        IndexFixture::SetUp();
+        testkit::WriteFile(FolderConf(), R"({"/music": {"document": true}, "/photo": {"document": true}})");
+        ASSERT_TRUE(IndexMgr::List(folders_));
+    }
+    static QueueRecordView Record(unsigned event, const std::string& path, const std::string& old = "") {
+        QueueRecordView record;
+        record.event = event;
+        record.path = path;
+        record.path_old = old;
+        return record;
+    }
+    // Every path in the share's index, read as a search reads it.
+    Paths Indexed(const std::string& share) {
+        tools::IndexProblem problem;
+        std::string error;
+        const auto index = tools::SearchIndex::Open(ShareDir(share), false, problem, error);
+        std::map<std::string, std::pair<long long, long long>> stored;
+        if (!index || !index->Under("/" + share, stored)) return {"(unreadable: " + error + ")"};
+        Paths paths;
+        for (const auto& entry : stored) paths.insert(entry.first);
+        return paths;
+    }
+    std::string DbDir(const std::string& share) { return ShareDir(share) + "/@eaDir/QIRA@.fileindexdb"; }
+    std::string IndexFile(const std::string& share) { return DbDir(share) + "/index.sqlite"; }
+    // Names in `dir` starting with `prefix`.
+    static size_t CountNamed(const std::string& dir, const std::string& prefix) {
+        size_t count = 0;
+        DIR* listing = opendir(dir.c_str());
+        while (const dirent* entry = listing ? readdir(listing) : nullptr) count += std::string(entry->d_name).rfind(prefix, 0) == 0;
+        if (listing) closedir(listing);
+        return count;
+    }
+
+    std::vector<QIRA::FILEINDEX::Folder> folders_;
+    volatile sig_atomic_t stop_ = 0;
+};
+
+// Every path not canonical beneath the share, at the start, middle or end of a batch and through
+// every kind of record, a move's old path included, is refused: the index holds the good records'
+// files only, and nothing outside the share, in another share or beside it, is opened.
+TEST_F(HostileShareTest, RecordsClimbingOutOfTheShareChangeNothingAndOpenNothingOutside) {
+    const std::string outside = Path("/outside");
+    MakeDir(outside);
+    MakeDir(music_ + "x");
+    for (const auto& file : {outside + "/secret.txt", photo_ + "/a/other.txt", music_ + "x/sibling.txt"}) {
+        testkit::WriteFile(file, "secret");
+    }
+    testkit::WriteFile(music_ + "/a/one.txt", "good");
+    testkit::WriteFile(music_ + "/b/two.txt", "good");
+    const std::vector<std::string> climbing = {
+        music_ + "/a/../../../outside/secret.txt", music_ + "/../photo/a/other.txt", music_ + "/..", music_ + "x/sibling.txt",
+        outside + "/secret.txt", music_ + "/a/./../../photo", music_ + "//a", music_ + "/a/", music_ + std::string("/a\0/../..", 9),
+        "../../outside", ""};
+    fileindexd_ref::ShareIndexer indexer("music", &stop_);
+    OpenWatch watch({outside, photo_ + "/a", music_ + "x"});
+    for (const auto& bad : climbing) {
+        for (const unsigned event : {1u, 2u, 4u, 8u, 256u, 65536u, 131072u}) {
+            for (size_t at = 0; at < 3; ++at) {
+                SCOPED_TRACE(bad + " event " + std::to_string(event) + " at " + std::to_string(at));
+                Batch batch = {Record(2, music_ + "/a/one.txt"), Record(2, music_ + "/b/two.txt")};
+                batch.insert(batch.begin() + static_cast<long>(at), Record(event, bad, event == 256 ? music_ + "/a" : ""));
+                batch.push_back(Record(256, music_ + "/c", bad));  // a move from outside moves nothing in
+                testing::internal::CaptureStdout();
+                EXPECT_TRUE(indexer.Apply(batch, folders_));
+                const std::string log = testing::internal::GetCapturedStdout();
+                EXPECT_EQ(Indexed("music"), (Paths{"/music/a/one.txt", "/music/b/two.txt"}));
+                EXPECT_EQ(testkit::CountOf(log, "records refused"), 1u) << log;
+                EXPECT_EQ(watch.Opened(), std::vector<std::string>{});
+            }
+        }
+    }
+}
+
+// The index as a FIFO, a link, a directory, garbage, a cut database, one with a view or a trigger,
+// or one of another user: never opened for writing, set aside, the share marked need-reindex and
+// a new index made; a search of the thing answers Damaged at once.
+TEST_F(HostileShareTest, AnIndexNotOursIsSetAsideAndRebuiltAndSearchSaysItIsDamaged) {
+    testkit::WriteFile(music_ + "/a/one.txt", "good");
+    fileindexd_ref::ShareIndexer photo("photo", &stop_);
+    ASSERT_TRUE(photo.Reindex(folders_));  // a real index elsewhere, to link to
+    const std::string photoIndex = testkit::ReadFile(IndexFile("photo"));
+    const auto sql = [this](const char* statements) {
+        return [this, statements] {
+            ASSERT_TRUE(fileindexd_ref::ShareIndexer("music", &stop_).Reindex(folders_));
+            sqlite3* db = nullptr;
+            ASSERT_EQ(sqlite3_open(IndexFile("music").c_str(), &db), SQLITE_OK);
+            EXPECT_EQ(sqlite3_exec(db, statements, nullptr, nullptr, nullptr), SQLITE_OK) << sqlite3_errmsg(db);
+            sqlite3_close(db);
+        };
+    };
+    struct Case {
+        std::string name;
+        std::function<void()> plant;
+        bool searchRefuses = true;  // a search may read another user's index; only the daemon refuses to write it
+    };
+    const std::vector<Case> cases = {
+        {"a FIFO", [this] { ASSERT_EQ(mkfifo(IndexFile("music").c_str(), 0644), 0); }},
+        {"a link to another share's index", [this] { ASSERT_EQ(symlink(IndexFile("photo").c_str(), IndexFile("music").c_str()), 0); }},
+        {"a directory", [this] { MakeDir(IndexFile("music")); }},
+        {"garbage", [this] { testkit::WriteFile(IndexFile("music"), std::string(8192, 'x')); }},
+        {"a cut database", [this, sql] {
+             sql("PRAGMA wal_checkpoint(TRUNCATE); PRAGMA journal_mode=DELETE;")();
+             ASSERT_EQ(truncate(IndexFile("music").c_str(), 3000), 0);
+         }},
+        {"a recursive view for a table", sql("DROP TABLE files; CREATE VIEW files(id, path, type, size, mtime) AS WITH RECURSIVE r(x)"
+                                             " AS (SELECT 1 UNION ALL SELECT x + 1 FROM r) SELECT x, '', '', 0, 0 FROM r;")},
+        {"a trigger", sql("CREATE TRIGGER t AFTER INSERT ON files BEGIN DELETE FROM files; END;")},
+        {"another user's file", [this, sql] {
+             sql("")();
+             ASSERT_EQ(chown(IndexFile("music").c_str(), 12345, 12345), 0);
+         }, false},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.name);
+        std::filesystem::remove_all(DbDir("music"));
+        MakeDir(DbDir("music"));
+        ASSERT_TRUE(StatusMgr::ShareSetNeedReindex("music", false));
+        c.plant();
+        const int damaged = testkit::RunBounded(10, [this] {
+            tools::IndexProblem problem;
+            std::string error;
+            return !tools::SearchIndex::Open(ShareDir("music"), false, problem, error) && problem == tools::IndexProblem::Damaged;
+        });
+        EXPECT_EQ(damaged, c.searchRefuses ? 1 : 0);
+        fileindexd_ref::ShareIndexer indexer("music", &stop_);
+        testing::internal::CaptureStdout();
+        EXPECT_TRUE(indexer.Apply({Record(2, music_ + "/a/one.txt")}, folders_));
+        EXPECT_NE(testing::internal::GetCapturedStdout().find("set aside as"), std::string::npos);
+        EXPECT_EQ(CountNamed(DbDir("music"), "index.sqlite.set-aside."), 1u);
+        EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
+        EXPECT_EQ(Indexed("music"), Paths{"/music/a/one.txt"});
+        EXPECT_EQ(testkit::ReadFile(IndexFile("photo")), photoIndex);
+    }
+}
+
+// A change applied as it happens and a walk keep the same entries out: recycle bin, snapshot,
+// hidden and system names at any level, and what lies past the depth bound (logged once).
+TEST_F(HostileShareTest, LiveRecordsAndWalksGiveTheSameIndex) {
+    std::string deep = music_;
+    for (int depth = 1; depth < QIRA::FILEINDEX::MaxEntryDepth(); ++depth) deep += "/d";
+    MakeDir(deep + "/e");
+    const std::vector<std::string> files = {"/#recycle/r.txt", "/#snapshot/s.txt", "/a/@tmp/t.txt", "/a/@__thumb/u.txt",
+                                            "/a/@eaDir/v.txt", "/a/.DS_Store", "/a/ok.txt"};
+    Batch batch;
+    for (const auto& file : files) {
+        MakeDir(music_ + file.substr(0, file.rfind('/')));
+        testkit::WriteFile(music_ + file, "text");
+        batch.push_back(Record(2, music_ + file));
+    }
+    testkit::WriteFile(deep + "/at-the-bound.txt", "text");
+    testkit::WriteFile(deep + "/e/past-the-bound.txt", "text");
+    batch.push_back(Record(2, deep + "/at-the-bound.txt"));
+    batch.push_back(Record(1, deep + "/e/past-the-bound.txt"));
+    batch.push_back(Record(1, deep + "/e"));
+    const Paths expected = {"/music/a/ok.txt", deep.substr(music_.size() - 6) + "/at-the-bound.txt"};
+    fileindexd_ref::ShareIndexer indexer("music", &stop_);
+    testing::internal::CaptureStdout();
+    ASSERT_TRUE(indexer.Apply(batch, folders_));
+    EXPECT_EQ(Indexed("music"), expected);
+    ASSERT_TRUE(indexer.Reindex(folders_));
+    EXPECT_EQ(Indexed("music"), expected);
+    EXPECT_EQ(testkit::CountOf(testing::internal::GetCapturedStdout(), "holds entries too deep"), 1u);
+}
+
+// The queue and its companion are reached through the share directory only: a link in place of
+// "@eaDir" leads nowhere, files of the wrong kind are set aside, a failed batch stays for the next
+// pass, and a long companion is served a batch at a time.
+TEST_F(HostileShareTest, QueueTakeNeverFollowsLinksSetsAsideWrongKindsAndLosesNoBatch) {
+    const auto line = [](const std::string& path) { return "{\"event\":2,\"path\":\"" + path + "\"}\n"; };
+    const std::string photoQueue = QueueOf("photo");
+    MakeDir(photo_ + "/@eaDir");
+    testkit::WriteFile(photoQueue, line(photo_ + "/a/x.txt"));
+    ASSERT_EQ(symlink((photo_ + "/@eaDir").c_str(), (music_ + "/@eaDir").c_str()), 0);
+    fileindexd_ref::QueueTake music("music", music_);
+    music.Take();
+    EXPECT_EQ(music.ApplyNext(10, [](const Batch&) { return true; }), 0u);
+    EXPECT_EQ(testkit::ReadFile(photoQueue), line(photo_ + "/a/x.txt"));
+    EXPECT_FALSE(testkit::Exists(photoQueue + ".tmp"));
+    ASSERT_EQ(unlink((music_ + "/@eaDir").c_str()), 0);
+
+    MakeDir(music_ + "/@eaDir");
+    for (const auto& plant : std::vector<std::function<void(const std::string&)>>{
+             [](const std::string& path) { ASSERT_EQ(mkfifo(path.c_str(), 0644), 0); },
+             [this](const std::string& path) { MakeDir(path); }}) {
+        for (const std::string name : {"QIRA@file_index_queue", "QIRA@file_index_queue.tmp"}) {
+            SCOPED_TRACE(name);
+            ASSERT_TRUE(StatusMgr::ShareSetNeedReindex("music", false));
+            plant(music_ + "/@eaDir/" + name);
+            EXPECT_FALSE(QIRA::FILEINDEX::QueueFileProblems("music").empty());
+            testing::internal::CaptureStdout();
+            music.Take();
+            EXPECT_NE(testing::internal::GetCapturedStdout().find("not a queue file; set aside as " + name + ".set-aside."),
+                      std::string::npos);
+            EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
+            EXPECT_EQ(QIRA::FILEINDEX::QueueFileProblems("music"), Json::Value(Json::objectValue));
+        }
+    }
+
+    std::string records;
+    for (int i = 0; i < 2500; ++i) records += line(music_ + "/a/" + std::to_string(i) + ".txt");
+    testkit::WriteFile(QueueOf("music"), records);
+    music.Take();
+    ASSERT_TRUE(StatusMgr::ShareSetNeedReindex("music", false));
+    testing::internal::CaptureStdout();
+    EXPECT_EQ(music.ApplyNext(1000, [](const Batch&) { return false; }), 0u);
+    EXPECT_NE(testing::internal::GetCapturedStdout().find("1000 records not applied"), std::string::npos);
+    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
+    std::vector<std::string> first;
+    for (const size_t expected : {1000u, 1000u, 500u}) {
+        EXPECT_EQ(music.ApplyNext(1000, [&](const Batch& batch) {
+            if (first.empty()) first.push_back(batch.front().path);
+            return true;
+        }), expected);
+        EXPECT_EQ(music.HasMore(), expected == 1000u);
+    }
+    EXPECT_EQ(first, std::vector<std::string>{music_ + "/a/0.txt"});  // the failed batch came again
+    EXPECT_FALSE(testkit::Exists(QueueOf("music") + ".tmp"));
+}
+
+// A flood of records for one file reads it once per batch.
+TEST_F(HostileShareTest, RecordsForOnePathAreAppliedOncePerBatch) {
+    testkit::WriteFile(music_ + "/a/big.txt", std::string(256 * 1024, 'w'));
+    Batch batch(1000, Record(2, music_ + "/a/big.txt"));
+    batch.push_back(Record(8, music_ + "/a/big.txt"));
+    fileindexd_ref::ShareIndexer indexer("music", &stop_);
+    OpenWatch watch({music_ + "/a"}, IN_OPEN);
+    ASSERT_TRUE(indexer.Apply(batch, folders_));
+    const auto opened = watch.Opened();
+    EXPECT_EQ(std::count(opened.begin(), opened.end(), "big.txt"), 1) << opened.size();
+    EXPECT_EQ(Indexed("music"), Paths{"/music/a/big.txt"});  // deleted, then there again: kept
+}
+
+// Names are shown as their bytes, never acted on: the table escapes them as ls does, JSON carries
+// valid UTF-8 with the bytes beside a name that is not.
+TEST_F(HostileShareTest, NamesWithControlCharactersAndBrokenUtf8AreShownSafely) {
+    struct Case {
+        std::string raw;
+        std::string escaped;
+    };
+    std::vector<Case> cases = {{"\\", "\\\\"}, {"\x7f", "\\177"}, {"\xc2\x85", "\\302\\205"}, {"\xff", "\\377"},
+                               {"\xe2\x82", "\\342\\202"}, {"caf\xc3\xa9 \xe2\x82\xac", "caf\xc3\xa9 \xe2\x82\xac"}};
+    const char* named[] = {"\\a", "\\b", "\\t", "\\n", "\\v", "\\f", "\\r"};
+    for (int c = 1; c < 0x20; ++c) {
+        const std::string octal = {'\\', static_cast<char>('0' + (c >> 6)), static_cast<char>('0' + ((c >> 3) & 7)),
+                                   static_cast<char>('0' + (c & 7))};
+        cases.push_back({std::string(1, static_cast<char>(c)), c >= 7 && c <= 13 ? named[c - 7] : octal});
+    }
+    for (const auto& c : cases) {
+        EXPECT_EQ(tools::EscapeForTerminal(c.raw), c.escaped) << tools::Hex(c.raw);
+        EXPECT_EQ(tools::FromHex(tools::Hex(c.raw)), c.raw);
+        EXPECT_TRUE(tools::IsValidUtf8(tools::ValidUtf8(c.raw, "?")));
+    }
+
+    for (const std::string name : {"a\nb.txt", "\x1b[31mred.txt", "caf\xe9.txt"}) testkit::WriteFile(music_ + "/a/" + name, "needle");
+    fileindexd_ref::ShareIndexer indexer("music", &stop_);
+    ASSERT_TRUE(indexer.Reindex(folders_));
+    const auto table = testkit::Run({FILEINDEXCTL, "search", "needle"});
+    EXPECT_EQ(table.status, 0) << table.err;
+    for (const std::string shown : {"/music/a/a\\nb.txt ", "/music/a/\\033[31mred.txt ", "/music/a/caf\\351.txt "}) {
+        EXPECT_NE(table.out.find(shown), std::string::npos) << table.out;
+    }
+    EXPECT_EQ(table.out.find('\x1b'), std::string::npos);
+    EXPECT_EQ(testkit::CountOf(table.out, "\n"), 5u);  // the header, three rows and the count
+    const auto json = testkit::Run({FILEINDEXCTL, "--json", "search", "needle"});
+    EXPECT_TRUE(tools::IsValidUtf8(json.out));
+    std::set<std::string> raw;
+    const Json::Value answer = testkit::ParseJson(json.out);
+    for (const auto& hit : answer["result"]["hits"]) {
+        raw.insert(hit.isMember("path_hex") ? tools::FromHex(hit["path_hex"].asString()) : hit["path"].asString());
+    }
+    EXPECT_EQ(raw, (std::set<std::string>{"/music/a/a\nb.txt", "/music/a/\x1b[31mred.txt", "/music/a/caf\xe9.txt"}));
+}
+
+// A query is bounded in bytes and words, each bound held exactly; the CLI names the bound.
+TEST_F(HostileShareTest, QueriesAreBoundedInBytesAndWords) {
+    const auto words = [](size_t n) {
+        std::string query;
+        for (size_t i = 0; i < n; ++i) query += "w ";
+        return query;
+    };
+    EXPECT_EQ(tools::QueryError(std::string(tools::kMaxQueryBytes, 'x')), "");
+    EXPECT_EQ(tools::QueryError(std::string(tools::kMaxQueryBytes + 1, 'x')), "the query is longer than 1024 bytes");
+    EXPECT_EQ(tools::QueryError(words(tools::kMaxQueryWords)), "");
+    EXPECT_EQ(tools::QueryError(words(tools::kMaxQueryWords + 1)), "the query has more than 32 words");
+    EXPECT_EQ(tools::QueryError("!! ?"), "the query holds no word");
+    const auto refused = testkit::Run({FILEINDEXCTL, "search", words(tools::kMaxQueryWords + 1)});
+    EXPECT_EQ(refused.status, 2);
+    EXPECT_NE(refused.err.find("the query has more than 32 words"), std::string::npos) << refused.err;
+}
+
+// The CLI reads a share's index only where its user may read the share's directory.
+TEST_F(HostileShareTest, SearchReadsNoIndexOfAShareTheCallerCannotRead) {
+    testkit::WriteFile(music_ + "/a/one.txt", "needle");
+    fileindexd_ref::ShareIndexer indexer("music", &stop_);
+    ASSERT_TRUE(indexer.Reindex(folders_));
+    ASSERT_EQ(chmod(root().c_str(), 0755), 0);
+    ASSERT_EQ(chmod(music_.c_str(), 0700), 0);
+    const int refused = testkit::RunBounded(30, [] {
+        if (setgid(65534) != 0 || setuid(65534) != 0) return false;
+        const auto result = testkit::Run({FILEINDEXCTL, "search", "--share", "music", "needle"});
+        return result.status == 1 && result.err.find("you may not read the directory of share music") != std::string::npos;
+    });
+    EXPECT_EQ(refused, 1);
+}
+
+}  // namespace
