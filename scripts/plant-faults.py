@@ -3,11 +3,15 @@
 which faults the suite caught. Used to check that a change to the tests loses no catches:
 run it on a clone before and after, and compare.
 
-    scripts/plant-faults.py CHECKOUT [--only N,M] > report.tsv
+    scripts/plant-faults.py CHECKOUT [--only N,M] [--faults FILE] > report.tsv
+
+--faults takes the faults from FILE instead, a JSON list of [file, text, replacement] triples:
+faults written by someone who has not read the tests.
 
 The checkout is changed and restored file by file; use a clone, not the tree you work in.
 """
 import argparse
+import json
 import pathlib
 import subprocess
 import sys
@@ -134,7 +138,9 @@ def main():
     parser = argparse.ArgumentParser(description=__doc__.splitlines()[0])
     parser.add_argument("checkout", type=pathlib.Path)
     parser.add_argument("--only", help="comma-separated fault numbers (1-based)")
+    parser.add_argument("--faults", type=pathlib.Path, help="a JSON list of [file, text, replacement]")
     args = parser.parse_args()
+    faults = [tuple(fault) for fault in json.loads(args.faults.read_text())] if args.faults else FAULTS
     tree = args.checkout.resolve()
     build = tree / "build-faults"
     if run(["cmake", "-S", ".", "-B", str(build), "-DCMAKE_BUILD_TYPE=Debug"], tree).returncode != 0:
@@ -143,7 +149,7 @@ def main():
         sys.exit("the unchanged tree does not build")
     chosen = {int(n) for n in args.only.split(",")} if args.only else None
     caught = planted = 0
-    for number, (name, text, replacement) in enumerate(FAULTS, 1):
+    for number, (name, text, replacement) in enumerate(faults, 1):
         if chosen and number not in chosen:
             continue
         path = tree / name
