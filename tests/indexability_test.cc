@@ -100,3 +100,56 @@ TEST_F(IndexabilityTest, SpaceIsShortOnlyForTheTwoNoSpaceErrors) {
 }
 
 }  // namespace
+
+namespace {
+
+// A record's path is taken only in canonical form beneath its share, each bound held exactly; the
+// entry rules refuse at the first component that fails, whatever lies after it.
+TEST_F(IndexabilityTest, EntryRulesTakeCanonicalPathsBeneathTheShareAndRefuseTheFirstBadComponent) {
+    const std::string longName(NAME_MAX, 'n');
+    std::string atPathMax = dir_;
+    while (atPathMax.size() + 202 < PATH_MAX) atPathMax += "/" + std::string(100, 'n');
+    atPathMax += "/" + std::string(PATH_MAX - 2 - atPathMax.size(), 'p');  // PATH_MAX - 1 bytes, the last name 100 to 200
+    struct Case {
+        std::string path;
+        bool canonical;
+        const char* refusal;  // nullptr: indexable
+    };
+    const std::vector<Case> cases = {
+        {dir_, true, nullptr},
+        {dir_ + "/dir/" + longName, true, nullptr},
+        {dir_ + "/dir/" + longName + "n", false, "not_beneath"},
+        {atPathMax, true, nullptr},
+        {atPathMax + "p", false, "not_beneath"},
+        {dir_ + "/", false, "not_beneath"},
+        {dir_ + "//dir", false, "not_beneath"},
+        {dir_ + "/./dir", false, "not_beneath"},
+        {dir_ + "/dir/..", false, "not_beneath"},
+        {dir_ + "/../s2/x", false, "not_beneath"},
+        {dir_ + "x/dir", false, "not_beneath"},
+        {dir_ + std::string("/d\0r", 4), false, "not_beneath"},
+        {"relative/dir", false, "not_beneath"},
+        {dir_ + "/dir/@eaDir/x.txt", true, "system_name"},
+        {dir_ + "/@tmp/dir/x.txt", true, "system_name"},
+        {dir_ + "/dir/.DS_Store", true, "system_name"},
+        {dir_ + "/#recycle/dir/x.txt", true, "skipped_dir"},
+        {dir_ + "/#snapshot/x.txt", true, "skipped_dir"},
+        {dir_ + "/dir/#recycle/x.txt", true, nullptr},  // not the share's recycle bin
+        {dir_ + "/#recycle/@tmp/x.txt", true, "skipped_dir"},  // the first refusing component names the rule
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.path.size() > 200 ? std::to_string(c.path.size()) + " bytes" : c.path);
+        EXPECT_EQ(IsCanonicalBeneath(dir_, c.path), c.canonical);
+        const char* refusal = EntryRefusal(dir_, c.path, false);
+        EXPECT_EQ(std::string(refusal ? refusal : "-"), std::string(c.refusal ? c.refusal : "-"));
+    }
+    std::string deep = dir_;
+    for (int depth = 1; depth <= MaxEntryDepth(); ++depth) deep += "/d";
+    EXPECT_EQ(EntryRefusal(dir_, deep, true), nullptr);
+    EXPECT_STREQ(EntryRefusal(dir_, deep + "/d", false), "too_deep");
+    EXPECT_STREQ(ChildRefusal(dir_ + "/x", "x", MaxEntryDepth() + 1, false), "too_deep");
+    EXPECT_EQ(ChildRefusal(dir_ + "/x", "x", MaxEntryDepth(), false), nullptr);
+    EXPECT_EQ(ChildRefusal(dir_ + "/#recycle", "#recycle", 1, false), nullptr);  // a file of that name
+}
+
+}  // namespace

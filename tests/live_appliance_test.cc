@@ -99,6 +99,20 @@ TEST_F(LiveApplianceTest, EaDirOutsideFoldersSwitchedOffKindsAndDeletedFoldersSt
     EXPECT_TRUE(Finds("secret", (Paths{"/music/a/secret.mp3", "/music/a/sentinel.txt"})));
 }
 
+// The notifier watches as deep as the index reaches and no deeper, and says so once; a file past
+// the bound stays out of the index, one at the bound is found.
+TEST_F(LiveApplianceTest, TreesDeeperThanTheBoundAreNeitherWatchedNorIndexed) {
+    std::string deep = "/a";
+    for (int depth = 2; depth < MaxEntryDepth(); ++depth) deep += "/d";
+    MakeDir(music_ + deep + "/e/f");  // e lies at the bound, f past it
+    Index("/music/a", R"("document": true)");
+    for (const std::string& file : {deep + "/at-the-bound.txt", deep + "/e/past-the-bound.txt", deep + "/e/f/further.txt", std::string("/a/sentinel.txt")}) {
+        testkit::WriteFile(music_ + file, "abyss");
+    }
+    EXPECT_TRUE(Finds("abyss", Paths{"/music" + deep + "/at-the-bound.txt", "/music/a/sentinel.txt"}));
+    EXPECT_EQ(testkit::CountOf(testkit::ReadFile(notifierLog_), "not watching " + music_ + deep + "/e or anything deeper"), 1u);
+}
+
 // Changes the kernel dropped are recovered by reindex records for every registered folder.
 TEST_F(LiveApplianceTest, AnOverflowLeadsToReindexRecordsAndACompleteIndexAgain) {
     Index("/music/a", R"("document": true)");
