@@ -23,6 +23,9 @@ namespace tools {
 namespace {
 
 const char kPragmas[] = "PRAGMA journal_mode=WAL; PRAGMA synchronous=NORMAL;";
+// Every connection keeps its temporary files (statement journals, sorts) in memory: SQLite may
+// open no file outside the share.
+const char kInMemoryTemp[] = "PRAGMA temp_store=MEMORY;";
 const char kSchema[] =
     "CREATE TABLE IF NOT EXISTS files(id INTEGER PRIMARY KEY, path TEXT NOT NULL UNIQUE, type TEXT NOT NULL,"
     " size INTEGER NOT NULL, mtime INTEGER NOT NULL);"
@@ -293,7 +296,7 @@ std::unique_ptr<SearchIndex> SearchIndex::Open(const std::string& shareDir, bool
     sqlite3_progress_handler(db, kProgressSteps, &SearchIndex::OnProgress, index.get());
     sqlite3_busy_timeout(db, 1000);
     index->SetDeadline(std::chrono::steady_clock::now() + kOpenBudget);
-    const bool made = !create || (index->Exec(kPragmas) && index->Exec(kSchema));
+    const bool made = index->Exec(kInMemoryTemp) && (!create || (index->Exec(kPragmas) && index->Exec(kSchema)));
     bool listed = false;
     const bool ours = made && SchemaOf(db, listed) == OurSchema();
     struct stat after{};
