@@ -238,9 +238,11 @@ TEST_F(HostileShareTest, QueueTakeNeverFollowsLinksSetsAsideWrongKindsAndLosesNo
     ASSERT_EQ(unlink((music_ + "/@eaDir").c_str()), 0);
 
     MakeDir(music_ + "/@eaDir");
+    testkit::WriteFile(photo_ + "/elsewhere", line(photo_ + "/a/x.txt"));
     for (const auto& plant : std::vector<std::function<void(const std::string&)>>{
              [](const std::string& path) { ASSERT_EQ(mkfifo(path.c_str(), 0644), 0); },
-             [this](const std::string& path) { MakeDir(path); }}) {
+             [this](const std::string& path) { MakeDir(path); },
+             [this](const std::string& path) { ASSERT_EQ(symlink((photo_ + "/elsewhere").c_str(), path.c_str()), 0); }}) {
         for (const std::string name : {"QIRA@file_index_queue", "QIRA@file_index_queue.tmp"}) {
             SCOPED_TRACE(name);
             ASSERT_TRUE(StatusMgr::ShareSetNeedReindex("music", false));
@@ -254,6 +256,7 @@ TEST_F(HostileShareTest, QueueTakeNeverFollowsLinksSetsAsideWrongKindsAndLosesNo
             EXPECT_EQ(QIRA::FILEINDEX::QueueFileProblems("music"), Json::Value(Json::objectValue));
         }
     }
+    EXPECT_EQ(testkit::ReadFile(photo_ + "/elsewhere"), line(photo_ + "/a/x.txt"));  // a linked file is never taken
 
     std::string records;
     for (int i = 0; i < 2500; ++i) records += line(music_ + "/a/" + std::to_string(i) + ".txt");

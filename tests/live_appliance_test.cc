@@ -105,12 +105,26 @@ TEST_F(LiveApplianceTest, TreesDeeperThanTheBoundAreNeitherWatchedNorIndexed) {
     std::string deep = "/a";
     for (int depth = 2; depth < MaxEntryDepth(); ++depth) deep += "/d";
     MakeDir(music_ + deep + "/e/f");  // e lies at the bound, f past it
+    MakeDir(music_ + deep + "/e2");
     Index("/music/a", R"("document": true)");
     for (const std::string& file : {deep + "/at-the-bound.txt", deep + "/e/past-the-bound.txt", deep + "/e/f/further.txt", std::string("/a/sentinel.txt")}) {
         testkit::WriteFile(music_ + file, "abyss");
     }
     EXPECT_TRUE(Finds("abyss", Paths{"/music" + deep + "/at-the-bound.txt", "/music/a/sentinel.txt"}));
-    EXPECT_EQ(testkit::CountOf(testkit::ReadFile(notifierLog_), "not watching " + music_ + deep + "/e or anything deeper"), 1u);
+    EXPECT_EQ(testkit::CountOf(testkit::ReadFile(notifierLog_), "or anything deeper than 64 levels"), 1u);  // once per folder
+}
+
+// A link in place of a share's "@eaDir" leads none of its records into the other share's queue,
+// where the daemon would have to refuse them.
+TEST_F(LiveApplianceTest, ALinkedEaDirLeadsNoRecordIntoAnotherSharesQueue) {
+    Index("/music/a", R"("document": true)");
+    Index("/photo/a", R"("document": true)");
+    ASSERT_EQ(rename((music_ + "/@eaDir").c_str(), (music_ + "/b/moved-away").c_str()), 0);
+    ASSERT_EQ(symlink((photo_ + "/@eaDir").c_str(), (music_ + "/@eaDir").c_str()), 0);
+    testkit::WriteFile(music_ + "/a/lost.txt", "linked");
+    testkit::WriteFile(photo_ + "/a/found.txt", "linked");
+    EXPECT_TRUE(Finds("linked", Paths{"/photo/a/found.txt"}));
+    EXPECT_FALSE(Logged(daemonLog_, "records refused")) << testkit::ReadFile(daemonLog_);
 }
 
 // Changes the kernel dropped are recovered by reindex records for every registered folder.
