@@ -130,9 +130,9 @@ public:
     // The share's index, once the daemon has made it.
     tools::SearchIndex& Index() {
         while (!index_) {
-            char dir[4096];
+            tools::IndexProblem problem;
             std::string error;
-            if (FILEIDXDBPathGet("music", dir, sizeof dir) >= 0) index_ = tools::SearchIndex::Open(dir, false, error);
+            index_ = tools::SearchIndex::Open(share_, false, problem, error);
             if (!index_) std::this_thread::sleep_for(std::chrono::milliseconds(5));
         }
         return *index_;

@@ -1,6 +1,8 @@
 // The console under a flood of connections that never finish a request: how long real requests
 // wait while 500 connections sit idle or send their head a byte at a time, against the same
-// requests with no flood, in the same run; and what the flood costs the console in memory.
+// requests with no flood, in the same run; and what the flood costs the console in memory. And
+// how long they wait while ten clients keep the console busy with searches that each run up to
+// their deadline.
 #include <fcntl.h>
 #include <netinet/in.h>
 #include <signal.h>
@@ -14,6 +16,7 @@
 #include <cstring>
 #include <filesystem>
 #include <fstream>
+#include <mutex>
 #include <regex>
 #include <thread>
 #include <vector>
@@ -22,6 +25,7 @@
 #include <httplib.h>
 
 #include "qira_sim/appliance.h"
+#include "search_index.h"
 
 namespace {
 
@@ -91,6 +95,8 @@ public:
         return times;
     }
     pid_t pid() const { return pid_; }
+    const std::string& root() const { return root_; }
+    int port() const { return port_; }
 
 private:
     std::string root_;
@@ -156,6 +162,66 @@ void BM_RequestsDuringAFloodOfSlowConnections(benchmark::State& state) {
     state.counters["flood_rss_MiB"] = floodKiB / 1024;
 }
 BENCHMARK(BM_RequestsDuringAFloodOfSlowConnections)->UseManualTime()->Unit(benchmark::kMillisecond)->Iterations(1);
+
+double Scale() { return std::getenv("FILEINDEX_BENCH_SCALE") ? std::atof(std::getenv("FILEINDEX_BENCH_SCALE")) : 1.0; }
+
+// Share "music" with one indexed folder and an index of `files` files whose every name and text
+// share the word "common": a search for "c" ranks them all.
+void MakeSlowIndex(const std::string& root, int files) {
+    const std::string share = root + "/volume1/music";
+    std::filesystem::create_directories(share + "/@eaDir/QIRA@.fileindexdb");
+    qira_sim::PutShare("music", share);
+    std::filesystem::create_directories(root + "/usr/qira/etc/fileindex");
+    std::ofstream(root + "/usr/qira/etc/fileindex/folder.conf") << R"({"/music": {"document": true}})";
+    tools::IndexProblem problem;
+    std::string error;
+    const auto index = tools::SearchIndex::Open(share, true, problem, error);
+    index->Begin();
+    for (int i = 0; i < files; ++i) {
+        index->Put({"/music/common-" + std::to_string(i) + ".txt", "document", 100, 0,
+                    "common words of a common file, number " + std::to_string(i)});
+    }
+    index->Commit();
+}
+
+void BM_StatusWhileTenSearchesRun(benchmark::State& state) {
+    const int requests = static_cast<int>(std::max(20.0, 400 * Scale()));
+    Console console;
+    setenv("QIRA_ROOT", console.root().c_str(), 1);
+    MakeSlowIndex(console.root(), static_cast<int>(std::max(1000.0, 300000 * Scale())));
+    std::string token = ReadFile(console.root() + "/usr/qira/etc/fileindex/web.token");
+    token.erase(token.find_last_not_of("\n") + 1);
+    std::vector<double> quiet, busy, searches;
+    for (auto _ : state) {
+        quiet = console.TimeRequests(requests);
+        std::atomic<bool> stopping{false};
+        std::mutex timesMutex;
+        std::vector<std::thread> searchers;
+        for (int i = 0; i < 10; ++i) {
+            searchers.emplace_back([&] {
+                httplib::Client client("127.0.0.1", console.port());
+                client.set_read_timeout(30, 0);
+                while (!stopping) {
+                    const auto start = Clock::now();
+                    client.Get("/api/search?q=c&limit=200", {{"X-Fileindex-Token", token}});
+                    std::lock_guard<std::mutex> lock(timesMutex);
+                    searches.push_back(std::chrono::duration<double>(Clock::now() - start).count());
+                }
+            });
+        }
+        std::this_thread::sleep_for(std::chrono::milliseconds(200));  // the searches under way
+        busy = console.TimeRequests(requests);
+        stopping = true;
+        for (auto& searcher : searchers) searcher.join();
+        state.SetIterationTime(Percentile(busy, 0.99));
+    }
+    state.counters["quiet_p99_ms"] = Percentile(quiet, 0.99) * 1e3;
+    state.counters["busy_p50_ms"] = Percentile(busy, 0.5) * 1e3;
+    state.counters["busy_p99_ms"] = Percentile(busy, 0.99) * 1e3;
+    state.counters["search_p50_ms"] = Percentile(searches, 0.5) * 1e3;
+    state.counters["searches"] = static_cast<double>(searches.size());
+}
+BENCHMARK(BM_StatusWhileTenSearchesRun)->UseManualTime()->Unit(benchmark::kMillisecond)->Iterations(1);
 
 }  // namespace
 
