@@ -193,7 +193,8 @@ TEST_F(HostileShareTest, AnIndexNotOursIsSetAsideAndRebuiltAndSearchSaysItIsDama
 }
 
 // A change applied as it happens and a walk keep the same entries out: recycle bin, snapshot,
-// hidden and system names at any level, and what lies past the depth bound (logged once).
+// hidden and system names at any level, links on the way, and what lies past the depth bound
+// (logged once).
 TEST_F(HostileShareTest, LiveRecordsAndWalksGiveTheSameIndex) {
     std::string deep = music_;
     for (int depth = 1; depth < QIRA::FILEINDEX::MaxEntryDepth(); ++depth) deep += "/d";
@@ -206,12 +207,18 @@ TEST_F(HostileShareTest, LiveRecordsAndWalksGiveTheSameIndex) {
         testkit::WriteFile(music_ + file, "text");
         batch.push_back(Record(2, music_ + file));
     }
+    // A link inside the share is a way neither a walk nor a live record takes.
+    MakeDir(music_ + "/b/sub");
+    testkit::WriteFile(music_ + "/b/sub/x.txt", "text");
+    ASSERT_EQ(symlink("../b", (music_ + "/a/link").c_str()), 0);
+    batch.push_back(Record(2, music_ + "/a/link/sub/x.txt"));
+    batch.push_back(Record(2, music_ + "/b/sub/x.txt"));
     testkit::WriteFile(deep + "/at-the-bound.txt", "text");
     testkit::WriteFile(deep + "/e/past-the-bound.txt", "text");
     batch.push_back(Record(2, deep + "/at-the-bound.txt"));
     batch.push_back(Record(1, deep + "/e/past-the-bound.txt"));
     batch.push_back(Record(1, deep + "/e"));
-    const Paths expected = {"/music/a/ok.txt", deep.substr(music_.size() - 6) + "/at-the-bound.txt"};
+    const Paths expected = {"/music/a/ok.txt", "/music/b/sub/x.txt", deep.substr(music_.size() - 6) + "/at-the-bound.txt"};
     fileindexd_ref::ShareIndexer indexer("music", &stop_);
     testing::internal::CaptureStdout();
     ASSERT_TRUE(indexer.Apply(batch, folders_));
