@@ -156,6 +156,7 @@ TEST_F(HostileShareTest, AnIndexNotOursIsSetAsideAndRebuiltAndSearchSaysItIsDama
         {"a FIFO", [this] { ASSERT_EQ(mkfifo(IndexFile("music").c_str(), 0644), 0); }},
         {"a link to another share's index", [this] { ASSERT_EQ(symlink(IndexFile("photo").c_str(), IndexFile("music").c_str()), 0); }},
         {"a directory", [this] { MakeDir(IndexFile("music")); }},
+        {"a hard link to another share's index", [this] { ASSERT_EQ(link(IndexFile("photo").c_str(), IndexFile("music").c_str()), 0); }},
         {"garbage", [this] { testkit::WriteFile(IndexFile("music"), std::string(8192, 'x')); }},
         {"a cut database", [this, sql] {
              sql("PRAGMA wal_checkpoint(TRUNCATE); PRAGMA journal_mode=DELETE;")();
@@ -286,17 +287,32 @@ TEST_F(HostileShareTest, QueueTakeNeverFollowsLinksSetsAsideWrongKindsAndLosesNo
     EXPECT_FALSE(testkit::Exists(QueueOf("music") + ".tmp"));
 }
 
-// A flood of records for one file reads it once per batch.
+// A flood of records for one file reads it once per batch; a record that asks for a fresh read
+// after one that did not still gets it.
 TEST_F(HostileShareTest, RecordsForOnePathAreAppliedOncePerBatch) {
-    testkit::WriteFile(music_ + "/a/big.txt", std::string(256 * 1024, 'w'));
-    Batch batch(1000, Record(2, music_ + "/a/big.txt"));
-    batch.push_back(Record(8, music_ + "/a/big.txt"));
+    const std::string big = music_ + "/a/big.txt";
+    testkit::WriteFile(big, "before " + std::string(256 * 1024, 'w'));
+    Batch batch(1000, Record(2, big));
+    batch.push_back(Record(8, big));
     fileindexd_ref::ShareIndexer indexer("music", &stop_);
     OpenWatch watch({music_ + "/a"}, IN_OPEN);
     ASSERT_TRUE(indexer.Apply(batch, folders_));
     const auto opened = watch.Opened();
     EXPECT_EQ(std::count(opened.begin(), opened.end(), "big.txt"), 1) << opened.size();
     EXPECT_EQ(Indexed("music"), Paths{"/music/a/big.txt"});  // deleted, then there again: kept
+
+    struct stat st;
+    ASSERT_EQ(stat(big.c_str(), &st), 0);
+    testkit::WriteFile(big, "after! " + std::string(256 * 1024, 'w'));  // same size and time: only a read tells
+    const timespec times[2] = {st.st_atim, st.st_mtim};
+    ASSERT_EQ(utimensat(AT_FDCWD, big.c_str(), times, 0), 0);
+    ASSERT_TRUE(indexer.Apply({Record(4, big), Record(2, big)}, folders_));
+    tools::IndexProblem problem;
+    std::string error;
+    std::vector<tools::SearchHit> hits;
+    const auto index = tools::SearchIndex::Open(music_, false, problem, error);
+    ASSERT_TRUE(index && index->Search("after", "", 10, hits, error)) << error;
+    EXPECT_EQ(hits.size(), 1u);
 }
 
 // Names are shown as their bytes, never acted on: the table escapes them as ls does, JSON carries
@@ -306,7 +322,8 @@ TEST_F(HostileShareTest, NamesWithControlCharactersAndBrokenUtf8AreShownSafely) 
         std::string raw;
         std::string escaped;
     };
-    std::vector<Case> cases = {{"\\", "\\\\"}, {"\x7f", "\\177"}, {"\xc2\x85", "\\302\\205"}, {"\xff", "\\377"},
+    std::vector<Case> cases = {{"\\", "\\\\"}, {"\x7f", "\\177"}, {"\xc2\x80", "\\302\\200"}, {"\xc2\x9f", "\\302\\237"},
+                               {"\xc2\xa0", "\xc2\xa0"}, {"\xff", "\\377"},
                                {"\xe2\x82", "\\342\\202"}, {"caf\xc3\xa9 \xe2\x82\xac", "caf\xc3\xa9 \xe2\x82\xac"}};
     const char* named[] = {"\\a", "\\b", "\\t", "\\n", "\\v", "\\f", "\\r"};
     for (int c = 1; c < 0x20; ++c) {
@@ -363,13 +380,15 @@ TEST_F(HostileShareTest, SearchReadsNoIndexOfAShareTheCallerCannotRead) {
     fileindexd_ref::ShareIndexer indexer("music", &stop_);
     ASSERT_TRUE(indexer.Reindex(folders_));
     ASSERT_EQ(chmod(root().c_str(), 0755), 0);
-    ASSERT_EQ(chmod(music_.c_str(), 0700), 0);
-    const int refused = testkit::RunBounded(30, [] {
-        if (setgid(65534) != 0 || setuid(65534) != 0) return false;
-        const auto result = testkit::Run({FILEINDEXCTL, "search", "--share", "music", "needle"});
-        return result.status == 1 && result.err.find("you may not read the directory of share music") != std::string::npos;
-    });
-    EXPECT_EQ(refused, 1);
+    for (const mode_t mode : {0700, 0711, 0744}) {  // neither listing nor entering is enough alone
+        ASSERT_EQ(chmod(music_.c_str(), mode), 0);
+        const int refused = testkit::RunBounded(30, [] {
+            if (setgid(65534) != 0 || setuid(65534) != 0) return false;
+            const auto result = testkit::Run({FILEINDEXCTL, "search", "--share", "music", "needle"});
+            return result.status == 1 && result.err.find("you may not read the directory of share music") != std::string::npos;
+        });
+        EXPECT_EQ(refused, 1) << std::oct << mode;
+    }
 }
 
 }  // namespace

@@ -157,6 +157,12 @@ TEST_F(WebApiTest, StatusAndListingTellTheDaemonsStateAndWhyAFolderIsNotIndexabl
     EXPECT_FALSE(status["daemon"]["answers"].asBool());
     EXPECT_EQ(status["not_done"].asString(), "indexing is processing and the indexing daemon does not answer at " +
                                                  DaemonSocketPath() + " (No such file or directory)");
+    MakeDir(QueueOf("music") + ".tmp");  // a share's user made a directory where the companion goes
+    status = Get("/api/status").body["result"];
+    EXPECT_EQ(status["not_done"].asString(), "indexing is processing; share music: its queue's companion is a directory, not a "
+                                             "queue file (the indexing daemon sets it aside) and the indexing daemon does not "
+                                             "answer at " + DaemonSocketPath() + " (No such file or directory)");
+    EXPECT_EQ(status["shares"][0]["queue_problems"], J(R"({"companion": "a directory"})"));
 }
 
 // Every write route holds each check on both sides of its boundary: the token (absent, empty, a
