@@ -127,6 +127,28 @@ TEST_F(LiveApplianceTest, ALinkedEaDirLeadsNoRecordIntoAnotherSharesQueue) {
     EXPECT_FALSE(Logged(daemonLog_, "records refused")) << testkit::ReadFile(daemonLog_);
 }
 
+// Shares are served in turn: a file written into one share is applied between slices of a flood
+// of records in another, not after it.
+TEST_F(LiveApplianceTest, AFloodInOneShareDoesNotHoldAnotherBack) {
+    Index("/music/a", R"("document": true)");
+    Index("/photo/a", R"("document": true)");
+    ASSERT_TRUE(StatusMgr::Pause(0));
+    ASSERT_TRUE(testkit::WaitFor([&] { return Logged(daemonLog_, "\"type\":\"pause\""); }));
+    std::string flood;
+    for (int i = 0; i < 50000; ++i) flood += "{\"event\":2,\"path\":\"" + music_ + "/a/gone" + std::to_string(i) + ".txt\"}\n";
+    testkit::WriteFile(QueueOf("music"), testkit::ReadFile(QueueOf("music")) + flood);
+    testkit::WriteFile(photo_ + "/a/found.txt", "served");
+    ASSERT_TRUE(testkit::WaitFor([&] { return testkit::ReadFile(QueueOf("photo")).find("found.txt") != std::string::npos; }));
+    const size_t before = testkit::ReadFile(daemonLog_).size();
+    ASSERT_TRUE(StatusMgr::Resume());
+    ASSERT_TRUE(testkit::WaitFor([&] { return testkit::RecordsApplied(testkit::ReadFile(daemonLog_).substr(before), "music") >= 50000; }));
+    const std::string log = testkit::ReadFile(daemonLog_).substr(before);
+    const size_t photo = log.find("share photo: ");
+    ASSERT_NE(photo, std::string::npos) << log;
+    EXPECT_LT(photo, log.rfind("share music: ")) << log;  // music was served again after photo
+    EXPECT_TRUE(Finds("served", Paths{"/photo/a/found.txt"}));
+}
+
 // Changes the kernel dropped are recovered by reindex records for every registered folder.
 TEST_F(LiveApplianceTest, AnOverflowLeadsToReindexRecordsAndACompleteIndexAgain) {
     Index("/music/a", R"("document": true)");

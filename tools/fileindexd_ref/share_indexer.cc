@@ -79,6 +79,7 @@ bool ShareIndexer::Open() {
 bool ShareIndexer::Finish(bool done) {
     folders_ = nullptr;
     synced_.clear();
+    ways_.clear();
     problem_ = index_->LastProblem();
     if (done && problem_ == tools::IndexProblem::None && (stop_ == nullptr || *stop_ == 0) && index_->Commit()) return true;
     problem_ = index_->LastProblem() == tools::IndexProblem::None ? tools::IndexProblem::TimedOut : index_->LastProblem();
@@ -155,6 +156,12 @@ std::string ShareIndexer::Relative(const std::string& fullPath) const {
     return fullPath.size() > shareDir_.size() ? fullPath.substr(shareDir_.size() + 1) : "";
 }
 
+const char* ShareIndexer::WayRefusal(const std::string& dir) {
+    const auto found = ways_.find(dir);
+    if (found != ways_.end()) return found->second;
+    return ways_[dir] = QIRA::FILEINDEX::EntryRefusal(shareDir_, dir, true);
+}
+
 int ShareIndexer::Depth(const std::string& fullPath) const {
     return static_cast<int>(std::count(fullPath.begin() + static_cast<long>(shareDir_.size()), fullPath.end(), '/'));
 }
@@ -169,7 +176,7 @@ void ShareIndexer::Sync(const std::string& fullPath, bool force) {
         const size_t slash = fullPath.rfind('/');
         const std::string parent = fullPath.substr(0, slash);
         const std::string name = fullPath.substr(slash + 1);
-        const tools::Fd parentFd(QIRA::FILEINDEX::EntryRefusal(shareDir_, parent, true) == nullptr
+        const tools::Fd parentFd(WayRefusal(parent) == nullptr
                                      ? tools::OpenBeneath(shareFd_.Get(), Relative(parent), kDirFlags)
                                      : -1);
         struct stat st;

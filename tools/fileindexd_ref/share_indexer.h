@@ -65,6 +65,8 @@ private:
     void IndexFile(int dirFd, const std::string& name, const std::string& fullPath, const struct stat& st,
                    const Json::Value& governing, bool force, const Stored& stored, std::set<std::string>& seen);
     int Depth(const std::string& fullPath) const;
+    // EntryRefusal of a directory on the way, asked once per batch.
+    const char* WayRefusal(const std::string& dir);
     std::string SharePathOf(const std::string& fullPath) const { return fullPath.substr(volume_.size()); }
     std::string Relative(const std::string& fullPath) const;
 
@@ -78,6 +80,7 @@ private:
     const std::vector<QIRA::FILEINDEX::Folder>* folders_ = nullptr;  // during Apply and Reindex
     std::set<std::string> tooDeepLogged_;  // folders whose depth bound was logged
     std::map<std::string, bool> synced_;   // paths applied in this batch, and whether read afresh
+    std::map<std::string, const char*> ways_;  // WayRefusal's answers in this batch
 };
 
 }  // namespace fileindexd_ref
