@@ -194,6 +194,9 @@ TEST_F(LiveApplianceTest, SearchFindsPrefixesWithoutAccentsBestFirst) {
     httplib::Client client("127.0.0.1", testkit::StartListening({FILEINDEX_WEB, "--listen", "127.0.0.1:0"}, Path("/web.log"), web));
     const httplib::Headers token = {{"X-Fileindex-Token", testkit::ReadFile(Path("/usr/qira/etc/fileindex/web.token")).substr(0, 64)}};
     EXPECT_EQ(client.Get("/api/search?q=week")->status, 403);  // a search reads the files' text: the token only
+    std::string changed = token.begin()->second;
+    changed[0] = changed[0] == '0' ? '1' : '0';
+    EXPECT_EQ(client.Get("/api/search?q=week", {{"X-Fileindex-Token", changed}})->status, 403);
     const auto found = client.Get("/api/search?q=week&type=document", token);
     ASSERT_TRUE(found);
     const Json::Value hit = testkit::ParseJson(found->body)["result"]["hits"][0];
