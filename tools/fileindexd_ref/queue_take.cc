@@ -10,8 +10,8 @@
 #include <iostream>
 #include <thread>
 
+#include "fileindex/service_state.h"
 #include "fileindex/status_mgr.h"
-#include "text_safety.h"
 
 namespace fileindexd_ref {
 namespace {
@@ -19,15 +19,6 @@ namespace {
 constexpr char kQueue[] = "QIRA@file_index_queue";
 constexpr char kCompanion[] = "QIRA@file_index_queue.tmp";
 constexpr std::chrono::milliseconds kLockPatience{1000};
-
-const char* KindOf(mode_t mode) {
-    if (S_ISDIR(mode)) return "a directory";
-    if (S_ISFIFO(mode)) return "a FIFO";
-    if (S_ISLNK(mode)) return "a symbolic link";
-    if (S_ISSOCK(mode)) return "a socket";
-    if (S_ISREG(mode)) return "a file with several links";
-    return "a device";
-}
 
 bool IsPlainFile(const struct stat& st) { return S_ISREG(st.st_mode) && st.st_nlink == 1; }
 
@@ -68,12 +59,10 @@ tools::Fd QueueTake::OpenEaDir() const {
     return tools::Fd(share.Valid() ? tools::OpenBeneath(share.Get(), "@eaDir", O_RDONLY | O_DIRECTORY) : -1);
 }
 
-void QueueTake::SetAsideIfWrongKind(int eaDir, const char* name) {
-    struct stat st;
-    if (fstatat(eaDir, name, &st, AT_SYMLINK_NOFOLLOW) != 0 || IsPlainFile(st)) return;
+void QueueTake::SetAside(int eaDir, const char* name, const std::string& kind) {
     const std::string aside = tools::SetAsideName(name);
     const bool moved = renameat(eaDir, name, eaDir, aside.c_str()) == 0;
-    Say(share_, std::string(name) + " is " + KindOf(st.st_mode) + ", not a queue file; " +
+    Say(share_, std::string(name) + " is " + kind + ", not a queue file; " +
                     (moved ? "set aside as " + aside : "it could not be set aside") + "; the share is marked need-reindex");
     QIRA::FILEINDEX::StatusMgr::ShareSetNeedReindex(share_, true);
 }
@@ -86,8 +75,9 @@ void QueueTake::Remove(int eaDir, const char* name, dev_t dev, ino_t ino) {
 void QueueTake::Take() {
     const tools::Fd eaDir = OpenEaDir();
     if (!eaDir.Valid()) return;
-    SetAsideIfWrongKind(eaDir.Get(), kQueue);
-    SetAsideIfWrongKind(eaDir.Get(), kCompanion);
+    const Json::Value problems = QIRA::FILEINDEX::QueueFileProblems(share_);
+    if (problems.isMember("queue")) SetAside(eaDir.Get(), kQueue, problems["queue"].asString());
+    if (problems.isMember("companion")) SetAside(eaDir.Get(), kCompanion, problems["companion"].asString());
     const tools::Fd queue(OpenIn(eaDir.Get(), kQueue, O_RDONLY));
     struct stat st;
     if (!queue.Valid() || fstat(queue.Get(), &st) != 0 || !IsPlainFile(st) || !LockWithin(queue.Get())) return;

@@ -41,7 +41,8 @@ public:
 
 private:
     tools::Fd OpenEaDir() const;
-    void SetAsideIfWrongKind(int eaDir, const char* name);
+    // Moves `name`, found to be `kind`, aside in "@eaDir"; logs it and marks the share.
+    void SetAside(int eaDir, const char* name, const std::string& kind);
     void Remove(int eaDir, const char* name, dev_t dev, ino_t ino);
 
     std::string share_;
