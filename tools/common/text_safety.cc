@@ -40,6 +40,7 @@ std::string EscapeOfControl(unsigned char c) {
 bool IsValidUtf8(const std::string& text) { return simdjson::validate_utf8(text.data(), text.size()); }
 
 std::string ValidUtf8(const std::string& text, const std::string& replacement) {
+    if (IsValidUtf8(text) && text.find('\0') == std::string::npos) return text;  // the usual case, in one pass
     std::string out;
     out.reserve(text.size());
     for (size_t i = 0; i < text.size();) {
