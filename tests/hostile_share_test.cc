@@ -156,6 +156,10 @@ TEST_F(HostileShareTest, AnIndexNotOursIsSetAsideAndRebuiltAndSearchSaysItIsDama
         {"a FIFO", [this] { ASSERT_EQ(mkfifo(IndexFile("music").c_str(), 0644), 0); }},
         {"a link to another share's index", [this] { ASSERT_EQ(symlink(IndexFile("photo").c_str(), IndexFile("music").c_str()), 0); }},
         {"a directory", [this] { MakeDir(IndexFile("music")); }},
+        {"a file for the database directory", [this] {
+             std::filesystem::remove_all(DbDir("music"));
+             testkit::WriteFile(DbDir("music"), "x");
+         }},
         {"a hard link to another share's index", [this] { ASSERT_EQ(link(IndexFile("photo").c_str(), IndexFile("music").c_str()), 0); }},
         {"garbage", [this] { testkit::WriteFile(IndexFile("music"), std::string(8192, 'x')); }},
         {"a cut database", [this, sql] {
@@ -172,7 +176,7 @@ TEST_F(HostileShareTest, AnIndexNotOursIsSetAsideAndRebuiltAndSearchSaysItIsDama
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.name);
-        std::filesystem::remove_all(DbDir("music"));
+        std::filesystem::remove_all(music_ + "/@eaDir");
         MakeDir(DbDir("music"));
         ASSERT_TRUE(StatusMgr::ShareSetNeedReindex("music", false));
         c.plant();
@@ -186,7 +190,7 @@ TEST_F(HostileShareTest, AnIndexNotOursIsSetAsideAndRebuiltAndSearchSaysItIsDama
         testing::internal::CaptureStdout();
         EXPECT_TRUE(indexer.Apply({Record(2, music_ + "/a/one.txt")}, folders_));
         EXPECT_NE(testing::internal::GetCapturedStdout().find("set aside as"), std::string::npos);
-        EXPECT_EQ(CountNamed(DbDir("music"), "index.sqlite.set-aside."), 1u);
+        EXPECT_EQ(CountNamed(DbDir("music"), "index.sqlite.set-aside.") + CountNamed(music_ + "/@eaDir", "QIRA@.fileindexdb.set-aside."), 1u);
         EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
         EXPECT_EQ(Indexed("music"), Paths{"/music/a/one.txt"});
         EXPECT_EQ(testkit::ReadFile(IndexFile("photo")), photoIndex);

@@ -323,13 +323,12 @@ std::string SearchIndex::SetAside(const std::string& shareDir) {
     if (!base.Valid()) return "";
     const Fd dir(OpenBeneath(base.Get(), kDirName, O_RDONLY | O_DIRECTORY));
     if (!dir.Valid()) {
+        if (errno == ENOENT) return "";  // nothing to move
         // The database directory itself is of the wrong kind: move it aside in "@eaDir".
         const Fd eaDir(OpenBeneath(base.Get(), "@eaDir", O_RDONLY | O_DIRECTORY));
         const std::string name = NameOf(kDirName);
         const std::string aside = SetAsideName(name);
-        if (!eaDir.Valid() || errno == ENOENT || renameat(eaDir.Get(), name.c_str(), eaDir.Get(), aside.c_str()) != 0) {
-            return "";
-        }
+        if (!eaDir.Valid() || renameat(eaDir.Get(), name.c_str(), eaDir.Get(), aside.c_str()) != 0) return "";
         return real + "/@eaDir/" + aside;
     }
     const std::string aside = SetAsideName(kFileName);
