@@ -197,6 +197,27 @@ TEST_F(HostileShareTest, AnIndexNotOursIsSetAsideAndRebuiltAndSearchSaysItIsDama
     }
 }
 
+// Corruption met after the checks fails the batch, sets the index aside and marks the share; the
+// next batch starts a new index.
+TEST_F(HostileShareTest, CorruptionMetLaterSetsTheIndexAsideAndMarksTheShare) {
+    testkit::WriteFile(music_ + "/a/one.txt", "good");
+    ASSERT_TRUE(fileindexd_ref::ShareIndexer("music", &stop_).Reindex(folders_));
+    sqlite3* db = nullptr;
+    ASSERT_EQ(sqlite3_open(IndexFile("music").c_str(), &db), SQLITE_OK);
+    ASSERT_EQ(sqlite3_exec(db, "PRAGMA wal_checkpoint(TRUNCATE); PRAGMA journal_mode=DELETE;", nullptr, nullptr, nullptr), SQLITE_OK);
+    sqlite3_close(db);
+    const std::string text = testkit::ReadFile(IndexFile("music"));
+    testkit::WriteFile(IndexFile("music"), text.substr(0, 4096) + std::string(text.size() - 4096, '\x7f'));  // all but the schema
+    fileindexd_ref::ShareIndexer later("music", &stop_);
+    testing::internal::CaptureStdout();
+    EXPECT_FALSE(later.Apply({Record(2, music_ + "/a/one.txt")}, folders_));
+    EXPECT_NE(testing::internal::GetCapturedStdout().find("the index turned out damaged; set aside as"), std::string::npos);
+    EXPECT_EQ(later.LastProblem(), tools::IndexProblem::Damaged);
+    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
+    EXPECT_TRUE(later.Apply({Record(2, music_ + "/a/one.txt")}, folders_));
+    EXPECT_EQ(Indexed("music"), Paths{"/music/a/one.txt"});
+}
+
 // A change applied as it happens and a walk keep the same entries out: recycle bin, snapshot,
 // hidden and system names at any level, links on the way, and what lies past the depth bound
 // (logged once).
