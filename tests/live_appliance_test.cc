@@ -149,6 +149,25 @@ TEST_F(LiveApplianceTest, AFloodInOneShareDoesNotHoldAnotherBack) {
     EXPECT_TRUE(Finds("served", Paths{"/photo/a/found.txt"}));
 }
 
+// SIGTERM stops the daemon amid a flood rather than after draining it.
+TEST_F(LiveApplianceTest, TheDaemonStopsAmidAFlood) {
+    Index("/music/a", R"("document": true)");
+    ASSERT_TRUE(StatusMgr::Pause(0));
+    ASSERT_TRUE(testkit::WaitFor([&] { return Logged(daemonLog_, "\"type\":\"pause\""); }));
+    std::string flood;
+    for (int i = 0; i < 200000; ++i) flood += "{\"event\":2,\"path\":\"" + music_ + "/a/gone" + std::to_string(i) + ".txt\"}\n";
+    testkit::WriteFile(QueueOf("music"), testkit::ReadFile(QueueOf("music")) + flood);
+    const size_t before = testkit::ReadFile(daemonLog_).size();
+    ASSERT_TRUE(StatusMgr::Resume());
+    ASSERT_TRUE(testkit::WaitFor([&] { return testkit::RecordsApplied(testkit::ReadFile(daemonLog_).substr(before), "music") > 0; }));
+    EXPECT_EQ(testkit::Stop(indexer_), 0);
+    const std::string log = testkit::ReadFile(daemonLog_).substr(before);
+    EXPECT_LT(testkit::RecordsApplied(log, "music"), 200000u);
+    EXPECT_NE(log.find("fileindexd-ref: stopped"), std::string::npos);
+    indexer_ = testkit::Start({FILEINDEXD_REF, "--interval", "20"}, Path("/daemon2.log"));  // for the tear-down
+    ASSERT_TRUE(testkit::WaitFor([&] { return Logged(Path("/daemon2.log"), "listening on"); }));
+}
+
 // Changes the kernel dropped are recovered by reindex records for every registered folder.
 TEST_F(LiveApplianceTest, AnOverflowLeadsToReindexRecordsAndACompleteIndexAgain) {
     Index("/music/a", R"("document": true)");
