@@ -79,6 +79,17 @@ protected:
         for (const auto& entry : stored) paths.insert(entry.first);
         return paths;
     }
+    // The share paths a search of `query` finds in the share's index.
+    Paths Found(const std::string& share, const std::string& query) {
+        tools::IndexProblem problem;
+        std::string error;
+        std::vector<tools::SearchHit> hits;
+        const auto index = tools::SearchIndex::Open(ShareDir(share), false, problem, error);
+        if (!index || !index->Search(query, "", 100, hits, error)) return {"(failed: " + error + ")"};
+        Paths paths;
+        for (const auto& hit : hits) paths.insert(hit.path);
+        return paths;
+    }
     std::string DbDir(const std::string& share) { return ShareDir(share) + "/@eaDir/QIRA@.fileindexdb"; }
     std::string IndexFile(const std::string& share) { return DbDir(share) + "/index.sqlite"; }
     // Names in `dir` starting with `prefix`.
@@ -332,12 +343,27 @@ TEST_F(HostileShareTest, RecordsForOnePathAreAppliedOncePerBatch) {
     const timespec times[2] = {st.st_atim, st.st_mtim};
     ASSERT_EQ(utimensat(AT_FDCWD, big.c_str(), times, 0), 0);
     ASSERT_TRUE(indexer.Apply({Record(4, big), Record(2, big)}, folders_));
-    tools::IndexProblem problem;
-    std::string error;
-    std::vector<tools::SearchHit> hits;
-    const auto index = tools::SearchIndex::Open(music_, false, problem, error);
-    ASSERT_TRUE(index && index->Search("after", "", 10, hits, error)) << error;
-    EXPECT_EQ(hits.size(), 1u);
+    EXPECT_EQ(Found("music", "after"), Paths{"/music/a/big.txt"});
+}
+
+// A path's entries are those at it or beneath it on a slash boundary: moving or removing
+// /music/a/live leaves /music/a/live.txt and /music/a/live-2023 alone, and what moved is found by
+// its new path, not its old one.
+TEST_F(HostileShareTest, MovesAndRemovalsKeepToTheirPathAndRenameTheText) {
+    MakeDir(music_ + "/a/live");
+    MakeDir(music_ + "/a/live-2023");
+    for (const std::string file : {"/a/live/x.txt", "/a/live.txt", "/a/live-2023/y.txt"}) testkit::WriteFile(music_ + file, "text");
+    fileindexd_ref::ShareIndexer indexer("music", &stop_);
+    ASSERT_TRUE(indexer.Reindex(folders_));
+    ASSERT_EQ(rename((music_ + "/a/live").c_str(), (music_ + "/a/gone").c_str()), 0);
+    ASSERT_TRUE(indexer.Apply({Record(256, music_ + "/a/gone", music_ + "/a/live")}, folders_));
+    EXPECT_EQ(Indexed("music"), (Paths{"/music/a/gone/x.txt", "/music/a/live-2023/y.txt", "/music/a/live.txt"}));
+    EXPECT_EQ(Found("music", "gone"), Paths{"/music/a/gone/x.txt"});
+    EXPECT_EQ(Found("music", "live"), (Paths{"/music/a/live-2023/y.txt", "/music/a/live.txt"}));
+    ASSERT_EQ(rename((music_ + "/a/gone/x.txt").c_str(), (music_ + "/a/live.txt.bak").c_str()), 0);
+    ASSERT_EQ(rmdir((music_ + "/a/gone").c_str()), 0);
+    ASSERT_TRUE(indexer.Apply({Record(8, music_ + "/a/gone"), Record(1, music_ + "/a/live.txt.bak")}, folders_));
+    EXPECT_EQ(Indexed("music"), (Paths{"/music/a/live-2023/y.txt", "/music/a/live.txt"}));  // ".bak" is no known type
 }
 
 // Names are shown as their bytes, never acted on: the table escapes them as ls does, JSON carries
