@@ -226,4 +226,70 @@ TEST_F(LiveApplianceTest, SearchFindsPrefixesWithoutAccentsBestFirst) {
     EXPECT_EQ(testkit::Stop(web), 0);
 }
 
+// The notification stand-in alone: the records it appends, read from the queues before any
+// daemon takes them.
+class NotifierTest : public testkit::IndexFixture {
+protected:
+    void SetUp() override {
+        IndexFixture::SetUp();
+        log_ = Path("/notifier.log");
+        notifier_ = testkit::Start({QIRANOTIFYD_SIM}, log_);
+        ASSERT_TRUE(testkit::WaitFor([&] { return testkit::ReadFile(log_).find("ready") != std::string::npos; }));
+    }
+    void TearDown() override {
+        EXPECT_EQ(testkit::Stop(notifier_), 0) << testkit::ReadFile(log_);
+        IndexFixture::TearDown();
+    }
+    void Watch(const std::string& path, const std::string& fullPath) {
+        ASSERT_TRUE(IndexMgr::Upsert(J(R"([{"path": ")" + path + R"(", "document": true}])")));
+        ASSERT_TRUE(testkit::WaitFor([&] { return testkit::ReadFile(log_).find("watching " + fullPath + " (") != std::string::npos; }));
+    }
+    // The queue's records as "event path [path_old]".
+    std::vector<std::string> Records(const std::string& share) {
+        std::vector<std::string> records;
+        for (const auto& record : Queue(share)) {
+            records.push_back(std::to_string(record["event"].asUInt()) + " " + record["path"].asString() +
+                              (record.isMember("path_old") ? " " + record["path_old"].asString() : ""));
+        }
+        return records;
+    }
+    bool Holds(const std::string& share, const std::string& record) {
+        const auto records = Records(share);
+        return std::find(records.begin(), records.end(), record) != records.end();
+    }
+    std::string log_;
+    pid_t notifier_ = -1;
+};
+
+// A move inside one queue's tree is one record with its old path; a move to another share's queue
+// is a deletion in one and a creation in the other; a directory made later is watched; names on
+// the ignore list are never reported, whenever they appear.
+TEST_F(NotifierTest, MovesCarryTheirOldPathLaterDirectoriesAreWatchedIgnoredNamesNeverReported) {
+    Watch("/music/a", music_ + "/a");
+    Watch("/photo/a", photo_ + "/a");
+    testkit::WriteFile(music_ + "/a/f.txt", "x");
+    ASSERT_EQ(rename((music_ + "/a/f.txt").c_str(), (music_ + "/a/g.txt").c_str()), 0);
+    ASSERT_EQ(rename((music_ + "/a/g.txt").c_str(), (photo_ + "/a/g.txt").c_str()), 0);
+    MakeDir(music_ + "/a/@eaDir/inner");
+    testkit::WriteFile(music_ + "/a/@eaDir/inner/hidden.txt", "x");
+    MakeDir(music_ + "/a/later");
+    ASSERT_TRUE(testkit::WaitFor([&] { return Holds("music", "1 " + music_ + "/a/later"); }));  // watched by now
+    testkit::WriteFile(music_ + "/a/later/h.txt", "x");
+    testkit::WriteFile(music_ + "/a/sentinel.txt", "x");
+    testkit::WriteFile(photo_ + "/a/sentinel.txt", "x");  // each queue's last record: what came before is there
+    ASSERT_TRUE(testkit::WaitFor([&] { return Holds("music", "2 " + music_ + "/a/sentinel.txt") && Holds("photo", "2 " + photo_ + "/a/sentinel.txt"); }));
+    EXPECT_TRUE(Holds("photo", "1 " + photo_ + "/a/g.txt"));
+    EXPECT_TRUE(Holds("music", "256 " + music_ + "/a/g.txt " + music_ + "/a/f.txt"));
+    EXPECT_FALSE(Holds("music", "8 " + music_ + "/a/f.txt"));
+    EXPECT_FALSE(Holds("music", "1 " + music_ + "/a/g.txt"));
+    EXPECT_TRUE(Holds("music", "8 " + music_ + "/a/g.txt"));
+    EXPECT_TRUE(Holds("music", "2 " + music_ + "/a/later/h.txt"));
+    for (const auto& share : {"music", "photo"}) {
+        for (const auto& record : Records(share)) {
+            EXPECT_EQ(record.find("@eaDir"), std::string::npos) << record;
+            EXPECT_EQ(record.rfind("256 ", 0) == 0 && share == std::string("photo"), false) << record;
+        }
+    }
+}
+
 }  // namespace
