@@ -43,6 +43,15 @@ protected:
         for (const auto& hit : answer["result"]["hits"]) paths.push_back(hit["path"].asString());
         return paths;
     }
+    // Pauses the daemon and queues `count` records of files missing from /music/a behind the
+    // music share's queue.
+    void PauseAndQueueFlood(int count) {
+        ASSERT_TRUE(StatusMgr::Pause(0));
+        ASSERT_TRUE(testkit::WaitFor([&] { return Logged(daemonLog_, "\"type\":\"pause\""); }));
+        std::string flood;
+        for (int i = 0; i < count; ++i) flood += "{\"event\":2,\"path\":\"" + music_ + "/a/gone" + std::to_string(i) + ".txt\"}\n";
+        testkit::WriteFile(QueueOf("music"), testkit::ReadFile(QueueOf("music")) + flood);
+    }
     // Waits until the search finds exactly `paths`, in any order.
     bool Finds(const std::string& query, std::vector<std::string> paths) {
         std::sort(paths.begin(), paths.end());
@@ -132,11 +141,7 @@ TEST_F(LiveApplianceTest, ALinkedEaDirLeadsNoRecordIntoAnotherSharesQueue) {
 TEST_F(LiveApplianceTest, AFloodInOneShareDoesNotHoldAnotherBack) {
     Index("/music/a", R"("document": true)");
     Index("/photo/a", R"("document": true)");
-    ASSERT_TRUE(StatusMgr::Pause(0));
-    ASSERT_TRUE(testkit::WaitFor([&] { return Logged(daemonLog_, "\"type\":\"pause\""); }));
-    std::string flood;
-    for (int i = 0; i < 50000; ++i) flood += "{\"event\":2,\"path\":\"" + music_ + "/a/gone" + std::to_string(i) + ".txt\"}\n";
-    testkit::WriteFile(QueueOf("music"), testkit::ReadFile(QueueOf("music")) + flood);
+    PauseAndQueueFlood(50000);
     testkit::WriteFile(photo_ + "/a/found.txt", "served");
     ASSERT_TRUE(testkit::WaitFor([&] { return testkit::ReadFile(QueueOf("photo")).find("found.txt") != std::string::npos; }));
     const size_t before = testkit::ReadFile(daemonLog_).size();
@@ -152,11 +157,7 @@ TEST_F(LiveApplianceTest, AFloodInOneShareDoesNotHoldAnotherBack) {
 // SIGTERM stops the daemon amid a flood rather than after draining it.
 TEST_F(LiveApplianceTest, TheDaemonStopsAmidAFlood) {
     Index("/music/a", R"("document": true)");
-    ASSERT_TRUE(StatusMgr::Pause(0));
-    ASSERT_TRUE(testkit::WaitFor([&] { return Logged(daemonLog_, "\"type\":\"pause\""); }));
-    std::string flood;
-    for (int i = 0; i < 200000; ++i) flood += "{\"event\":2,\"path\":\"" + music_ + "/a/gone" + std::to_string(i) + ".txt\"}\n";
-    testkit::WriteFile(QueueOf("music"), testkit::ReadFile(QueueOf("music")) + flood);
+    PauseAndQueueFlood(200000);
     const size_t before = testkit::ReadFile(daemonLog_).size();
     ASSERT_TRUE(StatusMgr::Resume());
     ASSERT_TRUE(testkit::WaitFor([&] { return testkit::RecordsApplied(testkit::ReadFile(daemonLog_).substr(before), "music") > 0; }));
