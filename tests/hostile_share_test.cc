@@ -408,8 +408,9 @@ TEST_F(HostileShareTest, NamesWithControlCharactersAndBrokenUtf8AreShownSafely) 
     EXPECT_EQ(raw, (std::set<std::string>{"/music/a/a\nb.txt", "/music/a/\x1b[31mred.txt", "/music/a/caf\xe9.txt"}));
 }
 
-// A query is bounded in bytes and words, each bound held exactly; the CLI names the bound.
-TEST_F(HostileShareTest, QueriesAreBoundedInBytesAndWords) {
+// A query is bounded in bytes and words, each bound held exactly, the CLI naming the bound; the
+// number of hits is bounded over the whole answer.
+TEST_F(HostileShareTest, QueriesAreBoundedInBytesWordsAndHits) {
     const auto words = [](size_t n) {
         std::string query;
         for (size_t i = 0; i < n; ++i) query += "w ";
@@ -423,6 +424,15 @@ TEST_F(HostileShareTest, QueriesAreBoundedInBytesAndWords) {
     const auto refused = testkit::Run({FILEINDEXCTL, "search", words(tools::kMaxQueryWords + 1)});
     EXPECT_EQ(refused.status, 2);
     EXPECT_NE(refused.err.find("the query has more than 32 words"), std::string::npos) << refused.err;
+    // The limit holds over the whole answer, not per share.
+    for (const auto& dir : {music_, photo_}) {
+        for (const char* name : {"/a/1.txt", "/a/2.txt", "/a/3.txt"}) testkit::WriteFile(dir + name, "needle");
+    }
+    for (const auto& share : {"music", "photo"}) ASSERT_TRUE(fileindexd_ref::ShareIndexer(share, &stop_).Reindex(folders_));
+    for (const auto& [limit, hits] : {std::pair{"4", 4u}, {"6", 6u}, {"1000", 6u}}) {
+        const Json::Value answer = testkit::ParseJson(testkit::Run({FILEINDEXCTL, "--json", "search", "needle", "--limit", limit}).out);
+        EXPECT_EQ(answer["result"]["hits"].size(), hits) << limit;
+    }
 }
 
 // The CLI reads a share's index only where its user may read the share's directory.
