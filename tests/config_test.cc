@@ -100,7 +100,7 @@ TEST_F(ConfigTest, LocksConflictPerConfigurationAndAreFreeAfterUnlock) {
     EXPECT_TRUE(testkit::Exists(Path("/tmp/fileidx_cfg_status.lock")));
 }
 
-TEST_F(ConfigTest, LockRefusesASymbolicLinkOrANonRegularLockFile) {
+TEST_F(ConfigTest, LockRefusesASymbolicLinkADirectoryOrAFifoAsTheLockFile) {
     const std::string canary = Path("/canary");
     testkit::WriteFile(canary, "keep");
     ASSERT_EQ(symlink(canary.c_str(), Path("/tmp/fileidx_cfg_folder.lock").c_str()), 0);
@@ -113,6 +113,12 @@ TEST_F(ConfigTest, LockRefusesASymbolicLinkOrANonRegularLockFile) {
     EXPECT_FALSE(status.Lock(true));
     status.Unlock();
     EXPECT_EQ(testkit::ReadFile(canary), "keep");
+    // A FIFO opens for reading and writing at once and takes a lock: only its kind refuses it.
+    ASSERT_EQ(unlink(Path("/tmp/fileidx_cfg_folder.lock").c_str()), 0);
+    ASSERT_EQ(mkfifo(Path("/tmp/fileidx_cfg_folder.lock").c_str(), 0644), 0);
+    Folders fifo;
+    EXPECT_FALSE(fifo.Lock(true));
+    fifo.Unlock();
 }
 
 TEST_F(ConfigTest, ReaderNeverSeesAPartialFileWhileAnotherProcessSaves) {
