@@ -11,7 +11,6 @@
 #include <cerrno>
 #include <climits>
 #include <cstdlib>
-#include <ctime>
 #include <mutex>
 #include <set>
 #include <sstream>
