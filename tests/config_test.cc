@@ -66,6 +66,38 @@ TEST_F(ConfigTest, SaveReplacesTheFileWithMode0644AndFailsWithErrorSevenWithoutI
     EXPECT_TRUE(Logged("Failed to save json to " + StatusConf()));
 }
 
+// At the file's own path a link or a FIFO is no configuration: nothing is read through it and
+// nothing blocks; the save puts a regular file there, removes the temporaries killed saves left
+// and keeps names that only look like one.
+TEST_F(ConfigTest, ALinkOrFifoAtTheConfigPathIsReadAsMissingAndSavingClearsStaleTemporaries) {
+    const std::string canary = Path("/canary.conf"), stale = FolderConf() + ".Ab12Cd";
+    testkit::WriteFile(canary, R"({"/music/a":{"path":"/music/a","name":"A"}})");
+    const std::vector<std::function<int()>> kinds = {
+        [&] { return symlink(canary.c_str(), FolderConf().c_str()); },
+        [&] { return mkfifo(FolderConf().c_str(), 0644); }};
+    for (const auto& make : kinds) {
+        unlink(FolderConf().c_str());
+        ASSERT_EQ(make(), 0);
+        for (const std::string& name : {stale, FolderConf() + ".Ab12C", FolderConf() + ".Ab12Cde", FolderConf() + ".Ab-12C"})
+            testkit::WriteFile(name, "left");
+        Folders folders;
+        ASSERT_TRUE(folders.Load());
+        EXPECT_EQ(folders.Count(), 0u);
+        ASSERT_TRUE(folders.Lock(true));
+        EXPECT_TRUE(folders.Save());
+        folders.Unlock();
+        struct stat st;
+        ASSERT_EQ(lstat(FolderConf().c_str(), &st), 0);
+        EXPECT_TRUE(S_ISREG(st.st_mode));
+        EXPECT_EQ(testkit::ReadFile(FolderConf()), "{}\n");
+        EXPECT_FALSE(testkit::Exists(stale));
+        EXPECT_EQ(testkit::ReadFile(FolderConf() + ".Ab12C") + testkit::ReadFile(FolderConf() + ".Ab12Cde") +
+                      testkit::ReadFile(FolderConf() + ".Ab-12C"),
+                  "leftleftleft");
+    }
+    EXPECT_EQ(testkit::ReadFile(canary), R"({"/music/a":{"path":"/music/a","name":"A"}})");
+}
+
 // A shared lock held by another process lets shared locks in and keeps an exclusive one out; each
 // configuration has its own lock file; two descriptors of one process conflict too; an unlock
 // without a lock does nothing and an unlocked file can be taken again.

@@ -136,12 +136,31 @@ TEST_F(HostileQueueTest, ALineOverTheLimitIsSkippedAndTheNextRecordRead) {
     // The reindex record after the line covers the events of the reindex and the upsert.
     EXPECT_EQ(static_cast<off_t>(testkit::ReadFile(queue_).size()), planted);
     EXPECT_FALSE(StatusMgr::ShareIsNeedReindex("music"));
-    // A line of exactly the limit is read and one byte more is not.
+    // A line of exactly the limit is read by every reader and written by the library, one byte
+    // more is neither.
     const std::string unclosed = record.substr(1, record.size() - 3);  // without its newlines and closing brace
+    Json::Value event(Json::objectValue);
+    event["event"] = 2;
+    event["path"] = music_ + "/a/x";
+    event["data"] = "";
+    const size_t eventFrame = toString(event).size();
     for (const size_t length : {detail::kMaxQueueLine, detail::kMaxQueueLine + 1}) {
         SCOPED_TRACE(length);
+        const bool fits = length == detail::kMaxQueueLine;
         testkit::WriteFile(queue_, unclosed + std::string(length - unclosed.size() - 1, ' ') + "}\n");
-        EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), length == detail::kMaxQueueLine ? "processing" : "finished");
+        EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), fits ? "processing" : "finished");
+        ASSERT_TRUE(ExplainPath("/music/a", explained));
+        EXPECT_EQ(explained["pending"]["queue"].asInt(), fits ? 1 : 0);
+        size_t records = 0, malformed = 0;
+        EXPECT_EQ(ReadQueueRecords(queue_, [&](const QueueRecordView&) { ++records; }, [&](off_t, size_t) { ++malformed; }),
+                  QueueReading::Read);
+        EXPECT_EQ(records, fits ? 1u : 0u);
+        EXPECT_EQ(malformed, fits ? 0u : 1u);
+        testkit::WriteFile(queue_, "");
+        event["data"] = std::string(length - eventFrame, 'd');
+        EXPECT_EQ(AddCustomEvent(2, music_ + "/a/x", event["data"]), fits);
+        EXPECT_EQ(testkit::ReadFile(queue_), fits ? toString(event) + "\n" : "");
+        EXPECT_EQ(StatusMgr::ShareIsNeedReindex("music"), !fits);
     }
 }
 

@@ -224,6 +224,7 @@ TEST_F(LiveApplianceTest, SearchFindsPrefixesWithoutAccentsBestFirst) {
     EXPECT_EQ(hit["snippet"], J(R"([{"text": "a ", "match": false}, {"text": "week", "match": true},
                                     {"text": " in crete", "match": false}])"));
     EXPECT_EQ(client.Get("/api/search?q=", token)->status, 400);
+    EXPECT_EQ(client.Get("/api/search?q=crete&share=nosuch", token)->status, 404);
     EXPECT_EQ(testkit::Stop(web), 0);
 }
 
@@ -262,6 +263,21 @@ protected:
     pid_t notifier_ = -1;
 };
 
+// A link in place of a queue is not written through: the folder's share is marked for a full
+// reindex instead.
+TEST_F(NotifierTest, ALinkedQueueIsNotWrittenThroughAndItsShareIsMarked) {
+    Watch("/music/a", music_ + "/a");
+    testkit::WriteFile(Path("/outside"), "");
+    unlink(QueueOf("music").c_str());
+    ASSERT_EQ(symlink(Path("/outside").c_str(), QueueOf("music").c_str()), 0);
+    testkit::WriteFile(music_ + "/a/f.txt", "x");
+    ASSERT_TRUE(testkit::WaitFor([&] {
+        return testkit::ReadFile(log_).find("its queue " + QueueOf("music") + " could not be written: marked for a full reindex the share of " +
+                                            music_ + "/a") != std::string::npos;
+    })) << testkit::ReadFile(log_);
+    EXPECT_EQ(testkit::ReadFile(Path("/outside")), "");
+}
+
 // A move inside one queue's tree is one record with its old path; a move to another share's queue
 // is a deletion in one and a creation in the other; a directory made later is watched; names on
 // the ignore list are never reported, whenever they appear.
@@ -275,7 +291,8 @@ TEST_F(NotifierTest, MovesCarryTheirOldPathLaterDirectoriesAreWatchedIgnoredName
     testkit::WriteFile(music_ + "/a/@eaDir/inner/hidden.txt", "x");
     MakeDir(music_ + "/a/later");
     ASSERT_TRUE(testkit::WaitFor([&] { return Holds("music", "1 " + music_ + "/a/later"); }));  // watched by now
-    testkit::WriteFile(music_ + "/a/later/h.txt", "x");
+    ASSERT_EQ(rename((music_ + "/a/later").c_str(), (music_ + "/a/moved").c_str()), 0);
+    testkit::WriteFile(music_ + "/a/moved/h.txt", "x");
     testkit::WriteFile(music_ + "/a/sentinel.txt", "x");
     testkit::WriteFile(photo_ + "/a/sentinel.txt", "x");  // each queue's last record: what came before is there
     ASSERT_TRUE(testkit::WaitFor([&] { return Holds("music", "2 " + music_ + "/a/sentinel.txt") && Holds("photo", "2 " + photo_ + "/a/sentinel.txt"); }));
@@ -284,7 +301,7 @@ TEST_F(NotifierTest, MovesCarryTheirOldPathLaterDirectoriesAreWatchedIgnoredName
     EXPECT_FALSE(Holds("music", "8 " + music_ + "/a/f.txt"));
     EXPECT_FALSE(Holds("music", "1 " + music_ + "/a/g.txt"));
     EXPECT_TRUE(Holds("music", "8 " + music_ + "/a/g.txt"));
-    EXPECT_TRUE(Holds("music", "2 " + music_ + "/a/later/h.txt"));
+    EXPECT_TRUE(Holds("music", "2 " + music_ + "/a/moved/h.txt"));
     for (const auto& share : {"music", "photo"}) {
         for (const auto& record : Records(share)) {
             EXPECT_EQ(record.find("@eaDir"), std::string::npos) << record;

@@ -21,6 +21,18 @@ std::vector<std::string> Corpus(const std::string& name) {
     return files;
 }
 
+class QueueRecordsTest : public testkit::Sandbox {};
+
+// A member given twice counts by its last value.
+TEST_F(QueueRecordsTest, AMemberGivenTwiceCountsByItsLastValue) {
+    testkit::WriteFile(Path("/queue"), "{\"path\":\"/a\",\"path\":\"/b\",\"event\":5}\n{\"event\":1,\"path\":\"/a\",\"event\":65536}\n"
+                                       "{\"event\":256,\"path\":\"/n\",\"path_old\":\"/x\",\"path_old\":\"/o\"}\n");
+    std::vector<std::string> seen;
+    const auto keep = [&](const QueueRecordView& r) { seen.push_back(std::to_string(r.event) + " " + r.path + " " + r.path_old); };
+    ASSERT_EQ(ReadQueueRecords(Path("/queue"), keep, [](off_t, size_t) {}), QueueReading::Read);
+    EXPECT_EQ(seen, (std::vector<std::string>{"5 /b ", "65536 /a ", "256 /n /o"}));
+}
+
 TEST(ReaderSamenessTest, QueueLinesReadTheSameBothWays) {
     detail::QueueRecordReader reader;
     const auto files = Corpus("queue_line");

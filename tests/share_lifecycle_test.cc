@@ -89,9 +89,11 @@ TEST_F(ShareLifecycleTest, PauseStopsTheConsumerFirstAndResumeStartsItLast) {
 }
 
 TEST_F(ShareLifecycleTest, CleanRemovesQueueFilesAndTheDatabaseTree) {
-    MakeDir(music_ + "/@eaDir/QIRA@.fileindexdb/deep/tree");
+    for (const char* dir : {"deep/tree", "deep/wide", "other/tree/below"}) MakeDir(music_ + "/@eaDir/QIRA@.fileindexdb/" + dir);
     testkit::WriteFile(QueueOf("music"), "x\n");
+    const size_t descriptors = testkit::OpenDescriptors();
     ASSERT_TRUE(IndexMgr::CleanShareIndexData("music"));
+    EXPECT_EQ(testkit::OpenDescriptors(), descriptors);  // none kept per directory removed
     EXPECT_FALSE(testkit::Exists(QueueOf("music")));
     EXPECT_FALSE(testkit::Exists(music_ + "/@eaDir/QIRA@.fileindexdb"));
     EXPECT_TRUE(testkit::Exists(music_ + "/@eaDir"));

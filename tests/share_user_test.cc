@@ -5,8 +5,6 @@
 #include <stdio.h>
 #include <sys/resource.h>
 
-#include <filesystem>
-
 #include "queue_file.h"
 
 namespace {
@@ -112,19 +110,15 @@ TEST_F(ShareUserTest, WritersFailWithErrorNineWhileALockIsHeldAndLeakNothing) {
         {"SetUpdated", true, [] { return StatusMgr::SetUpdated("m"); }},
         {"ShareRevive", true, [] { return StatusMgr::ShareRevive("music"); }},
     };
-    const auto openDescriptors = [] {
-        const auto fds = std::filesystem::directory_iterator("/proc/self/fd");
-        return std::distance(begin(fds), end(fds));
-    };
     for (const auto& [name, ofStatus, call] : writers) {
         SCOPED_TRACE(name);
         testkit::ChildHolding holder([ofStatus = ofStatus] { return ofStatus ? Status().Lock(true) : Folders().Lock(true); });
         ASSERT_TRUE(holder.Took());
         testkit::ClearError();
-        const auto descriptors = openDescriptors();
+        const auto descriptors = testkit::OpenDescriptors();
         EXPECT_FALSE(call());
         EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
-        EXPECT_EQ(openDescriptors(), descriptors);
+        EXPECT_EQ(testkit::OpenDescriptors(), descriptors);
         long long resume = 0;
         EXPECT_TRUE(StatusMgr::GetPauseInfo(resume) && resume == -1);
         EXPECT_TRUE(IndexMgr::IsPathIndexed("/music/a"));

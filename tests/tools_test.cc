@@ -194,6 +194,8 @@ TEST_F(ToolTest, ArgumentsTheLibraryWouldReadOtherwiseAreRefused) {
         {{"share", "need-reindex", "", "on"}, "a share name cannot be empty"},
         {{"service", "pause", "--hours", "600000"}, "a pause of 600000 hours would end after 2038-01-19 03:14:07 UTC"},
         {{"service", "pause", "--hours", "-3"}, "hours must be a whole number, 0 or more"},
+        {{"service", "pause", "--hours", "-4294967295"}, "hours must be a whole number, 0 or more"},
+        {{"service", "pause", "--hours", "4294967297"}, "a pause of 4294967297 hours would end after 2038-01-19 03:14:07 UTC"},
     };
     for (const auto& [args, message] : cases) {
         SCOPED_TRACE(testing::PrintToString(args));

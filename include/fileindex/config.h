@@ -31,8 +31,10 @@ public:
     virtual std::string GetLockPath() const = 0;
     virtual std::string GetPath() const = 0;
 
-    // Fills the body from GetPath(). A missing file is an empty configuration (true). An
-    // unreadable or invalid file: false, error 6, body as it was.
+    // Fills the body from GetPath(). A missing file is an empty configuration (true), and so is
+    // anything there that is not a regular file (a link, a FIFO): nothing is read through it and
+    // the next save puts a regular file in its place. An unreadable or invalid file: false,
+    // error 6, body as it was.
     bool LoadJson();
     // Replaces the file atomically (a temporary in the same directory, flushed, renamed, the
     // directory synced) with mode 0644, first removing temporaries that killed saves left. A

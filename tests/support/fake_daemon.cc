@@ -5,6 +5,7 @@
 #include <sys/un.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstring>
 #include <stdexcept>
 
@@ -16,7 +17,8 @@ int ListenUnix(const std::string& path, int backlog, int flags) {
     const int fd = socket(AF_UNIX, SOCK_STREAM | flags, 0);
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
-    std::strncpy(address.sun_path, path.c_str(), sizeof address.sun_path - 1);
+    // Linux binds a path filling sun_path without a NUL: a client must not reach it by cutting its own.
+    std::memcpy(address.sun_path, path.data(), std::min(path.size(), sizeof address.sun_path));
     if (fd >= 0 && (bind(fd, reinterpret_cast<sockaddr*>(&address), sizeof address) != 0 || listen(fd, backlog) != 0)) {
         close(fd);
         return -1;

@@ -71,6 +71,11 @@ Json::Value ParseJson(const std::string& text) {
 
 Json::Value J(const std::string& text) { return ParseJson(text); }
 
+size_t OpenDescriptors() {
+    const auto fds = std::filesystem::directory_iterator("/proc/self/fd");
+    return static_cast<size_t>(std::distance(begin(fds), end(fds)));
+}
+
 size_t CountOf(const std::string& text, const std::string& needle) {
     size_t count = 0;
     for (size_t at = text.find(needle); at != std::string::npos; at = text.find(needle, at + 1)) ++count;

@@ -38,6 +38,9 @@ bool Exists(const std::string& path);
 Json::Value ParseJson(const std::string& text);
 std::vector<Json::Value> ReadJsonLines(const std::string& path);
 
+// Descriptors this process has open now.
+size_t OpenDescriptors();
+
 // How often `needle` occurs in `text`.
 size_t CountOf(const std::string& text, const std::string& needle);
 
