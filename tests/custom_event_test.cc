@@ -26,10 +26,6 @@ TEST_F(CustomEventTest, FirstEventCreatesTheQueueWithOneWholeLine) {
     struct stat st;
     ASSERT_EQ(stat(QueueOf("s").c_str(), &st), 0);
     EXPECT_EQ(st.st_mode & 0022, 0u);
-    ASSERT_TRUE(AddCustomEvent(kEventReindex, dir_ + "/b", Json::Value()));
-    const auto records = testkit::ReadJsonLines(QueueOf("s"));
-    ASSERT_EQ(records.size(), 2u);
-    EXPECT_EQ(records[1], J("{\"event\": 65536, \"path\": \"" + dir_ + "/b\", \"data\": null}"));
 }
 
 // A pending reindex of exactly the path, in the queue or its companion, suppresses any event;

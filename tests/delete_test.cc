@@ -89,41 +89,31 @@ TEST_F(DeleteTest, BadRequestsChangeNothing) {
     }
 }
 
+// A step after the save fails: the folder stays deleted and the failure is logged.
 TEST_F(DeleteTest, FailuresAfterTheSaveAreReportedWithTheirMessages) {
-    Seed(R"({"/music/a": {}, "/music/b": {}})");
-    daemon_.reset();
-    EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a"])")));
-    EXPECT_TRUE(testkit::Logged("SendCammandToDaemon failed"));
-    EXPECT_FALSE(Conf().isMember("/music/a"));
-
-    daemon_ = std::make_unique<testkit::FakeDaemon>(QIRA::FILEINDEX::DaemonSocketPath());
-    Seed(R"({"/music/a": {}, "/music/b": {}})");
-    qira_sim::InjectFault("MonitorQueue::Upsert", 0x90);
-    EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a"])")));
-    EXPECT_TRUE(testkit::Logged("UpsertQIRANotifydCfg failed, share=music"));
-
-    qira_sim::ClearFaults();
-    Seed(R"({"/music/a": {}, "/photo/a": {}})");
-    qira_sim::InjectFault("MonitorQueue::Delete", 0x91);
-    EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a"])")));
-    EXPECT_TRUE(testkit::Logged("DeleteQIRANtifydCfg failed, share=music"));
-
-    qira_sim::ClearFaults();
-    Seed(R"({"/music/a": {}, "/music/b": {}})");
-    unlink(QueueOf("music").c_str());
-    MakeDir(QueueOf("music"));
-    EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a"])")));
-    EXPECT_TRUE(testkit::Logged("AddCustomEvent failed"));
-    EXPECT_TRUE(testkit::Logged("Update failed"));
-}
-
-TEST_F(DeleteTest, CleanupFailureKeepsTheMonitorQueue) {
-    Seed(R"({"/music/a": {}, "/photo/a": {}})");
-    // The share vanishes once the event's queue is known, before the clean-up asks for it again.
-    qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", {"QIRAEAMKDir", ""});
-    EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a"])")));
-    EXPECT_TRUE(testkit::Logged("CleanShareIndexData failed, share=music"));
-    EXPECT_EQ(qira_sim::Registrations().size(), 1u);
+    const char* both = R"({"/music/a": {}, "/music/b": {}})";
+    const char* alone = R"({"/music/a": {}, "/photo/a": {}})";  // the share's last folder
+    const std::vector<std::tuple<const char*, std::function<void()>, std::vector<std::string>>> cases = {
+        {both, [this] { daemon_.reset(); }, {"SendCammandToDaemon failed"}},
+        {both, [] { qira_sim::InjectFault("MonitorQueue::Upsert", 0x90); }, {"UpsertQIRANotifydCfg failed, share=music"}},
+        {alone, [] { qira_sim::InjectFault("MonitorQueue::Delete", 0x91); }, {"DeleteQIRANtifydCfg failed, share=music"}},
+        {both, [this] { unlink(QueueOf("music").c_str()); MakeDir(QueueOf("music")); }, {"AddCustomEvent failed", "Update failed"}},
+        // The share vanishes once the event's queue is known, before the clean-up asks for it again.
+        {alone, [] { qira_sim::InjectFault("QIRAShareGet", 0x0B00, "music", {"QIRAEAMKDir", ""}); },
+         {"CleanShareIndexData failed, share=music"}},
+    };
+    for (const auto& [conf, plant, logged] : cases) {
+        SCOPED_TRACE(logged[0]);
+        qira_sim::ClearFaults();
+        rmdir(QueueOf("music").c_str());
+        if (!daemon_) daemon_ = std::make_unique<testkit::FakeDaemon>(QIRA::FILEINDEX::DaemonSocketPath());
+        Seed(conf);
+        plant();
+        EXPECT_FALSE(IndexMgr::Delete(J(R"(["/music/a"])")));
+        for (const auto& line : logged) EXPECT_TRUE(testkit::Logged(line)) << line;
+        EXPECT_FALSE(Conf().isMember("/music/a"));
+    }
+    EXPECT_EQ(qira_sim::Registrations().size(), 1u);  // the failed clean-up kept the monitor queue
 }
 
 }  // namespace

@@ -68,7 +68,8 @@ TEST_F(ExplainTest, NamesTheRefusingRuleAndAgreesWithCanPathBeIndexed) {
         const Json::Value out = Explain(c.path);
         EXPECT_EQ(out["refused_by"], c.refusedBy);
         EXPECT_EQ(out["problem"].isNull() ? "" : out["problem"].asString().substr(0, c.problem.size()), c.problem);
-        EXPECT_EQ(out["indexable"].asBool(), CanPathBeIndexed(c.path) && c.refusedBy != "entry");
+        EXPECT_EQ(out["indexable"].asBool(), c.refusedBy.isNull());
+        EXPECT_EQ(CanPathBeIndexed(c.path), c.refusedBy.isNull() || c.refusedBy == "entry");
         std::string order, verdicts;  // every rule in its order, the daemon's entry rules last
         for (const auto& rule : out["rules"]) {
             order += rule["rule"].asString() + " ";

@@ -21,13 +21,12 @@ TEST_F(IndexabilityTest, SystemPreservedNamesSkippedFilesAndShareRules) {
         EXPECT_TRUE(IsSystemPreservedFileName(name)) << name;
     }
     EXPECT_FALSE(IsSystemPreservedFileName(".ds_store"));
-    EXPECT_TRUE(IsSkipIndex("name"));
-    EXPECT_TRUE(IsSkipIndex(dir_ + "/.DS_Store"));
-    EXPECT_TRUE(IsSkipIndex(dir_ + "/#recycle/f"));
-    EXPECT_TRUE(IsSkipIndex(dir_ + "/#snapshot/f"));
-    EXPECT_FALSE(IsSkipIndex(dir_ + "/a/#recycle/f"));  // not the share's recycle bin
-    EXPECT_FALSE(IsSkipIndex(dir_ + "/dir/file.txt"));
-    EXPECT_FALSE(IsSkipIndex("/not/in/a/share.txt"));  // unknown type: do not skip
+    // Not the share's recycle bin under /a; an unknown file system type does not skip.
+    for (const auto& [path, skipped] : {std::pair{std::string("name"), true}, {dir_ + "/.DS_Store", true}, {dir_ + "/#recycle/f", true},
+                                        {dir_ + "/#snapshot/f", true}, {dir_ + "/a/#recycle/f", false},
+                                        {dir_ + "/dir/file.txt", false}, {std::string("/not/in/a/share.txt"), false}}) {
+        EXPECT_EQ(IsSkipIndex(path), skipped) << path;
+    }
     qira_sim::InjectFault("QIRAGetFSType", 0x10);
     EXPECT_FALSE(IsSkipIndex(dir_ + "/dir/f"));
     qira_sim::ClearFaults();
@@ -98,10 +97,6 @@ TEST_F(IndexabilityTest, SpaceIsShortOnlyForTheTwoNoSpaceErrors) {
     EXPECT_FALSE(IsShareSpaceEnough("nosuch"));
     EXPECT_TRUE(testkit::Logged("QIRAShareGet failed, share=nosuch"));
 }
-
-}  // namespace
-
-namespace {
 
 // A record's path is taken only in canonical form beneath its share, each bound held exactly; the
 // entry rules refuse at the first component that fails, whatever lies after it.

@@ -84,7 +84,6 @@ TEST_F(StatusReportTest, MalformedLinesAreLoggedAndSkipped) {
     std::vector<std::string> expected;
     for (const auto& line : bad) expected.push_back("Malformed command: " + line);
     EXPECT_EQ(testkit::LogMessages(), expected);
-    EXPECT_EQ(testkit::LogLines()[0].source, "queue_readings.cc");
     testkit::ClearLog();  // once per process: asking again logs nothing, a new malformed line is logged
     EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "processing");
     EXPECT_TRUE(testkit::LogMessages().empty());
