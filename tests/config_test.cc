@@ -131,25 +131,23 @@ TEST_F(ConfigTest, LocksConflictPerConfigurationAndAreFreeAfterUnlock) {
     EXPECT_TRUE(testkit::Exists(Path("/tmp/fileidx_cfg_status.lock")));
 }
 
+// A link, a directory or a FIFO is never the lock file: a FIFO opens for reading and writing at
+// once and takes a lock, so only its kind refuses it.
 TEST_F(ConfigTest, LockRefusesASymbolicLinkADirectoryOrAFifoAsTheLockFile) {
-    const std::string canary = Path("/canary");
+    const std::string canary = Path("/canary"), lock = Path("/tmp/fileidx_cfg_folder.lock");
     testkit::WriteFile(canary, "keep");
-    ASSERT_EQ(symlink(canary.c_str(), Path("/tmp/fileidx_cfg_folder.lock").c_str()), 0);
-    Folders folders;
-    EXPECT_FALSE(folders.Lock(true));
-    folders.Unlock();
-    EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
-    mkdir(Path("/tmp/fileidx_cfg_status.lock").c_str(), 0755);
-    Status status;
-    EXPECT_FALSE(status.Lock(true));
-    status.Unlock();
+    for (const auto& plant : std::vector<std::function<int()>>{[&] { return symlink(canary.c_str(), lock.c_str()); },
+                                                               [&] { return mkdir(lock.c_str(), 0755); },
+                                                               [&] { return mkfifo(lock.c_str(), 0644); }}) {
+        remove(lock.c_str());
+        ASSERT_EQ(plant(), 0);
+        testkit::ClearError();
+        Folders folders;
+        EXPECT_FALSE(folders.Lock(true));
+        folders.Unlock();
+        EXPECT_EQ(ErrorHandler::GetError(), FILEINDEX_ERR_LOCK);
+    }
     EXPECT_EQ(testkit::ReadFile(canary), "keep");
-    // A FIFO opens for reading and writing at once and takes a lock: only its kind refuses it.
-    ASSERT_EQ(unlink(Path("/tmp/fileidx_cfg_folder.lock").c_str()), 0);
-    ASSERT_EQ(mkfifo(Path("/tmp/fileidx_cfg_folder.lock").c_str(), 0644), 0);
-    Folders fifo;
-    EXPECT_FALSE(fifo.Lock(true));
-    fifo.Unlock();
 }
 
 TEST_F(ConfigTest, ReaderNeverSeesAPartialFileWhileAnotherProcessSaves) {

@@ -68,37 +68,36 @@ protected:
         record.path_old = old;
         return record;
     }
-    // Every path in the share's index, read as a search reads it.
-    Paths Indexed(const std::string& share) {
+    // The share paths a search of `query` finds in the share's index; every path in it for "".
+    Paths Found(const std::string& share, const std::string& query = "") {
         tools::IndexProblem problem;
         std::string error;
         const auto index = tools::SearchIndex::Open(ShareDir(share), false, problem, error);
         std::map<std::string, std::pair<long long, long long>> stored;
-        if (!index || !index->Under("/" + share, stored)) return {"(unreadable: " + error + ")"};
+        std::vector<tools::SearchHit> hits;
+        if (!index || !(query.empty() ? index->Under("/" + share, stored) : index->Search(query, "", 100, hits, error))) {
+            return {"(failed: " + error + ")"};
+        }
         Paths paths;
         for (const auto& entry : stored) paths.insert(entry.first);
-        return paths;
-    }
-    // The share paths a search of `query` finds in the share's index.
-    Paths Found(const std::string& share, const std::string& query) {
-        tools::IndexProblem problem;
-        std::string error;
-        std::vector<tools::SearchHit> hits;
-        const auto index = tools::SearchIndex::Open(ShareDir(share), false, problem, error);
-        if (!index || !index->Search(query, "", 100, hits, error)) return {"(failed: " + error + ")"};
-        Paths paths;
         for (const auto& hit : hits) paths.insert(hit.path);
         return paths;
     }
     std::string DbDir(const std::string& share) { return ShareDir(share) + "/@eaDir/QIRA@.fileindexdb"; }
     std::string IndexFile(const std::string& share) { return DbDir(share) + "/index.sqlite"; }
+    // Builds the music share's index afresh and runs `statements` on it.
+    void IndexMusicAndRun(const char* statements) {
+        ASSERT_TRUE(fileindexd_ref::ShareIndexer("music", &stop_).Reindex(folders_));
+        sqlite3* db = nullptr;
+        ASSERT_EQ(sqlite3_open(IndexFile("music").c_str(), &db), SQLITE_OK);
+        EXPECT_EQ(sqlite3_exec(db, statements, nullptr, nullptr, nullptr), SQLITE_OK) << sqlite3_errmsg(db);
+        sqlite3_close(db);
+    }
     // Names in `dir` starting with `prefix`.
     static size_t CountNamed(const std::string& dir, const std::string& prefix) {
-        size_t count = 0;
-        DIR* listing = opendir(dir.c_str());
-        while (const dirent* entry = listing ? readdir(listing) : nullptr) count += std::string(entry->d_name).rfind(prefix, 0) == 0;
-        if (listing) closedir(listing);
-        return count;
+        std::error_code error;
+        const auto names = std::filesystem::directory_iterator(dir, error);
+        return std::count_if(begin(names), end(names), [&](const auto& e) { return e.path().filename().string().rfind(prefix, 0) == 0; });
     }
 
     std::vector<QIRA::FILEINDEX::Folder> folders_;
@@ -133,7 +132,7 @@ TEST_F(HostileShareTest, RecordsClimbingOutOfTheShareChangeNothingAndOpenNothing
                 testing::internal::CaptureStdout();
                 EXPECT_TRUE(indexer.Apply(batch, folders_));
                 const std::string log = testing::internal::GetCapturedStdout();
-                EXPECT_EQ(Indexed("music"), (Paths{"/music/a/one.txt", "/music/b/two.txt"}));
+                EXPECT_EQ(Found("music"), (Paths{"/music/a/one.txt", "/music/b/two.txt"}));
                 EXPECT_EQ(testkit::CountOf(log, "records refused"), 1u) << log;
                 EXPECT_EQ(watch.Opened(), std::vector<std::string>{});
             }
@@ -149,15 +148,7 @@ TEST_F(HostileShareTest, AnIndexNotOursIsSetAsideAndRebuiltAndSearchSaysItIsDama
     fileindexd_ref::ShareIndexer photo("photo", &stop_);
     ASSERT_TRUE(photo.Reindex(folders_));  // a real index elsewhere, to link to
     const std::string photoIndex = testkit::ReadFile(IndexFile("photo"));
-    const auto sql = [this](const char* statements) {
-        return [this, statements] {
-            ASSERT_TRUE(fileindexd_ref::ShareIndexer("music", &stop_).Reindex(folders_));
-            sqlite3* db = nullptr;
-            ASSERT_EQ(sqlite3_open(IndexFile("music").c_str(), &db), SQLITE_OK);
-            EXPECT_EQ(sqlite3_exec(db, statements, nullptr, nullptr, nullptr), SQLITE_OK) << sqlite3_errmsg(db);
-            sqlite3_close(db);
-        };
-    };
+    const auto sql = [this](const char* statements) { return [this, statements] { IndexMusicAndRun(statements); }; };
     struct Case {
         std::string name;
         std::function<void()> plant;
@@ -203,7 +194,7 @@ TEST_F(HostileShareTest, AnIndexNotOursIsSetAsideAndRebuiltAndSearchSaysItIsDama
         EXPECT_NE(testing::internal::GetCapturedStdout().find("set aside as"), std::string::npos);
         EXPECT_EQ(CountNamed(DbDir("music"), "index.sqlite.set-aside.") + CountNamed(music_ + "/@eaDir", "QIRA@.fileindexdb.set-aside."), 1u);
         EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
-        EXPECT_EQ(Indexed("music"), Paths{"/music/a/one.txt"});
+        EXPECT_EQ(Found("music"), Paths{"/music/a/one.txt"});
         EXPECT_EQ(testkit::ReadFile(IndexFile("photo")), photoIndex);
     }
 }
@@ -212,11 +203,7 @@ TEST_F(HostileShareTest, AnIndexNotOursIsSetAsideAndRebuiltAndSearchSaysItIsDama
 // next batch starts a new index.
 TEST_F(HostileShareTest, CorruptionMetLaterSetsTheIndexAsideAndMarksTheShare) {
     testkit::WriteFile(music_ + "/a/one.txt", "good");
-    ASSERT_TRUE(fileindexd_ref::ShareIndexer("music", &stop_).Reindex(folders_));
-    sqlite3* db = nullptr;
-    ASSERT_EQ(sqlite3_open(IndexFile("music").c_str(), &db), SQLITE_OK);
-    ASSERT_EQ(sqlite3_exec(db, "PRAGMA wal_checkpoint(TRUNCATE); PRAGMA journal_mode=DELETE;", nullptr, nullptr, nullptr), SQLITE_OK);
-    sqlite3_close(db);
+    IndexMusicAndRun("PRAGMA wal_checkpoint(TRUNCATE); PRAGMA journal_mode=DELETE;");
     const std::string text = testkit::ReadFile(IndexFile("music"));
     testkit::WriteFile(IndexFile("music"), text.substr(0, 4096) + std::string(text.size() - 4096, '\x7f'));  // all but the schema
     fileindexd_ref::ShareIndexer later("music", &stop_);
@@ -226,7 +213,7 @@ TEST_F(HostileShareTest, CorruptionMetLaterSetsTheIndexAsideAndMarksTheShare) {
     EXPECT_EQ(later.LastProblem(), tools::IndexProblem::Damaged);
     EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
     EXPECT_TRUE(later.Apply({Record(2, music_ + "/a/one.txt")}, folders_));
-    EXPECT_EQ(Indexed("music"), Paths{"/music/a/one.txt"});
+    EXPECT_EQ(Found("music"), Paths{"/music/a/one.txt"});
 }
 
 // A change applied as it happens and a walk keep the same entries out: recycle bin, snapshot,
@@ -259,9 +246,9 @@ TEST_F(HostileShareTest, LiveRecordsAndWalksGiveTheSameIndex) {
     fileindexd_ref::ShareIndexer indexer("music", &stop_);
     testing::internal::CaptureStdout();
     ASSERT_TRUE(indexer.Apply(batch, folders_));
-    EXPECT_EQ(Indexed("music"), expected);
+    EXPECT_EQ(Found("music"), expected);
     ASSERT_TRUE(indexer.Reindex(folders_));
-    EXPECT_EQ(Indexed("music"), expected);
+    EXPECT_EQ(Found("music"), expected);
     EXPECT_EQ(testkit::CountOf(testing::internal::GetCapturedStdout(), "holds entries too deep"), 1u);
 }
 
@@ -335,7 +322,7 @@ TEST_F(HostileShareTest, RecordsForOnePathAreAppliedOncePerBatch) {
     ASSERT_TRUE(indexer.Apply(batch, folders_));
     const auto opened = watch.Opened();
     EXPECT_EQ(std::count(opened.begin(), opened.end(), "big.txt"), 1) << opened.size();
-    EXPECT_EQ(Indexed("music"), Paths{"/music/a/big.txt"});  // deleted, then there again: kept
+    EXPECT_EQ(Found("music"), Paths{"/music/a/big.txt"});  // deleted, then there again: kept
 
     struct stat st;
     ASSERT_EQ(stat(big.c_str(), &st), 0);
@@ -357,13 +344,13 @@ TEST_F(HostileShareTest, MovesAndRemovalsKeepToTheirPathAndRenameTheText) {
     ASSERT_TRUE(indexer.Reindex(folders_));
     ASSERT_EQ(rename((music_ + "/a/live").c_str(), (music_ + "/a/gone").c_str()), 0);
     ASSERT_TRUE(indexer.Apply({Record(256, music_ + "/a/gone", music_ + "/a/live")}, folders_));
-    EXPECT_EQ(Indexed("music"), (Paths{"/music/a/gone/x.txt", "/music/a/live-2023/y.txt", "/music/a/live.txt"}));
+    EXPECT_EQ(Found("music"), (Paths{"/music/a/gone/x.txt", "/music/a/live-2023/y.txt", "/music/a/live.txt"}));
     EXPECT_EQ(Found("music", "gone"), Paths{"/music/a/gone/x.txt"});
     EXPECT_EQ(Found("music", "live"), (Paths{"/music/a/live-2023/y.txt", "/music/a/live.txt"}));
     ASSERT_EQ(rename((music_ + "/a/gone/x.txt").c_str(), (music_ + "/a/live.txt.bak").c_str()), 0);
     ASSERT_EQ(rmdir((music_ + "/a/gone").c_str()), 0);
     ASSERT_TRUE(indexer.Apply({Record(8, music_ + "/a/gone"), Record(1, music_ + "/a/live.txt.bak")}, folders_));
-    EXPECT_EQ(Indexed("music"), (Paths{"/music/a/live-2023/y.txt", "/music/a/live.txt"}));  // ".bak" is no known type
+    EXPECT_EQ(Found("music"), (Paths{"/music/a/live-2023/y.txt", "/music/a/live.txt"}));  // ".bak" is no known type
 }
 
 // Names are shown as their bytes, never acted on: the table escapes them as ls does, JSON carries
@@ -438,8 +425,7 @@ TEST_F(HostileShareTest, QueriesAreBoundedInBytesWordsAndHits) {
 // The CLI reads a share's index only where its user may read the share's directory.
 TEST_F(HostileShareTest, SearchReadsNoIndexOfAShareTheCallerCannotRead) {
     testkit::WriteFile(music_ + "/a/one.txt", "needle");
-    fileindexd_ref::ShareIndexer indexer("music", &stop_);
-    ASSERT_TRUE(indexer.Reindex(folders_));
+    ASSERT_TRUE(fileindexd_ref::ShareIndexer("music", &stop_).Reindex(folders_));
     ASSERT_EQ(chmod(root().c_str(), 0755), 0);
     for (const mode_t mode : {0700, 0711, 0744}) {  // neither listing nor entering is enough alone
         ASSERT_EQ(chmod(music_.c_str(), mode), 0);

@@ -112,15 +112,9 @@ TEST_F(ListingTest, OneReadingPerQueueGivesTheWordsOfAReadingPerFolderAndLogsOnc
         detail::ForgetQueueReadings();  // a reading per folder, from scratch
         EXPECT_EQ(folder["additional"]["status"].asString(), StatusMgr::GetFolderStatus(folder["path"].asString()));
     }
-    std::map<std::string, std::string> words;
-    for (const auto& folder : out["folder"]) words[folder["path"].asString()] = folder["additional"]["status"].asString();
-    EXPECT_EQ(words["/music/f1"], "processing");
-    EXPECT_EQ(words["/music/f1/x"], "processing");
-    EXPECT_EQ(words["/music/f3"], "processing");
-    EXPECT_EQ(words["/music/f33"], "finished");
-    EXPECT_EQ(words["/music/f5"], "processing");
-    EXPECT_EQ(words["/music/f2"], "finished");
-    EXPECT_EQ(words["/music/f7"], "processing");  // moved out of it
+    std::string words;  // f7 holds a record moved out of it
+    for (const auto& folder : out["folder"]) words += folder["path"].asString().substr(6) + " " + folder["additional"]["status"].asString()[0];
+    EXPECT_EQ(words, "/f0 f/f1 p/f1/x p/f2 f/f3 p/f33 f/f4 f/f5 p/f6 f/f7 p/f8 f/f9 f");
 }
 
 }  // namespace
