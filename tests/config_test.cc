@@ -55,9 +55,7 @@ TEST_F(ConfigTest, SaveReplacesTheFileWithMode0644AndFailsWithErrorSevenWithoutI
     status.Pause(0);
     ASSERT_TRUE(status.Save());
     EXPECT_EQ(testkit::ReadFile(StatusConf()), "{\"resume_time\":0}\n");
-    struct stat st;
-    ASSERT_EQ(stat(StatusConf().c_str(), &st), 0);
-    EXPECT_EQ(st.st_mode & 0777, 0644u);
+    EXPECT_EQ(testkit::ModeOf(StatusConf()), S_IFREG | 0644u);
     unlink(StatusConf().c_str());
     rmdir(Path("/usr/qira/etc/fileindex").c_str());
     EXPECT_FALSE(status.Save());
@@ -85,9 +83,7 @@ TEST_F(ConfigTest, ALinkOrFifoAtTheConfigPathIsReadAsMissingAndSavingClearsStale
         ASSERT_TRUE(folders.Lock(true));
         EXPECT_TRUE(folders.Save());
         folders.Unlock();
-        struct stat st;
-        ASSERT_EQ(lstat(FolderConf().c_str(), &st), 0);
-        EXPECT_TRUE(S_ISREG(st.st_mode));
+        EXPECT_TRUE(S_ISREG(testkit::ModeOf(FolderConf())));
         EXPECT_EQ(testkit::ReadFile(FolderConf()), "{}\n");
         EXPECT_FALSE(testkit::Exists(stale));
         EXPECT_EQ(testkit::ReadFile(FolderConf() + ".Ab12C") + testkit::ReadFile(FolderConf() + ".Ab12Cde") +

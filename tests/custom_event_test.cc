@@ -23,9 +23,7 @@ TEST_F(CustomEventTest, FirstEventCreatesTheQueueWithOneWholeLine) {
     ASSERT_TRUE(AddCustomEvent(kEventFolderSettingChanged, dir_ + "/a", J(R"({"audio": true})")));
     EXPECT_EQ(testkit::ReadFile(QueueOf("s")),
               "{\"data\":{\"audio\":true},\"event\":131072,\"path\":\"" + dir_ + "/a\"}\n");
-    struct stat st;
-    ASSERT_EQ(stat(QueueOf("s").c_str(), &st), 0);
-    EXPECT_EQ(st.st_mode & 0022, 0u);
+    EXPECT_EQ(testkit::ModeOf(QueueOf("s")) & (S_IFMT | 0022), S_IFREG);
 }
 
 // A pending reindex of exactly the path, in the queue or its companion, suppresses any event;
@@ -137,9 +135,7 @@ TEST_F(CustomEventTest, PendingReindexFollowsTheQueueAsItChanges) {
     testkit::WriteFile(queue, reindexOf(dir_ + "/other"));
     detail::PendingReindex pending({a});
     EXPECT_FALSE(pending.IsQueued(a, queue));
-    const int fd = open(queue.c_str(), O_WRONLY | O_APPEND);
-    ASSERT_EQ(write(fd, reindexOf(a).data(), reindexOf(a).size()), static_cast<ssize_t>(reindexOf(a).size()));
-    close(fd);
+    testkit::AppendFile(queue, reindexOf(a));
     EXPECT_TRUE(pending.IsQueued(a, queue));  // appended by another writer
     std::string same = reindexOf(dir_ + "/other") + reindexOf(dir_ + "/b");
     same.resize(testkit::ReadFile(queue).size(), ' ');

@@ -34,31 +34,26 @@ protected:
                                                        "{\"event\" 1,\"path\":\"/v\"}"};
         return kinds[random() % kinds.size()];
     }
-    void Append(const std::string& file, const std::string& text) {
-        const int fd = open(file.c_str(), O_WRONLY | O_CREAT | O_APPEND, 0644);
-        ASSERT_EQ(write(fd, text.data(), text.size()), static_cast<ssize_t>(text.size()));
-        close(fd);
-    }
     // One random change of the queue and its companion, as writers and the daemon make them.
     void Change(std::mt19937& random) {
         struct stat st;
         const bool queueExists = stat(queue_.c_str(), &st) == 0;
         switch (random() % 10) {
             case 0: case 1: case 2:
-                Append(queue_, Record(random) + "\n");
+                testkit::AppendFile(queue_, Record(random) + "\n");
                 break;
             case 3:
-                Append(queue_, Malformed(random) + "\n");
+                testkit::AppendFile(queue_, Malformed(random) + "\n");
                 break;
             case 4:  // a line written in two pieces: its first part now
-                Append(queue_, Record(random).substr(0, 20));
+                testkit::AppendFile(queue_, Record(random).substr(0, 20));
                 break;
             case 5:  // the daemon takes the queue
                 if (!queueExists) break;
                 if (!testkit::Exists(queue_ + ".tmp")) {
                     rename(queue_.c_str(), (queue_ + ".tmp").c_str());
                 } else {
-                    Append(queue_ + ".tmp", testkit::ReadFile(queue_));
+                    testkit::AppendFile(queue_ + ".tmp", testkit::ReadFile(queue_));
                     unlink(queue_.c_str());
                 }
                 break;
@@ -77,7 +72,7 @@ protected:
                 break;
             }
             default:
-                for (int i = 0; i < 30; ++i) Append(queue_, Record(random) + "\n");
+                for (int i = 0; i < 30; ++i) testkit::AppendFile(queue_, Record(random) + "\n");
         }
     }
     std::string dir_;
@@ -114,7 +109,7 @@ TEST_F(QueueReadingsTest, AReadingIsKeptPerFileAndFollowsItsRename) {
     EXPECT_EQ(answer.under, std::vector<unsigned long long>{1});
     ASSERT_EQ(rename(queue_.c_str(), (queue_ + ".tmp").c_str()), 0);
     testkit::ClearLog();
-    Append(queue_ + ".tmp", "junk\n");
+    testkit::AppendFile(queue_ + ".tmp", "junk\n");
     ASSERT_TRUE(detail::ReadQueue(queue_ + ".tmp", {a}, answer));  // the same file under its new name
     EXPECT_EQ(answer.lines, 2u);
     EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"Malformed command: junk"});
@@ -159,7 +154,7 @@ TEST_F(QueueReadingsTest, ALongQueueReadInTwoPartsLogsEachMalformedLineOnceInOrd
     ASSERT_GT(expected.size(), 2 * 16384u);
     EXPECT_EQ(testkit::LogMessages(), expected);
     testkit::ClearLog();
-    Append(queue_, "junk\n");
+    testkit::AppendFile(queue_, "junk\n");
     ASSERT_TRUE(detail::ReadQueue(queue_, asked, incremental));
     EXPECT_EQ(incremental.lines, full.lines + 1);
     EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"Malformed command: junk"});

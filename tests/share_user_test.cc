@@ -125,8 +125,7 @@ TEST_F(ShareUserTest, WritersFailWithErrorNineWhileALockIsHeldAndLeakNothing) {
     }
     EXPECT_EQ(testkit::ReadFile(FolderConf()), folders);
     EXPECT_EQ(testkit::ReadFile(StatusConf()), R"({"resume_time": -1})");
-    EXPECT_TRUE(qira_sim::Journal().empty());
-    EXPECT_TRUE(Messages().empty());
+    EXPECT_TRUE(NothingSent());
 }
 
 TEST_F(ShareUserTest, DaemonThatListensButNeverAcceptsFailsTheCallInsteadOfHanging) {

@@ -1,8 +1,6 @@
 // Status words of the service and of one folder.
 #include "testkit.h"
 
-#include <fstream>
-
 namespace {
 
 class StatusReportTest : public testkit::IndexFixture {
@@ -87,7 +85,7 @@ TEST_F(StatusReportTest, MalformedLinesAreLoggedAndSkipped) {
     testkit::ClearLog();  // once per process: asking again logs nothing, a new malformed line is logged
     EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "processing");
     EXPECT_TRUE(testkit::LogMessages().empty());
-    std::ofstream(QueueOf("music"), std::ios::app) << "late garbage\n";
+    testkit::AppendFile(QueueOf("music"), "late garbage\n");
     EXPECT_EQ(StatusMgr::GetFolderStatus("/music/a"), "processing");
     EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"Malformed command: late garbage"});
 }

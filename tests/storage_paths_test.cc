@@ -13,9 +13,7 @@ TEST_F(StoragePathsTest, PathsLieInTheSharesEaDirAndTheDatabaseIsCreated) {
     const std::string db = dir + "/@eaDir/QIRA@.fileindexdb";
     EXPECT_EQ(FILEIDXDBPathGet("music", buffer, sizeof buffer), static_cast<int>(db.size()));
     EXPECT_EQ(std::string(buffer), db);
-    struct stat st;
-    ASSERT_EQ(lstat(db.c_str(), &st), 0);
-    EXPECT_TRUE(S_ISDIR(st.st_mode));
+    EXPECT_TRUE(S_ISDIR(testkit::ModeOf(db)));
     const std::string queue = dir + "/@eaDir/QIRA@file_index_queue";
     EXPECT_EQ(FILEIDXQueuePathGet("music", buffer, sizeof buffer), static_cast<int>(queue.size()));
     EXPECT_EQ(std::string(buffer), queue);

@@ -31,6 +31,8 @@ protected:
     Json::Value Conf() { return Exists(FolderConf()) ? ParseJson(ReadFile(FolderConf())) : Json::Value(); }
     std::vector<Json::Value> Queue(const std::string& share) { return ReadJsonLines(QueueOf(share)); }
     std::vector<Json::Value> Messages() { return daemon_->Messages(); }
+    // No platform call was made and no command reached the daemon.
+    bool NothingSent() { return qira_sim::Journal().empty() && Messages().empty(); }
     // Forget what set-up steps did to the journal, the log and the daemon.
     void Settle() {
         qira_sim::ClearJournal();

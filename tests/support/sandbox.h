@@ -1,6 +1,8 @@
 // Test kit: a fresh simulated appliance under its own QIRA_ROOT for every test.
 #pragma once
 
+#include <sys/types.h>
+
 #include <string>
 #include <vector>
 
@@ -34,9 +36,14 @@ private:
 // Whole file content ("" when missing) and writing one.
 std::string ReadFile(const std::string& path);
 void WriteFile(const std::string& path, const std::string& content);
+// Appends with one write(2), as the queue's writers do.
+void AppendFile(const std::string& path, const std::string& content);
 bool Exists(const std::string& path);
 Json::Value ParseJson(const std::string& text);
 std::vector<Json::Value> ReadJsonLines(const std::string& path);
+
+// The mode of what lies at `path`, not following a link; 0 when nothing does.
+mode_t ModeOf(const std::string& path);
 
 // Descriptors this process has open now.
 size_t OpenDescriptors();
