@@ -270,30 +270,40 @@ TEST_F(NotifierTest, ALinkedQueueIsNotWrittenThroughAndItsShareIsMarked) {
     EXPECT_EQ(testkit::ReadFile(Path("/outside")), "");
 }
 
-// A move inside one queue's tree is one record with its old path; a move to another share's queue
-// is a deletion in one and a creation in the other; a directory made later is watched; names on
-// the ignore list are never reported, whenever they appear.
+// A move inside one queue's trees is one record with its old path, between two folders of the
+// share too; a move to another share's queue is a deletion in one and a creation in the other. A
+// directory made later is watched, and so are its own directories, under their new path once
+// moved; moving one out stops watching it alone, not a sibling sharing its prefix. Names on the
+// ignore list are never reported, whenever they appear.
 TEST_F(NotifierTest, MovesCarryTheirOldPathLaterDirectoriesAreWatchedIgnoredNamesNeverReported) {
-    Index("/music/a", R"("document": true)");
-    Index("/photo/a", R"("document": true)");
+    MakeDir(music_ + "/a/live");
+    MakeDir(music_ + "/a/live-2023");
+    for (const char* folder : {"/music/a", "/music/b", "/photo/a"}) Index(folder, R"("document": true)");
     testkit::WriteFile(music_ + "/a/f.txt", "x");
-    ASSERT_EQ(rename((music_ + "/a/f.txt").c_str(), (music_ + "/a/g.txt").c_str()), 0);
-    ASSERT_EQ(rename((music_ + "/a/g.txt").c_str(), (photo_ + "/a/g.txt").c_str()), 0);
+    for (const auto& [from, to] : std::vector<std::pair<std::string, std::string>>{
+             {music_ + "/a/f.txt", music_ + "/a/g.txt"}, {music_ + "/a/g.txt", music_ + "/b/g.txt"},
+             {music_ + "/b/g.txt", photo_ + "/a/g.txt"}, {music_ + "/a/live", music_ + "/c/live"}}) {
+        ASSERT_EQ(rename(from.c_str(), to.c_str()), 0) << from;
+    }
     MakeDir(music_ + "/a/@eaDir/inner");
     testkit::WriteFile(music_ + "/a/@eaDir/inner/hidden.txt", "x");
     MakeDir(music_ + "/a/later");
     ASSERT_TRUE(testkit::WaitFor([&] { return Holds("music", "1 " + music_ + "/a/later"); }));  // watched by now
+    MakeDir(music_ + "/a/later/sub");
+    ASSERT_TRUE(testkit::WaitFor([&] { return Holds("music", "1 " + music_ + "/a/later/sub"); }));
     ASSERT_EQ(rename((music_ + "/a/later").c_str(), (music_ + "/a/moved").c_str()), 0);
-    testkit::WriteFile(music_ + "/a/moved/h.txt", "x");
+    testkit::WriteFile(music_ + "/a/moved/sub/h.txt", "x");
+    testkit::WriteFile(music_ + "/a/live-2023/y.txt", "x");
     testkit::WriteFile(music_ + "/a/sentinel.txt", "x");
     testkit::WriteFile(photo_ + "/a/sentinel.txt", "x");  // each queue's last record: what came before is there
     ASSERT_TRUE(testkit::WaitFor([&] { return Holds("music", "2 " + music_ + "/a/sentinel.txt") && Holds("photo", "2 " + photo_ + "/a/sentinel.txt"); }));
     EXPECT_TRUE(Holds("photo", "1 " + photo_ + "/a/g.txt"));
-    EXPECT_TRUE(Holds("music", "256 " + music_ + "/a/g.txt " + music_ + "/a/f.txt"));
-    EXPECT_FALSE(Holds("music", "8 " + music_ + "/a/f.txt"));
-    EXPECT_FALSE(Holds("music", "1 " + music_ + "/a/g.txt"));
-    EXPECT_TRUE(Holds("music", "8 " + music_ + "/a/g.txt"));
-    EXPECT_TRUE(Holds("music", "2 " + music_ + "/a/moved/h.txt"));
+    const std::vector<std::pair<std::string, bool>> music = {
+        {"256 " + music_ + "/a/g.txt " + music_ + "/a/f.txt", true}, {"256 " + music_ + "/b/g.txt " + music_ + "/a/g.txt", true},
+        {"8 " + music_ + "/b/g.txt", true}, {"8 " + music_ + "/a/live", true}, {"2 " + music_ + "/a/moved/sub/h.txt", true},
+        {"2 " + music_ + "/a/live-2023/y.txt", true}, {"8 " + music_ + "/a/f.txt", false}, {"8 " + music_ + "/a/g.txt", false},
+        {"1 " + music_ + "/a/g.txt", false}, {"1 " + music_ + "/b/g.txt", false}};
+    for (const auto& [record, held] : music) EXPECT_EQ(Holds("music", record), held) << record;
     for (const auto& share : {"music", "photo"}) {
         for (const auto& record : Records(share)) {
             EXPECT_EQ(record.find("@eaDir"), std::string::npos) << record;
