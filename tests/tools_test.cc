@@ -295,20 +295,9 @@ TEST_F(ToolTest, ServiceStatusShowsPauseAndFlags) {
               std::string::npos);
 }
 
-// Descending pages follow each other as ascending ones do; a folder that cannot be indexed says
-// why, in the listing, in its status and when it is added.
-TEST_F(ToolTest, ListingPagesDescendingAndListingAndExplainTellWhyAFolderIsNotIndexable) {
+// A folder that cannot be indexed says why, in the listing, in its status and when it is added.
+TEST_F(ToolTest, ListingAndExplainTellWhyAFolderIsNotIndexable) {
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/b": {}, "/music/c": {}, "/photo/a": {}, "/music/gone": {}})");
-    const auto page = [&](std::vector<std::string> args) {
-        args.insert(args.begin(), {"--json", "folder", "list", "--desc", "--limit", "2"});
-        const Json::Value answer = testkit::ParseJson(Ctl(args).out);
-        std::vector<std::string> paths;
-        for (const auto& folder : answer["result"]["folder"]) paths.push_back(folder["path"].asString());
-        return paths;
-    };
-    EXPECT_EQ(page({}), (std::vector<std::string>{"/photo/a", "/music/gone"}));
-    EXPECT_EQ(page({"--offset", "2"}), (std::vector<std::string>{"/music/c", "/music/b"}));
-    EXPECT_EQ(page({"--offset", "4"}), (std::vector<std::string>{"/music/a"}));
     const auto listed = Lines(Ctl({"folder", "list", "--additional", "status"}).out);
     EXPECT_EQ(listed.at(3), "/music/c           no        no     no     no     finished");
     EXPECT_EQ(listed.at(4), "/music/gone        no        no     no     no     not indexable: canonical_path");

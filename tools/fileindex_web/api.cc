@@ -8,6 +8,7 @@
 #include "captured_log.h"
 #include "envelope.h"
 #include "fileindex/fileindex.h"
+#include "folder_page.h"
 #include "folder_view.h"
 #include "pause.h"
 #include "saved_files.h"
@@ -197,12 +198,8 @@ void AddApiRoutes(HttpServer& server, const std::string& token) {
             }
         }
         Run(res, "list folders", [&](Json::Value& result) {
-            if (!IndexMgr::List(result, Number(req, "offset", 0), Number(req, "limit", 50), Param(req, "sort_by", "path"),
-                                Param(req, "sort_direction", "ASC"), Additional(Param(req, "additional")))) {
-                return false;
-            }
-            tools::AddRefusingRules(result);
-            return true;
+            return tools::ListFolderPage(result, Number(req, "offset", 0), Number(req, "limit", 50), Param(req, "sort_by", "path"),
+                                         Param(req, "sort_direction", "ASC") == "DESC", Additional(Param(req, "additional")));
         });
     });
     server.Get("/api/folder", [](const Request& req, Response& res) {

@@ -1,5 +1,4 @@
 // folder list | get | add | set | delete | status, and reindex.
-#include <algorithm>
 #include <fstream>
 #include <iostream>
 #include <iterator>
@@ -7,6 +6,7 @@
 
 #include "commands.h"
 #include "fileindex/fileindex.h"
+#include "folder_page.h"
 #include "folder_view.h"
 #include "share_path_check.h"
 
@@ -32,31 +32,12 @@ Json::Value ResultOf(const Json::Value& request) {
     return result;
 }
 
-// The library pages DESC as its first records reversed; a descending page here is the ascending
-// page that ends `offset` records before the end, reversed, so that pages follow each other.
-bool FetchPage(Json::Value& out, unsigned long offset, unsigned long limit, const std::string& sortBy, bool descending,
-               const Json::Value& additional) {
-    if (!descending) return IndexMgr::List(out, offset, limit, sortBy, "ASC", additional);
-    Json::Value all;
-    if (!IndexMgr::List(all, 0, 0, sortBy, "ASC", additional)) return false;
-    const unsigned long total = all["total"].asUInt64();
-    const unsigned long end = offset < total ? total - offset : 0;
-    const unsigned long count = std::min(limit, end);
-    if (!IndexMgr::List(out, end - count, count, sortBy, "ASC", additional)) return false;
-    Json::Value reversed(Json::arrayValue);
-    for (auto i = out["folder"].size(); i-- > 0;) reversed.append(out["folder"][i]);
-    out["folder"] = reversed;
-    out["offset"] = static_cast<Json::UInt64>(offset);
-    return true;
-}
-
 int List(Context& ctx, unsigned long offset, unsigned long limit, const std::string& sortBy, bool descending,
          const std::vector<std::string>& additional) {
     Json::Value out;
-    if (!ctx.Attempt([&] { return FetchPage(out, offset, limit, sortBy, descending, StringArray(additional)); })) {
+    if (!ctx.Attempt([&] { return tools::ListFolderPage(out, offset, limit, sortBy, descending, StringArray(additional)); })) {
         return ctx.Fail("folder list");
     }
-    tools::AddRefusingRules(out);
     Table table;
     std::vector<std::string> header = {"PATH", "NAME", "DOCUMENT", "AUDIO", "VIDEO", "PHOTO"};
     for (const auto& key : additional) header.push_back(key == "is_valid" ? "VALID" : key == "status" ? "STATUS" : key);
