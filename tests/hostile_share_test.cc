@@ -411,14 +411,17 @@ TEST_F(HostileShareTest, QueriesAreBoundedInBytesWordsAndHits) {
     const auto refused = testkit::Run({FILEINDEXCTL, "search", words(tools::kMaxQueryWords + 1)});
     EXPECT_EQ(refused.status, 2);
     EXPECT_NE(refused.err.find("the query has more than 32 words"), std::string::npos) << refused.err;
-    // The limit holds over the whole answer, not per share.
+    // The limit holds over the whole answer, not per share, and keeps the best hits of all: a name
+    // in the second share ranks above every text.
     for (const auto& dir : {music_, photo_}) {
         for (const char* name : {"/a/1.txt", "/a/2.txt", "/a/3.txt"}) testkit::WriteFile(dir + name, "needle");
     }
+    testkit::WriteFile(photo_ + "/a/needle.txt", "");
     for (const auto& share : {"music", "photo"}) ASSERT_TRUE(fileindexd_ref::ShareIndexer(share, &stop_).Reindex(folders_));
-    for (const auto& [limit, hits] : {std::pair{"4", 4u}, {"6", 6u}, {"1000", 6u}}) {
+    for (const auto& [limit, hits] : {std::pair{"1", 1u}, {"4", 4u}, {"7", 7u}, {"1000", 7u}}) {
         const Json::Value answer = testkit::ParseJson(testkit::Run({FILEINDEXCTL, "--json", "search", "needle", "--limit", limit}).out);
         EXPECT_EQ(answer["result"]["hits"].size(), hits) << limit;
+        EXPECT_EQ(answer["result"]["hits"][0]["path"].asString(), "/photo/a/needle.txt");
     }
 }
 

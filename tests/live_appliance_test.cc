@@ -254,6 +254,9 @@ TEST_F(LiveApplianceTest, SearchFindsPrefixesWithoutAccentsBestFirst) {
                                     {"text": " in crete", "match": false}])"));
     EXPECT_EQ(client.Get("/api/search?q=", token)->status, 400);
     EXPECT_EQ(client.Get("/api/search?q=crete&share=nosuch", token)->status, 404);
+    for (int i = 0; i < 201; ++i) testkit::WriteFile(photo_ + "/a/many" + std::to_string(i) + ".jpg", "");
+    ASSERT_TRUE(testkit::WaitFor([&] { return Search({"many", "--limit", "1000"}).size() == 201; }));
+    EXPECT_EQ(testkit::ParseJson(client.Get("/api/search?q=many&limit=1000", token)->body)["result"]["hits"].size(), 200u);
     EXPECT_EQ(testkit::Stop(web), 0);
 }
 
