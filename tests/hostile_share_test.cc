@@ -308,6 +308,13 @@ TEST_F(HostileShareTest, QueueTakeNeverFollowsLinksSetsAsideWrongKindsAndLosesNo
     }
     EXPECT_EQ(first, std::vector<std::string>{music_ + "/a/0.txt"});  // the failed batch came again
     EXPECT_FALSE(testkit::Exists(QueueOf("music") + ".tmp"));
+    // A companion the library will not read (sparse) is removed unread, its share marked.
+    ASSERT_TRUE(StatusMgr::ShareSetNeedReindex("music", false));
+    testkit::WriteFile(QueueOf("music") + ".tmp", "");
+    ASSERT_EQ(truncate((QueueOf("music") + ".tmp").c_str(), 8 << 20), 0);
+    EXPECT_EQ(music.ApplyNext(1000, [](const Batch&) { return true; }), 0u);
+    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
+    EXPECT_FALSE(testkit::Exists(QueueOf("music") + ".tmp"));
 }
 
 // A flood of records for one file reads it once per batch; a record that asks for a fresh read
@@ -418,11 +425,32 @@ TEST_F(HostileShareTest, QueriesAreBoundedInBytesWordsAndHits) {
     }
     testkit::WriteFile(photo_ + "/a/needle.txt", "");
     for (const auto& share : {"music", "photo"}) ASSERT_TRUE(fileindexd_ref::ShareIndexer(share, &stop_).Reindex(folders_));
+    const auto search = [](const std::vector<std::string>& page) {
+        std::vector<std::string> args = {FILEINDEXCTL, "--json", "search", "needle"};
+        args.insert(args.end(), page.begin(), page.end());
+        return testkit::ParseJson(testkit::Run(args).out)["result"];
+    };
     for (const auto& [limit, hits] : {std::pair{"1", 1u}, {"4", 4u}, {"7", 7u}, {"1000", 7u}}) {
-        const Json::Value answer = testkit::ParseJson(testkit::Run({FILEINDEXCTL, "--json", "search", "needle", "--limit", limit}).out);
-        EXPECT_EQ(answer["result"]["hits"].size(), hits) << limit;
-        EXPECT_EQ(answer["result"]["hits"][0]["path"].asString(), "/photo/a/needle.txt");
+        const Json::Value answer = search({"--limit", limit});
+        EXPECT_EQ(answer["hits"].size(), hits) << limit;
+        EXPECT_EQ(answer["total"].asInt(), 7);
+        EXPECT_EQ(answer["hits"][0]["path"].asString(), "/photo/a/needle.txt");
     }
+    // Pages follow each other: three of three hits and one of one cover the whole answer once.
+    Json::Value all = search({"--limit", "7"})["hits"], paged(Json::arrayValue);
+    for (const char* offset : {"0", "3", "6"}) {
+        const Json::Value page = search({"--limit", "3", "--offset", offset});
+        for (const auto& hit : page["hits"]) paged.append(hit);
+    }
+    EXPECT_EQ(paged, all);
+    for (const auto& [page, footer] : std::vector<std::pair<std::vector<std::string>, std::string>>{
+             {{"--limit", "7"}, "(7 found)"}, {{"--limit", "3", "--offset", "3"}, "(4-6 of 7; --offset 6 for more)"},
+             {{"--offset", "6"}, "(7-7 of 7)"}, {{"--offset", "7"}, "(none from 8 on; 7 found)"}}) {
+        std::vector<std::string> args = {FILEINDEXCTL, "search", "needle"};
+        args.insert(args.end(), page.begin(), page.end());
+        EXPECT_NE(testkit::Run(args).out.find("\n" + footer + "\n"), std::string::npos) << footer;
+    }
+    EXPECT_EQ(testkit::Run({FILEINDEXCTL, "search", "needle", "--offset", "10001"}).status, 2);
 }
 
 // The CLI reads a share's index only where its user may read the share's directory.

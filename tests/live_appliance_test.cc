@@ -256,7 +256,11 @@ TEST_F(LiveApplianceTest, SearchFindsPrefixesWithoutAccentsBestFirst) {
     EXPECT_EQ(client.Get("/api/search?q=crete&share=nosuch", token)->status, 404);
     for (int i = 0; i < 201; ++i) testkit::WriteFile(photo_ + "/a/many" + std::to_string(i) + ".jpg", "");
     ASSERT_TRUE(testkit::WaitFor([&] { return Search({"many", "--limit", "1000"}).size() == 201; }));
-    EXPECT_EQ(testkit::ParseJson(client.Get("/api/search?q=many&limit=1000", token)->body)["result"]["hits"].size(), 200u);
+    const Json::Value capped = testkit::ParseJson(client.Get("/api/search?q=many&limit=1000", token)->body)["result"];
+    EXPECT_EQ(capped["hits"].size(), 200u);
+    EXPECT_EQ(capped["total"].asInt(), 201);
+    EXPECT_EQ(testkit::ParseJson(client.Get("/api/search?q=many&offset=200", token)->body)["result"]["hits"].size(), 1u);
+    EXPECT_EQ(client.Get("/api/search?q=many&offset=10001", token)->status, 400);
     EXPECT_EQ(testkit::Stop(web), 0);
 }
 

@@ -445,7 +445,7 @@ bool SearchIndex::Search(const std::string& query, const std::string& type, int 
     Statement rows(db_,
                    "SELECT f.path, f.type, f.size, f.mtime, bm25(search, 10.0, 2.0, 1.0) AS rank,"
                    " snippet(search, -1, char(2), char(3), '…', 12) FROM search JOIN files f ON f.id = search.rowid"
-                   " WHERE search MATCH ?1 AND (?2 = '' OR f.type = ?2) ORDER BY rank LIMIT ?3");
+                   " WHERE search MATCH ?1 AND (?2 = '' OR f.type = ?2) ORDER BY rank, f.path LIMIT ?3");
     if (rows.Ok()) {
         rows.Bind(1, MatchExpression(query)).Bind(2, type).Bind(3, static_cast<long long>(limit));
         while (rows.Step()) {
@@ -453,9 +453,27 @@ bool SearchIndex::Search(const std::string& query, const std::string& type, int 
         }
         if (rows.Done()) return true;
     }
-    Check(SQLITE_ERROR);
-    error = problem_ == IndexProblem::TimedOut ? "the search took too long" : sqlite3_errmsg(db_);
+    error = SearchError();
     return false;
+}
+
+bool SearchIndex::CountHits(const std::string& query, const std::string& type, long long& count, std::string& error) {
+    error = QueryError(query);
+    if (!error.empty()) return false;
+    Statement counted(db_,
+                      "SELECT count(*) FROM search JOIN files f ON f.id = search.rowid"
+                      " WHERE search MATCH ?1 AND (?2 = '' OR f.type = ?2)");
+    if (counted.Ok() && counted.Bind(1, MatchExpression(query)).Bind(2, type).Step()) {
+        count = counted.Number(0);
+        return true;
+    }
+    error = SearchError();
+    return false;
+}
+
+std::string SearchIndex::SearchError() {
+    Check(SQLITE_ERROR);
+    return problem_ == IndexProblem::TimedOut ? "the search took too long" : sqlite3_errmsg(db_);
 }
 
 }  // namespace tools

@@ -94,14 +94,18 @@ public:
     long long Count();
 
     // The best hits for `query` (words, each a prefix, all required), of one type when `type` is
-    // not empty. False, with `error` set, when the query fails QueryError or the statement fails.
+    // not empty; hits ranked alike in path order, so that pages follow each other. False, with `error` set, when the query fails QueryError or the statement fails.
     bool Search(const std::string& query, const std::string& type, int limit, std::vector<SearchHit>& hits,
                 std::string& error);
+    // How many files Search would find without a limit; false as Search.
+    bool CountHits(const std::string& query, const std::string& type, long long& count, std::string& error);
 
 private:
     SearchIndex(sqlite3* db, std::string shareDir, dev_t dev, ino_t ino)
         : db_(db), shareDir_(std::move(shareDir)), dev_(dev), ino_(ino) {}
     bool Exec(const char* sql);
+    // The error of a failed search statement, its problem recorded.
+    std::string SearchError();
     bool Check(int rc);
     static int OnProgress(void* self);
 

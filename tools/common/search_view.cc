@@ -75,8 +75,10 @@ Json::Value CauseJson(const std::string& share, const Cause& cause) {
     return entry;
 }
 
-// One share's hits; false with `cause` when its index cannot be read.
-bool SearchOne(const SearchRequest& request, const SearchTarget& target, std::vector<SearchHit>& hits, Cause& cause) {
+// One share's best hits up to the end of the page asked for, and how many it has in all; false
+// with `cause` when its index cannot be read.
+bool SearchOne(const SearchRequest& request, const SearchTarget& target, std::vector<SearchHit>& hits, long long& total,
+               Cause& cause) {
     if (target.shareDir.empty()) {
         cause = {"SHARE_UNKNOWN", 0, "no share is named \"" + target.share + "\"", 404};
         return false;
@@ -93,7 +95,10 @@ bool SearchOne(const SearchRequest& request, const SearchTarget& target, std::ve
         return false;
     }
     index->SetDeadline(std::chrono::steady_clock::now() + kSearchBudget);
-    if (index->Search(request.query, request.type, request.limit, hits, error)) return true;
+    if (index->Search(request.query, request.type, request.offset + request.limit, hits, error) &&
+        index->CountHits(request.query, request.type, total, error)) {
+        return true;
+    }
     cause = IndexCause(index->LastProblem(), target.share, error);
     return false;
 }
@@ -109,7 +114,10 @@ bool SearchTargets(const SearchRequest& request, std::vector<SearchTarget>& targ
         cause = {"BAD_QUERY", 0, "unknown type \"" + request.type + "\"; use document, audio, video or photo", 400};
         return false;
     }
-    const std::string error = QueryError(request.query);
+    std::string error = QueryError(request.query);
+    if (error.empty() && (request.offset < 0 || request.offset > kMaxSearchOffset)) {
+        error = "the offset must be 0 to " + std::to_string(kMaxSearchOffset);
+    }
     if (!error.empty()) {
         cause = {"BAD_QUERY", 0, error, 400};
         return false;
@@ -126,18 +134,21 @@ bool SearchTargets(const SearchRequest& request, std::vector<SearchTarget>& targ
 bool SearchIndexes(const SearchRequest& request, const std::vector<SearchTarget>& targets, Json::Value& out,
                    Cause& cause) {
     std::vector<std::pair<std::string, SearchHit>> hits;
+    long long total = 0;
     out = Json::Value(Json::objectValue);
     out["incomplete"] = Json::Value(Json::arrayValue);
     bool searched = false;
     for (const auto& target : targets) {
         std::vector<SearchHit> found;
+        long long count = 0;
         Cause failed;
-        if (!SearchOne(request, target, found, failed)) {
+        if (!SearchOne(request, target, found, count, failed)) {
             if (out["incomplete"].empty()) cause = failed;
             out["incomplete"].append(CauseJson(target.share, failed));
             continue;
         }
         searched = true;
+        total += count;
         if (target.rebuilding) {
             out["incomplete"].append(CauseJson(target.share, {"INDEX_REBUILDING", 0,
                                                               "the index of share " + target.share +
@@ -148,7 +159,10 @@ bool SearchIndexes(const SearchRequest& request, const std::vector<SearchTarget>
     }
     if (!searched && !targets.empty()) return false;
     std::stable_sort(hits.begin(), hits.end(), [](const auto& a, const auto& b) { return a.second.rank < b.second.rank; });
+    hits.erase(hits.begin(), hits.begin() + std::min(hits.size(), static_cast<size_t>(request.offset)));
     if (hits.size() > static_cast<size_t>(request.limit)) hits.resize(static_cast<size_t>(request.limit));
+    out["total"] = static_cast<Json::Int64>(total);
+    out["offset"] = request.offset;
     out["hits"] = Json::Value(Json::arrayValue);
     for (const auto& [share, hit] : hits) out["hits"].append(HitJson(share, hit));
     return true;

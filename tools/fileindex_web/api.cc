@@ -232,6 +232,7 @@ void AddApiRoutes(HttpServer& server, const std::string& token) {
         request.type = Param(req, "type");
         request.share = Param(req, "share");
         request.limit = static_cast<int>(std::min<unsigned long>(Number(req, "limit", 20), 200));
+        request.offset = static_cast<int>(std::min<unsigned long>(Number(req, "offset", 0), tools::kMaxSearchOffset + 1UL));
         std::vector<tools::SearchTarget> targets;
         tools::Cause cause;
         bool found = false;

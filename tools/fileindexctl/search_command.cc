@@ -25,6 +25,15 @@ std::string SnippetText(const Json::Value& snippet) {
     return text;
 }
 
+// "(N found)" when every hit is shown; else which hits are shown, of how many, and how to go on.
+std::string Footer(const Json::Value& out) {
+    const long long shown = out["hits"].size(), offset = out["offset"].asInt64(), total = out["total"].asInt64();
+    if (offset == 0 && shown == total) return "(" + std::to_string(total) + " found)";
+    if (shown == 0) return "(none from " + std::to_string(offset + 1) + " on; " + std::to_string(total) + " found)";
+    const std::string range = "(" + std::to_string(offset + 1) + "-" + std::to_string(offset + shown) + " of " + std::to_string(total);
+    return range + (offset + shown < total ? "; --offset " + std::to_string(offset + shown) + " for more)" : ")");
+}
+
 int Search(Context& ctx, const tools::SearchRequest& request) {
     Json::Value out;
     tools::Cause cause;
@@ -39,7 +48,7 @@ int Search(Context& ctx, const tools::SearchRequest& request) {
         table.push_back({tools::EscapeForTerminal(path), hit["type"].asString(), std::to_string(hit["size"].asInt64()),
                          FormatLocalTime(hit["mtime"].asInt64()), SnippetText(hit["snippet"])});
     }
-    table.push_back({"(" + std::to_string(out["hits"].size()) + " found)"});
+    table.push_back({Footer(out)});
     ctx.out.Emit(out, table);
     return 0;
 }
@@ -54,6 +63,7 @@ void AddSearchCommand(CLI::App& app, Context& ctx) {
     search->add_option("--type", request->type, "Only this type")->check(CLI::IsMember({"document", "audio", "video", "photo"}));
     search->add_option("--share", request->share, "Only this share")->check(ShareName);
     search->add_option("--limit", request->limit, "Hits at most")->check(CLI::Range(1, 1000));
+    search->add_option("--offset", request->offset, "Best hits to skip")->check(CLI::Range(0, tools::kMaxSearchOffset));
     search->callback([&ctx, request, words] {
         for (const auto& word : *words) request->query += (request->query.empty() ? "" : " ") + word;
         ctx.status = Search(ctx, *request);
