@@ -4,6 +4,8 @@
 #include <poll.h>
 #include <sys/inotify.h>
 
+#include "share_indexer.h"
+
 namespace {
 
 class ToolTest : public testkit::IndexFixture {
@@ -311,10 +313,55 @@ TEST_F(ToolTest, ListingAndExplainTellWhyAFolderIsNotIndexable) {
     // explain names the first problem in words, and a folder without a name is called so.
     testkit::WriteFile(FolderConf(), R"({"/music/gone": {}})");
     const auto explain = Ctl({"explain", "/music/gone"}).out;
-    EXPECT_EQ(explain.rfind("/music/gone: cannot be indexed: the directory does not exist (refused by canonical_path)\n", 0), 0u)
+    EXPECT_EQ(explain.rfind("/music/gone: not indexed: nothing is at that path (refused by canonical_path)\n", 0), 0u)
         << explain;
     EXPECT_NE(explain.find("governing folder: /music/gone (unnamed; document no, audio no, video no, photo no)"),
               std::string::npos);
+}
+
+// Explain answers for one file whether it is in the index and, if not, the first thing that keeps
+// it out, in the order a user would look; the service state is the real one.
+TEST_F(ToolTest, ExplainTellsWhetherAFileIsInTheIndexAndWhatKeepsItOut) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {"audio": true}, "/photo/a": {"photo": true}})");
+    for (const char* file : {"/a/song.mp3", "/a/notes.txt", "/a/x.bak", "/b/y.mp3"}) testkit::WriteFile(music_ + file, "x");
+    testkit::WriteFile(photo_ + "/a/p.jpg", "x");
+    std::vector<Folder> folders;
+    ASSERT_TRUE(IndexMgr::List(folders));
+    volatile sig_atomic_t stop = 0;
+    ASSERT_TRUE(fileindexd_ref::ShareIndexer("music", &stop).Reindex(folders));
+    testkit::WriteFile(music_ + "/a/new.mp3", "x");  // after the walk
+    const std::vector<std::tuple<std::string, std::function<void()>, std::string>> cases = {
+        {"/music/a/song.mp3", [] {}, "in the index"},
+        {"/music/a", [] {}, "in the index"},
+        {"/music/a/notes.txt", [] {}, "not indexed: folder /music/a does not index document files"},
+        {"/music/a/x.bak", [] {}, "not indexed: its name is of no type the index keeps"},
+        {"/music/b/y.mp3", [] {}, "not indexed: no indexed folder holds it"},
+        {"/music/#recycle/z.mp3", [] {}, "not indexed: the path lies in the share's recycle bin"},
+        {"/music/a/new.mp3", [] {}, "not in the index yet: the indexing daemon has not reached it"},
+        {"/music/a/gone.mp3", [] {}, "not indexed: nothing is at that path"},
+        {"/photo/a/p.jpg", [] {}, "the index could not be read: the share has no index yet"},
+        {"/music/a/new.mp3", [this] { testkit::AppendFile(QueueOf("music"), "{\"event\":2,\"path\":\"" + music_ + "/a/new.mp3\"}\n"); },
+         "not in the index yet: 1 change waiting"},
+        {"/music/a/new.mp3", [] { ASSERT_TRUE(StatusMgr::Pause(0)); }, "not in the index yet: indexing is paused with 1 change waiting"},
+        {"/music/a/new.mp3", [this] { ASSERT_TRUE(StatusMgr::Resume()); daemon_.reset(); },
+         "not in the index yet: the indexing daemon does not answer"},
+    };
+    for (const auto& [path, before, verdict] : cases) {
+        SCOPED_TRACE(path + ": " + verdict);
+        before();
+        const Json::Value e = testkit::ParseJson(Ctl({"--json", "explain", path}).out)["result"];
+        EXPECT_EQ(e["verdict"].asString(), verdict);
+        EXPECT_EQ(e["service"]["daemon_answers"].asBool(), daemon_ != nullptr);
+    }
+    const Json::Value folder = testkit::ParseJson(Ctl({"--json", "explain", "/music/a"}).out)["result"];
+    EXPECT_EQ(folder["file"], J(R"({"kind": "directory", "type": null, "type_switched_on": null, "in_index": true,
+                                     "indexed_files": 1, "index_problem": null})"));
+    EXPECT_EQ(folder["service"], J(R"({"status": "processing", "paused": false, "daemon_answers": false})"));
+    const std::string text = Ctl({"explain", "/music/a/notes.txt"}).out;
+    EXPECT_EQ(text.rfind("/music/a/notes.txt: not indexed: folder /music/a does not index document files\n", 0), 0u) << text;
+    EXPECT_NE(text.find("the file: type document (switched off); in the index: no\n"), std::string::npos) << text;
+    EXPECT_NE(text.find("12 more rules passed or were not needed (--rules shows them)"), std::string::npos) << text;
+    EXPECT_EQ(testkit::CountOf(Ctl({"explain", "--rules", "/music/a/notes.txt"}).out, "\npass "), 12u);
 }
 
 // wait ends when indexing is finished, or at its time-out with 3 while work is pending; progress

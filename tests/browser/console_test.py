@@ -134,7 +134,9 @@ class ConsoleTest(unittest.TestCase):
         # An explanation in words: the problem, the rules with their facts as text.
         b.find_element(By.ID, "explain-path").send_keys("/music/#recycle/old")
         self.click("#explain-form button")
-        self.wait_text("explain-verdict", "the path lies in the share's recycle bin (refused by recycle_bin)")
+        self.wait_text("explain-verdict", "not indexed: the path lies in the share's recycle bin (refused by recycle_bin)")
+        self.assertIn("Governing folder: none", self.text("explanation"))
+        self.click("#explanation summary")  # the rules are folded away until asked for
         explanation = self.text("explanation")
         self.assertIn("refuse: recycle bin", explanation)
         self.assertIn("marked yes, recycle bin yes", explanation)

@@ -8,6 +8,7 @@
 #include "captured_log.h"
 #include "envelope.h"
 #include "fileindex/fileindex.h"
+#include "file_explain.h"
 #include "folder_page.h"
 #include "folder_view.h"
 #include "pause.h"
@@ -211,7 +212,10 @@ void AddApiRoutes(HttpServer& server, const std::string& token) {
             res, "explain",
             [&](Json::Value& result) {
                 if (!QIRA::FILEINDEX::ExplainPath(Param(req, "path"), result)) return false;
-                if (result["refused_by"] != "share_path") return true;
+                if (result["refused_by"] != "share_path") {
+                    tools::CompleteExplanation(result);
+                    return true;
+                }
                 unknownShare = tools::Cause{"SHARE_UNKNOWN", 0, result["problem"].asString(), 404};
                 return false;
             },

@@ -9,6 +9,7 @@
 #include <thread>
 
 #include "commands.h"
+#include "file_explain.h"
 #include "fileindex/fileindex.h"
 #include "pause.h"
 #include "service_view.h"
@@ -37,46 +38,58 @@ std::string Join(const Json::Value& items) {
     return text;
 }
 
-void PrintExplanation(const Json::Value& e) {
-    std::cout << e["path"].asString() << ": "
-              << (e["indexable"].asBool() ? "can be indexed"
-                                          : "cannot be indexed: " + e["problem"].asString() + " (refused by " +
-                                                e["refused_by"].asString() + ")")
-              << "\n";
+std::string Switches(const Json::Value& folder) {
+    return "document " + YesNo(folder["document"].asBool()) + ", audio " + YesNo(folder["audio"].asBool()) + ", video " +
+           YesNo(folder["video"].asBool()) + ", photo " + YesNo(folder["photo"].asBool());
+}
+
+// The verdict first, then the facts behind it; the rules that passed only with `allRules`.
+void PrintExplanation(const Json::Value& e, bool allRules) {
+    std::cout << e["path"].asString() << ": " << e["verdict"].asString()
+              << (e["refused_by"].isNull() ? "" : " (refused by " + e["refused_by"].asString() + ")") << "\n";
     std::cout << "  share " << e["share"].asString() << ", full path "
-              << (e["full_path"].isNull() ? "(not resolved)" : e["full_path"].asString()) << "\n\n";
-    Table rules = {{"VERDICT", "RULE", "REFUSES", "FACTS"}};
-    const auto row = [](const Json::Value& r) {
-        return std::vector<std::string>{r["verdict"].asString(), r["rule"].asString(), r["description"].asString(),
-                                        Facts(r["facts"])};
-    };
-    for (const auto& rule : e["rules"]) {
-        if (rule["rule"] == e["refused_by"]) rules.push_back(row(rule));  // the refusing rule first
-    }
-    for (const auto& rule : e["rules"]) {
-        if (rule["rule"] != e["refused_by"]) rules.push_back(row(rule));
-    }
-    Output{}.Emit(Json::Value(), rules);
+              << (e["full_path"].isNull() ? "(not resolved)" : e["full_path"].asString()) << "\n";
     const Json::Value& folder = e["governing_folder"];
-    std::cout << "\ngoverning folder: ";
+    std::cout << "governing folder: ";
     if (folder.isNull()) {
         std::cout << "none\n";
     } else {
         const std::string name = folder["name"].asString().empty() ? "unnamed" : "\"" + folder["name"].asString() + "\"";
-        std::cout << folder["path"].asString() << " (" << name << "; document "
-                  << YesNo(folder["document"].asBool()) << ", audio " << YesNo(folder["audio"].asBool()) << ", video "
-                  << YesNo(folder["video"].asBool()) << ", photo " << YesNo(folder["photo"].asBool()) << ")\n";
+        std::cout << folder["path"].asString() << " (" << name << "; " << Switches(folder) << ")\n";
     }
-    std::cout << "inside an indexed folder: " << YesNo(e["inside_indexed_folder"].asBool())
-              << "; contains one: " << YesNo(e["contains_indexed_folder"].asBool()) << "\n"
-              << "share flags: out of space " << YesNo(e["share_flags"]["no_space"].asBool()) << ", need reindex "
-              << YesNo(e["share_flags"]["need_reindex"].asBool()) << "\n"
-              << "status: " << e["status"].asString() << "; pending for the path: " << e["pending"]["queue"].asUInt64()
-              << " in the queue, " << e["pending"]["companion"].asUInt64() << " in its companion"
+    const Json::Value& file = e["file"];
+    std::cout << "the " << file["kind"].asString() << ": type "
+              << (file["type"].isNull() ? "none" : file["type"].asString() + (file["type_switched_on"] == false ? " (switched off)" : ""))
+              << "; in the index: "
+              << (file["in_index"].isNull() ? "unknown (" + file["index_problem"].asString() + ")"
+                                             : file["kind"] == "directory" ? std::to_string(file["indexed_files"].asUInt64()) + " files"
+                                                                           : YesNo(file["in_index"].asBool()))
+              << "\n";
+    const Json::Value& service = e["service"];
+    std::cout << "service: " << service["status"].asString() << (service["paused"].asBool() ? ", paused" : "")
+              << (service["daemon_answers"].asBool() ? "" : ", the indexing daemon does not answer")
+              << "; pending for the path: " << e["pending"]["queue"].asUInt64() << " in the queue, "
+              << e["pending"]["companion"].asUInt64() << " in its companion"
               << (e["pending"]["unread"].empty() ? "" : " (not read, sparse or too large: " + Join(e["pending"]["unread"]) + ")")
               << "\n";
+    std::cout << "share flags: out of space " << YesNo(e["share_flags"]["no_space"].asBool()) << ", need reindex "
+              << YesNo(e["share_flags"]["need_reindex"].asBool()) << "\n";
     const std::string problem = tools::QueueProblemText(e["pending"]["wrong_kind"]);
     if (!problem.empty()) std::cout << "the share's queue: " << problem << "\n";
+    Table rules = {{"VERDICT", "RULE", "REFUSES", "FACTS"}};
+    size_t folded = 0;
+    for (const auto& rule : e["rules"]) {
+        if (rule["verdict"] == "refuse" || allRules) {
+            rules.push_back({rule["verdict"].asString(), rule["rule"].asString(), rule["description"].asString(), Facts(rule["facts"])});
+        } else {
+            ++folded;
+        }
+    }
+    if (rules.size() > 1) {
+        std::cout << "\n";
+        Output{}.Emit(Json::Value(), rules);
+    }
+    if (folded > 0) std::cout << folded << " more rules passed or were not needed (--rules shows them)\n";
 }
 
 // Adds to `now` the drain rate (records per second) and the estimated seconds left of every share
@@ -226,9 +239,11 @@ int Wait(Context& ctx, double timeout) {
 
 void AddInsightCommands(CLI::App& app, Context& ctx) {
     auto path = std::make_shared<std::string>();
-    auto* explain = app.add_subcommand("explain", "Why a share path is or is not indexed, rule by rule");
-    explain->add_option("path", *path, "Share path, e.g. /music/live")->required();
-    explain->callback([&ctx, path] {
+    auto allRules = std::make_shared<bool>(false);
+    auto* explain = app.add_subcommand("explain", "Whether a file or folder is in the index, and what keeps it out");
+    explain->add_option("path", *path, "Share path, e.g. /music/live/song.mp3")->required();
+    explain->add_flag("--rules", *allRules, "Show every rule, not only those that refuse");
+    explain->callback([&ctx, path, allRules] {
         Json::Value out;
         if (!ctx.Attempt([&] { return QIRA::FILEINDEX::ExplainPath(*path, out); })) {
             ctx.status = ctx.Fail("explain");
@@ -238,10 +253,11 @@ void AddInsightCommands(CLI::App& app, Context& ctx) {
             ctx.status = ctx.Fail("explain", {"SHARE_UNKNOWN", 0, out["problem"].asString(), 404});
             return;
         }
+        tools::CompleteExplanation(out);
         if (ctx.out.json) {
             ctx.out.Emit(out, "");
         } else {
-            PrintExplanation(out);
+            PrintExplanation(out, *allRules);
         }
     });
 

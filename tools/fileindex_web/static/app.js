@@ -246,34 +246,60 @@ function factsText(facts) {
   return Object.entries(facts).map(([name, value]) => name.replace(/_/g, ' ') + ' ' + factText(value)).join(', ');
 }
 
+function switchesText(folder) {
+  return ['document', 'audio', 'video', 'photo'].map((type) => type + ' ' + (folder[type] ? 'on' : 'off')).join(', ');
+}
+
+function explainFacts(e) {
+  const file = e.file;
+  const folder = e.governing_folder;
+  const inIndex = file.in_index === null ? 'unknown (' + file.index_problem + ')'
+    : file.kind === 'directory' ? file.indexed_files + ' files' : (file.in_index ? 'yes' : 'no');
+  const service = e.service;
+  return [
+    'Governing folder: ' + (folder ? folder.path + (folder.name ? ' (' + folder.name + ')' : '') + '; ' + switchesText(folder) : 'none'),
+    'Type: ' + (file.type === null ? 'none' : file.type + (file.type_switched_on === false ? ' (switched off in that folder)' : '')) +
+      '; in the index: ' + inIndex,
+    'Service: ' + service.status + (service.paused ? ', paused' : '') +
+      (service.daemon_answers ? '' : ', the indexing daemon does not answer') + '; ' +
+      (e.pending.queue + e.pending.companion) + ' changes pending for the path',
+  ];
+}
+
+// The verdict first, the facts behind it, and the rules folded away.
 async function explain(path) {
   $('explain-path').value = path;
+  const target = $('explanation');
+  target.replaceChildren();
   await act('Explain ' + path, async () => {
     const e = await api('GET', '/api/explain?' + new URLSearchParams({ path }));
-    const target = $('explanation');
-    target.replaceChildren();
     const verdict = document.createElement('p');
-    verdict.textContent = e.indexable ? path + ' can be indexed.'
-      : path + ' cannot be indexed: ' + e.problem + ' (refused by ' + e.refused_by + ').';
-    verdict.className = e.indexable ? '' : 'refuse';
+    verdict.textContent = path + ': ' + e.verdict + (e.refused_by ? ' (refused by ' + e.refused_by + ')' : '') + '.';
+    verdict.className = e.verdict === 'in the index' ? '' : 'refuse';
     verdict.id = 'explain-verdict';
     target.appendChild(verdict);
-    const list = document.createElement('ul');
-    const rules = e.rules.filter((r) => r.rule === e.refused_by).concat(e.rules.filter((r) => r.rule !== e.refused_by));
-    for (const rule of rules) {
+    const facts = document.createElement('ul');
+    for (const line of explainFacts(e)) {
       const item = document.createElement('li');
-      const facts = factsText(rule.facts);
+      item.textContent = line;
+      facts.appendChild(item);
+    }
+    target.appendChild(facts);
+    const rules = document.createElement('details');
+    const summary = document.createElement('summary');
+    summary.textContent = 'Every rule (' + e.rules.filter((r) => r.verdict === 'pass').length + ' passed)';
+    rules.appendChild(summary);
+    const list = document.createElement('ul');
+    for (const rule of e.rules) {
+      const item = document.createElement('li');
+      const ruleFacts = factsText(rule.facts);
       item.textContent = rule.verdict.replace('_', ' ') + ': ' + rule.rule.replace(/_/g, ' ') + ' (refuses ' + rule.description + ')' +
-        (facts ? '; ' + facts : '');
+        (ruleFacts ? '; ' + ruleFacts : '');
       if (rule.verdict === 'refuse') item.className = 'refuse';
       list.appendChild(item);
     }
-    target.appendChild(list);
-    const governing = document.createElement('p');
-    const folder = e.governing_folder;
-    governing.textContent = 'Governing folder: ' + (folder ? folder.path + (folder.name ? ' (' + folder.name + ')' : '') : 'none') +
-      '; status ' + e.status + '; ' + (e.pending.queue + e.pending.companion) + ' records pending for the path.';
-    target.appendChild(governing);
+    rules.appendChild(list);
+    target.appendChild(rules);
   });
 }
 
