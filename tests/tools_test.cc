@@ -4,7 +4,10 @@
 #include <poll.h>
 #include <sys/inotify.h>
 
+#include "banner.h"
+#include "pending_rate.h"
 #include "share_indexer.h"
+#include "time_text.h"
 
 namespace {
 
@@ -285,16 +288,58 @@ TEST_F(ToolTest, ServiceStatusShowsPauseAndFlags) {
     ASSERT_EQ(result.status, 0) << result.err;
     EXPECT_EQ(testkit::ParseJson(result.out)["result"],
               J(R"({"status": "finished", "pause": {"paused": true, "resume_time": 0, "resume_time_utc": null},
+                    "banner": {"state": "paused", "text": "Paused until resumed", "files_indexed": 0, "pending": 0,
+                               "resume_time": null, "rate": null, "seconds_left": null},
                     "daemon": {"socket": ")" + DaemonSocketPath() + R"(", "answers": true, "reason": null},
                     "watched": [{"share": "music", "queue": ")" + QueueOf("music") + R"(", "folders": [")" + music_ + R"(/a"]}],
                     "no_space": ["music"], "need_reindex": []})"));
     const auto text = Ctl({"service", "status"}).out;
+    EXPECT_EQ(text.rfind("indexing          Paused until resumed\n", 0), 0u) << text;
     EXPECT_NE(text.find("pause             paused until resumed"), std::string::npos) << text;
     EXPECT_NE(text.find("daemon            answers at " + DaemonSocketPath()), std::string::npos);
     EXPECT_NE(text.find("watched in music  " + music_ + "/a"), std::string::npos);
     daemon_.reset();
     EXPECT_NE(Ctl({"service", "status"}).out.find("does not answer at " + DaemonSocketPath() + " (No such file or directory)"),
               std::string::npos);
+}
+
+// The banner names what matters most first: no folder, a silent daemon, a pause, work left (with
+// a rate only once one was measured), what else keeps indexing from being done, then up to date.
+TEST(BannerTest, OneSentenceInOrderOfWhatMattersMost) {
+    const long long inAnHour = time(nullptr) + 3600;
+    using tools::BannerFacts;
+    const std::vector<std::tuple<BannerFacts, std::string, std::string>> cases = {
+        {{"finished", -1, true, 0, 0, "", 0, 0}, "no_folders", "No folder is indexed yet"},
+        {{"processing", 0, false, 1, 3, "", 9, 0}, "daemon_down",
+         "The indexing daemon does not answer: 3 changes wait and a search may miss recent changes. Start the fileindexd service"},
+        {{"paused", 0, true, 1, 1, "", 9, 0}, "paused", "Paused until resumed; 1 change waits"},
+        {{"paused", inAnHour, true, 1, 0, "", 9, 0}, "paused", "Paused until " + tools::FormatUtc(inAnHour) + " (1 h left)"},
+        {{"processing", 1, true, 1, 40, "", 9, 0}, "working", "40 changes left to index, time left unknown"},
+        {{"processing", -1, true, 1, 40, "", 9, 2}, "working", "40 changes left to index, 2.0 per second, about 20 s left"},
+        {{"finished", -1, true, 1, 0, "share music waits for a full reindex", 9, 0}, "working", "share music waits for a full reindex"},
+        {{"finished", -1, true, 1, 0, "", 1, 0}, "up_to_date", "Up to date: 1 file indexed"},
+        {{"finished", -1, true, 1, 0, "", Json::Value(), 0}, "up_to_date", "Up to date"},
+    };
+    for (const auto& [facts, state, text] : cases) {
+        const Json::Value banner = tools::Banner(facts);
+        EXPECT_EQ(banner["state"].asString() + ": " + banner["text"].asString(), state + ": " + text);
+        EXPECT_EQ(banner["resume_time"].isNull(), state != "paused" || facts.resumeTime <= 0) << text;
+        EXPECT_EQ(banner["seconds_left"], facts.rate > 0 ? Json::Value(20) : Json::Value()) << text;
+    }
+    for (const auto& [seconds, words] : std::vector<std::pair<long long, std::string>>{
+             {0, "0 s"}, {59, "59 s"}, {60, "1 min"}, {61, "2 min"}, {3600, "1 h"}, {3661, "1 h 2 min"}}) {
+        EXPECT_EQ(tools::DurationText(seconds), words);
+    }
+}
+
+// The drain rate is measured over a minute of samples, from a second on, and new work restarts it.
+TEST(BannerTest, TheDrainRateFollowsTheSamples) {
+    tools::PendingRate rate;
+    const auto start = tools::PendingRate::Clock::now();
+    const auto at = [&](double seconds) { return start + std::chrono::milliseconds(static_cast<long long>(seconds * 1000)); };
+    const std::vector<std::tuple<double, unsigned long long, double>> samples = {
+        {0, 100, 0}, {0.5, 90, 0}, {2, 80, 10}, {3, 120, 0}, {5, 100, 10}, {65, 40, 1}, {125, 10, 0.5}};
+    for (const auto& [seconds, pending, expected] : samples) EXPECT_DOUBLE_EQ(rate.Update(pending, at(seconds)), expected) << seconds;
 }
 
 // A folder that cannot be indexed says why, in the listing, in its status and when it is added.

@@ -43,8 +43,4 @@ private:
     int Tell(const std::string& operation, const Cause& cause, const std::vector<std::string>& saved, int status) const;
 };
 
-// "2026-11-22 05:42:17 UTC" in the local time zone; ISO 8601 in UTC ("2026-11-22T05:42:17Z").
-std::string FormatLocalTime(long long epochSeconds);
-std::string FormatUtc(long long epochSeconds);
-
 }  // namespace tools

@@ -4,7 +4,7 @@
 #include <ctime>
 #include <limits>
 
-#include "output.h"
+#include "time_text.h"
 
 namespace tools {
 

@@ -7,10 +7,10 @@
 #include <chrono>
 
 #include "fileindex/fileindex.h"
-#include "output.h"
 #include "search_index.h"
 #include "service_view.h"
 #include "text_safety.h"
+#include "time_text.h"
 
 namespace tools {
 namespace {

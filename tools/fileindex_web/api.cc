@@ -8,9 +8,11 @@
 #include "captured_log.h"
 #include "envelope.h"
 #include "fileindex/fileindex.h"
+#include "banner.h"
 #include "file_explain.h"
 #include "folder_page.h"
 #include "folder_view.h"
+#include "pending_rate.h"
 #include "pause.h"
 #include "saved_files.h"
 #include "search_view.h"
@@ -122,6 +124,9 @@ Json::Value Additional(const std::string& list) {
     return additional;
 }
 
+// The drain seen across status answers, for the banner's rate and time left.
+tools::PendingRate g_pendingRate;
+
 bool ServiceStatus(Json::Value& result) {
     std::string word;
     long long resumeTime = -1;
@@ -137,6 +142,10 @@ bool ServiceStatus(Json::Value& result) {
     bool stuck = false;
     const std::string reason = tools::NotDoneReason(word, folders, result["daemon"], stuck);
     result["not_done"] = reason.empty() ? Json::Value() : Json::Value(reason);
+    tools::BannerFacts facts{word, resumeTime, result["daemon"]["answers"].asBool(), folders.size(), tools::PendingOf(result["progress"]),
+                             reason, tools::FilesIndexed(tools::SharesOf(folders)), 0};
+    facts.rate = g_pendingRate.Update(facts.pending);
+    result["banner"] = tools::Banner(facts);
     result["shares"] = Json::Value(Json::arrayValue);
     for (const auto& share : tools::SharesOf(folders)) {
         Json::Value flags(Json::objectValue);

@@ -8,6 +8,7 @@
 
 #include "output.h"
 #include "saved_files.h"
+#include "time_text.h"
 #include "validators.h"
 
 namespace fileindexctl {

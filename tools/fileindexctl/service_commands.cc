@@ -1,6 +1,7 @@
 // service status | pause | resume, and the migration step.
 #include <ctime>
 
+#include "banner.h"
 #include "commands.h"
 #include "fileindex/fileindex.h"
 #include "pause.h"
@@ -65,7 +66,14 @@ int Status(Context& ctx) {
     out["need_reindex"] = Json::Value(Json::arrayValue);
     ShareFlags(folders, out["no_space"], out["need_reindex"]);
     out["watched"] = tools::WatchedShares(folders);
-    Table table = {{"status", word},
+    Json::Value progress;
+    bool stuck = false;
+    const std::string notDone = tools::NotDoneReason(word, folders, out["daemon"], stuck);
+    const unsigned long long pending = QIRA::FILEINDEX::GetProgress(progress) ? tools::PendingOf(progress) : 0;
+    out["banner"] = tools::Banner({word, resumeTime, out["daemon"]["answers"].asBool(), folders.size(), pending, notDone,
+                                   tools::FilesIndexed(tools::SharesOf(folders)), 0});
+    Table table = {{"indexing", out["banner"]["text"].asString()},
+                   {"status", word},
                    {"daemon", DaemonText(out["daemon"])},
                    {"pause", PauseText(resumeTime)},
                    {"out of space", Join(out["no_space"])},
