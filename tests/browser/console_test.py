@@ -71,6 +71,7 @@ class ConsoleTest(unittest.TestCase):
         self.wait.until(lambda _: len(self.rows()) == 10)
         self.assertIn("(16 folders)", self.text("page-info"))
         self.wait_text("daemon", "Indexing daemon: answers.")
+        self.wait.until(lambda _: self.text("banner") not in ("", "…"))  # one sentence on top, whatever the state
 
         with open(TOKEN_FILE, encoding="ascii") as token:
             b.find_element(By.ID, "token").send_keys(token.read().strip())
@@ -123,6 +124,7 @@ class ConsoleTest(unittest.TestCase):
         hours.send_keys("0")
         self.click("#pause")
         self.wait_text("pause-text", "paused until resumed")
+        self.wait_text("banner", "Paused until resumed")
         ctl("reindex", "/music/f01", "/music/f02")
         self.wait_text("progress", "music")
         self.wait.until(lambda _: "2 pending" in self.text("progress"))
@@ -161,6 +163,9 @@ class ConsoleTest(unittest.TestCase):
         self.assertIn("/music/f03/notes.txt", self.text("search-hits"))
         marks = [m.text for m in b.find_elements(By.CSS_SELECTOR, "#search-hits mark")]
         self.assertEqual(marks, ["manuscript", "Crète"])
+        self.assertEqual(self.text("search-total"), "1 found.")
+        self.click("#search-clear")  # the results can be cleared
+        self.assertEqual(self.text("search-hits"), "")
         self.wait.until(lambda _: "done" in self.text("progress") and "2 pending" not in self.text("progress"))
         self.assertLessEqual(b.execute_script("return document.documentElement.scrollWidth"), 1280)
         b.execute_script("window.scrollTo(0, 0)")

@@ -159,8 +159,26 @@ function pauseText(pause) {
     : 'paused until ' + new Date(pause.resume_time * 1000).toLocaleString();
 }
 
+function durationText(seconds) {
+  if (seconds < 60) return Math.max(seconds, 0) + ' s';
+  const minutes = Math.ceil(seconds / 60);
+  return minutes < 60 ? minutes + ' min' : Math.floor(minutes / 60) + ' h' + (minutes % 60 ? ' ' + (minutes % 60) + ' min' : '');
+}
+
+// The one sentence that says whether indexing is done; a pause's end in the browser's own time.
+function bannerText(banner) {
+  if (banner.state !== 'paused' || banner.resume_time === null) return banner.text + '.';
+  const end = new Date(banner.resume_time * 1000);
+  const left = durationText(Math.round(banner.resume_time - Date.now() / 1000));
+  const waiting = banner.pending > 0 ? '; ' + banner.pending + (banner.pending === 1 ? ' change waits' : ' changes wait') : '';
+  return 'Paused until ' + end.toLocaleTimeString([], { hour: '2-digit', minute: '2-digit' }) + ' (' + left + ' left)' + waiting + '.';
+}
+
 async function loadStatus() {
   const status = await api('GET', '/api/status');
+  $('banner').textContent = bannerText(status.banner);
+  $('banner').className = 'banner ' + status.banner.state;
+  $('resume').disabled = !status.pause.paused;
   $('service-word').textContent = status.status;
   $('pause-text').textContent = '(' + pauseText(status.pause) + ')';
   const daemon = status.daemon;
@@ -312,12 +330,31 @@ function sizeText(bytes) {
 }
 
 // The hits, best first, each with its matched words marked; the text is never read as HTML.
-async function search() {
+const SEARCH_PAGE = 20;
+
+function clearSearch() {
+  $('search-hits').replaceChildren();
+  $('search-total').textContent = '';
+  $('search-more').hidden = true;
+  $('search-clear').hidden = true;
+}
+
+// One page of hits, best first, from `offset` on; the total says how many there are in all.
+async function search(offset = 0) {
   const query = $('search-query').value.trim();
+  clearSearch();
   await act('Search for ' + query, async () => {
-    const result = await api('GET', '/api/search?' + new URLSearchParams({ q: query, type: $('search-type').value }));
+    const result = await api('GET', '/api/search?' +
+      new URLSearchParams({ q: query, type: $('search-type').value, offset, limit: SEARCH_PAGE }));
     const list = $('search-hits');
-    list.replaceChildren();
+    list.start = offset + 1;
+    const shown = result.hits.length;
+    $('search-total').textContent = result.total === 0 ? 'Nothing found.'
+      : (offset === 0 && shown === result.total ? result.total + ' found.'
+        : 'Hits ' + (offset + 1) + ' to ' + (offset + shown) + ' of ' + result.total + '.');
+    $('search-more').hidden = offset + shown >= result.total;
+    $('search-more').onclick = () => search(offset + shown);
+    $('search-clear').hidden = false;
     for (const hit of result.hits) {
       const item = document.createElement('li');
       const path = document.createElement('strong');
@@ -335,7 +372,6 @@ async function search() {
       item.append(path, facts, snippet);
       list.appendChild(item);
     }
-    if (!result.hits.length) list.textContent = 'Nothing found.';
   });
 }
 
@@ -383,6 +419,7 @@ function wire() {
   $('resume').addEventListener('click', () => act('Resume', async () => { await api('POST', '/api/resume'); await loadStatus(); }));
   $('explain-form').addEventListener('submit', (event) => { event.preventDefault(); explain($('explain-path').value.trim()); });
   $('search-form').addEventListener('submit', (event) => { event.preventDefault(); search(); });
+  $('search-clear').addEventListener('click', () => { clearSearch(); $('search-query').focus(); });
   act('Load', refresh);
   setInterval(() => refresh().catch((error) => show('Refresh failed: ' + error.message, 'error', error.log)), POLL_MS);
 }
