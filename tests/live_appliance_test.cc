@@ -227,6 +227,10 @@ TEST_F(LiveApplianceTest, SearchFindsPrefixesWithoutAccentsBestFirst) {
     Index("/music/a", R"("document": true, "audio": true)");
     Index("/photo/a", R"("photo": true)");
     ASSERT_TRUE(testkit::WaitFor([&] { return Search({"CRE"}).size() == 4; }));
+    ASSERT_TRUE(testkit::WaitFor([&] {  // the banner counts what the indexes hold once the queues are drained
+        return testkit::ParseJson(testkit::Run({FILEINDEXCTL, "--json", "service", "status"}).out)["result"]["banner"]["text"] ==
+               "Up to date: 4 files indexed";
+    }));
     Paths all = Search({"CRE"});
     EXPECT_EQ(all.back(), "/music/a/journal.txt");  // a match in the text ranks below those in names
     std::sort(all.begin(), all.end());

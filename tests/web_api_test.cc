@@ -172,6 +172,7 @@ TEST_F(WebApiTest, StatusAndListingTellTheDaemonsStateAndWhyAFolderIsNotIndexabl
     Json::Value status = Get("/api/status").body["result"];
     EXPECT_EQ(status["daemon"], J(R"({"socket": ")" + DaemonSocketPath() + R"(", "answers": true, "reason": null})"));
     EXPECT_TRUE(status["not_done"].isNull());
+    EXPECT_EQ(status["banner"]["text"].asString(), "Up to date: 0 files indexed");
     const Answer added = Post("/api/folders", R"([{"path": "/music/ghost"}])");
     EXPECT_EQ(added.body["result"]["warnings"][0].asString(),
               "/music/ghost cannot be indexed now: the directory does not exist (canonical_path); it stays listed as not "
@@ -182,6 +183,7 @@ TEST_F(WebApiTest, StatusAndListingTellTheDaemonsStateAndWhyAFolderIsNotIndexabl
     daemon_.reset();
     status = Get("/api/status").body["result"];
     EXPECT_FALSE(status["daemon"]["answers"].asBool());
+    EXPECT_EQ(status["banner"]["state"].asString(), "daemon_down");
     EXPECT_EQ(status["not_done"].asString(), "indexing is processing and the indexing daemon does not answer at " +
                                                  DaemonSocketPath() + " (No such file or directory)");
     MakeDir(QueueOf("music") + ".tmp");  // a share's user made a directory where the companion goes
