@@ -239,6 +239,10 @@ TEST_F(WebApiTest, EveryWriteRouteNeedsTheTokenTheSameOriginAndAJsonBody) {
     EXPECT_EQ(Of(client_->Post("/api/pause", allowed, std::string(64 * 1024 - pause.size(), ' ') + pause, "application/json")).status,
               200);
     EXPECT_NE(testkit::ReadFile(StatusConf()), status);  // a body of exactly 64 KiB is taken
+    // A missing token is named where the page takes it and where it is kept.
+    EXPECT_EQ(Post("/api/resume", "{}", {{"Origin", origin}}).body["message"].asString(),
+              "this request changes something: put the console's token in \"Token for changes\" at the top of the page; it is kept "
+              "in " + Path("/usr/qira/etc/fileindex/web.token") + " on the appliance (scripts send it in X-Fileindex-Token)");
 }
 
 // A page elsewhere whose name points at 127.0.0.1 reads nothing: a Host that is not the console's

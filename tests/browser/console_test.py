@@ -9,7 +9,7 @@ import sys
 import unittest
 
 from selenium import webdriver
-from selenium.common.exceptions import StaleElementReferenceException
+from selenium.common.exceptions import StaleElementReferenceException, TimeoutException
 from selenium.webdriver.chrome.options import Options
 from selenium.webdriver.chrome.service import Service
 from selenium.webdriver.common.by import By
@@ -53,7 +53,10 @@ class ConsoleTest(unittest.TestCase):
         return self.browser.find_element(By.ID, element_id).text
 
     def wait_text(self, element_id, text):
-        self.wait.until(EC.text_to_be_present_in_element((By.ID, element_id), text))
+        try:
+            self.wait.until(EC.text_to_be_present_in_element((By.ID, element_id), text))
+        except TimeoutException:
+            self.fail("#%s never showed %r; it shows %r" % (element_id, text, self.text(element_id)))
 
     def row_of(self, path):
         for row in self.rows():
@@ -81,6 +84,8 @@ class ConsoleTest(unittest.TestCase):
         self.wait.until(lambda _: self.first_cell(1) == "Folder 00")
         self.click('button.sort[data-key="name"]')  # descending
         self.wait.until(lambda _: self.first_cell(1) == "Photos")
+        sorted_by = b.find_element(By.CSS_SELECTOR, 'button.sort[data-key="name"]').find_element(By.XPATH, "..")
+        self.assertEqual(sorted_by.get_attribute("aria-sort"), "descending")
         self.click("#next")
         self.wait_text("page-info", "Page 2 of 2")
         self.assertEqual(len(self.rows()), 6)
@@ -102,6 +107,20 @@ class ConsoleTest(unittest.TestCase):
         self.click("#save-folder")
         self.wait_text("message", "cannot be indexed now: the directory does not exist")
         self.wait.until(lambda _: self.status_of("/music/ghost") == "not indexable: canonical_path")
+        # The result sits next to the form used.
+        self.assertEqual(b.execute_script("return document.getElementById('folder-form').nextElementSibling.id"), "message")
+
+        # Edit keeps the path and can be cancelled; Delete says the files stay, and focus stays on the page.
+        self.click('button[aria-label="Edit /music/ghost"]')
+        self.assertEqual(b.find_element(By.ID, "folder-path").get_attribute("readonly"), "true")
+        self.click("#cancel-edit")
+        self.assertEqual(b.find_element(By.ID, "folder-path").get_attribute("value"), "")
+        self.click('button[aria-label="Delete /music/ghost"]')
+        alert = b.switch_to.alert
+        self.assertIn("Its files stay on the share", alert.text)
+        alert.accept()
+        self.wait.until(lambda _: self.row_of("/music/ghost") is None)
+        self.assertEqual(b.switch_to.active_element.get_attribute("id"), "folders-title")
 
         # A path the library would only call malformed gets a reason.
         b.find_element(By.ID, "folder-path").send_keys("/music/added/")
@@ -166,6 +185,12 @@ class ConsoleTest(unittest.TestCase):
         self.assertEqual(self.text("search-total"), "1 found.")
         self.click("#search-clear")  # the results can be cleared
         self.assertEqual(self.text("search-hits"), "")
+        query.clear()
+        query.send_keys("!!")  # no word: a hint, not a failure
+        self.click("#search-form button")
+        self.wait_text("message", "Type a word or the start of one")
+        self.assertEqual(b.find_element(By.ID, "message").get_attribute("class"), "warning")
+        self.assertEqual(self.text("search-total"), "")
         self.wait.until(lambda _: "done" in self.text("progress") and "2 pending" not in self.text("progress"))
         self.assertLessEqual(b.execute_script("return document.documentElement.scrollWidth"), 1280)
         b.execute_script("window.scrollTo(0, 0)")

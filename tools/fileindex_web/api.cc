@@ -63,10 +63,18 @@ void Run(Response& res, const std::string& operation, const std::function<bool(J
     Send(res, cause.httpStatus, tools::FailureEnvelope(cause, tools::FailureMessage(operation, cause, saved), saved, false));
 }
 
+// Whether the request carries the token; else answers 403 saying why it is needed and where the
+// token is kept.
+bool HasToken(const Request& req, Response& res, const Token& token, const std::string& why) {
+    if (req.HasHeader("X-Fileindex-Token") && TokenMatches(req.Header("X-Fileindex-Token"), token.value)) return true;
+    Refuse(res, 403, why + ": put the console's token in \"Token for changes\" at the top of the page; it is kept in " +
+                         token.file + " on the appliance (scripts send it in X-Fileindex-Token)");
+    return false;
+}
+
 // Writes: the token, the same origin and a JSON body. False after answering the refusal.
-bool AcceptWrite(const Request& req, Response& res, const std::string& token, Json::Value& body) {
-    if (!req.HasHeader("X-Fileindex-Token") || !TokenMatches(req.Header("X-Fileindex-Token"), token)) {
-        Refuse(res, 403, "this request changes something: it needs the console's token in X-Fileindex-Token");
+bool AcceptWrite(const Request& req, Response& res, const Token& token, Json::Value& body) {
+    if (!HasToken(req, res, token, "this request changes something")) {
         return false;
     }
     const std::string origin = req.Header("Origin");
@@ -92,7 +100,7 @@ bool AcceptWrite(const Request& req, Response& res, const std::string& token, Js
 
 using Write = std::function<bool(const Json::Value& body, Json::Value& result)>;
 
-void Post(HttpServer& server, const std::string& token, const std::string& route, const std::string& operation,
+void Post(HttpServer& server, const Token& token, const std::string& route, const std::string& operation,
           const Write& write) {
     server.Post(route, [token, operation, write](const Request& req, Response& res) {
         Json::Value body;
@@ -200,7 +208,7 @@ void GuardHost(HttpServer& server, std::shared_ptr<const HostCheck> check) {
     });
 }
 
-void AddApiRoutes(HttpServer& server, const std::string& token) {
+void AddApiRoutes(HttpServer& server, const Token& token) {
     server.Get("/api/folders", [](const Request& req, Response& res) {
         for (const auto& name : Additional(Param(req, "additional"))) {
             if (name != "status" && name != "is_valid") {
@@ -237,9 +245,7 @@ void AddApiRoutes(HttpServer& server, const std::string& token) {
     // Answered beside other requests: the library is held only while the shares are found, and
     // the indexes, which a share's users can write, are read without it.
     server.GetSlow("/api/search", [token](const Request& req, Response& res) {
-        if (!req.HasHeader("X-Fileindex-Token") || !TokenMatches(req.Header("X-Fileindex-Token"), token)) {
-            return Refuse(res, 403, "a search reads the files' text: it needs the console's token in X-Fileindex-Token");
-        }
+        if (!HasToken(req, res, token, "a search reads the files' text")) return;
         tools::SearchRequest request;
         request.query = Param(req, "q");
         request.type = Param(req, "type");

@@ -106,7 +106,7 @@ int main(int argc, char** argv) {
                               {"Referrer-Policy", "no-referrer"},
                               {"X-Frame-Options", "DENY"},
                               {"Cache-Control", "no-store"}});
-    web::AddApiRoutes(server, token);
+    web::AddApiRoutes(server, {token, tokenFile});
     server.ServeFiles(StaticDirectory());
     const auto hosts = std::make_shared<web::HostCheck>(host, allowedHosts);
     web::GuardHost(server, hosts);

@@ -28,7 +28,16 @@ class ApiError extends Error {
   constructor(answer) {
     super(answer.message || 'the request failed');
     this.log = answer.log || [];
+    this.cause = (answer.error && answer.error.name) || '';
+    this.saved = (answer.saved || []).length > 0;
   }
+}
+
+// The message goes just after the form, table or block (marked data-results) whose control was
+// used, so that it is seen where the user is looking; never inside what is drawn anew.
+function placeMessageNear(control) {
+  const anchor = control && control.closest && control.closest('form, table, [data-results]');
+  if (anchor) anchor.after($('message'), $('message-more'));
 }
 
 // One API call; a held lock (409) is retried after Retry-After, a few times.
@@ -52,15 +61,24 @@ async function api(method, url, body) {
   }
 }
 
-// Runs a change and tells how it went; the library's log lines stay one click away.
+// Runs a change and tells how it went, next to the control used; the library's log lines stay
+// one click away. A change saved but not yet applied is a warning that says what happens next.
 async function act(description, work) {
+  placeMessageNear(document.activeElement);
   try {
     const warnings = await work();
     if (warnings && warnings.length) show(description + ': done, but ' + warnings.join('; '), 'warning');
     else show(description + ': done.');
     return true;
   } catch (error) {
-    show(description + ' failed: ' + error.message, 'error', error.log);
+    if (error.saved) {
+      const next = error.cause === 'DAEMON_UNREACHABLE' ? ' It takes effect when the indexing daemon answers again.' : '';
+      show(description + ': saved, not applied yet. ' + error.message + '.' + next, 'warning', error.log);
+    } else if (error.cause === 'BAD_QUERY') {
+      show(description + ': ' + error.message + '. Type a word or the start of one, in letters or digits.', 'warning');
+    } else {
+      show(description + ' failed: ' + error.message, 'error', error.log);
+    }
     return false;
   }
 }
@@ -79,26 +97,19 @@ function cell(row, text, label, className) {
   return td;
 }
 
-function button(parent, label, onClick) {
+function button(parent, label, onClick, name) {
   const b = document.createElement('button');
   b.type = 'button';
   b.textContent = label;
+  if (name) b.setAttribute('aria-label', name);
   b.addEventListener('click', onClick);
   parent.appendChild(b);
   return b;
 }
 
-// The library's descending page is its first records reversed; a descending page here is the
-// matching ascending page counted from the end, reversed.
-async function fetchPage() {
-  const ask = (offset, limit) => api('GET', '/api/folders?' + new URLSearchParams({
-    offset, limit, sort_by: state.sortBy, sort_direction: 'ASC', additional: 'status,is_valid' }));
-  if (state.direction === 'ASC') return ask(state.offset, state.limit);
-  const total = (await ask(0, 0)).total;
-  const end = Math.max(0, total - state.offset);
-  const listing = await ask(Math.max(0, end - state.limit), Math.min(state.limit, end));
-  listing.folder.reverse();
-  return listing;
+function fetchPage() {
+  return api('GET', '/api/folders?' + new URLSearchParams({ offset: state.offset, limit: state.limit, sort_by: state.sortBy,
+    sort_direction: state.direction, additional: 'status,is_valid' }));
 }
 
 // A folder that cannot be indexed carries the word "paused"; the console says why instead.
@@ -122,19 +133,20 @@ async function loadFolders() {
     cell(row, folder.additional.is_valid ? 'valid' : 'not valid', 'Valid');
     const actions = row.insertCell();
     actions.dataset.label = 'Actions';
-    button(actions, 'Edit', () => edit(folder));
+    button(actions, 'Edit', () => edit(folder), 'Edit ' + folder.path);
     button(actions, 'Reindex', () => act('Reindex ' + folder.path, async () => {
       await api('POST', '/api/reindex', [folder.path]);
       await refresh();
-    }));
-    button(actions, 'Explain', () => explain(folder.path));
-    button(actions, 'Delete', () => {
-      if (!confirm('Stop indexing ' + folder.path + '?')) return;
-      act('Delete ' + folder.path, async () => {
+    }), 'Reindex ' + folder.path);
+    button(actions, 'Explain', () => explain(folder.path), 'Explain ' + folder.path);
+    button(actions, 'Delete', async () => {
+      if (!confirm('Stop indexing ' + folder.path + '? Its files stay on the share; they only leave the index.')) return;
+      await act('Delete ' + folder.path, async () => {
         await api('POST', '/api/folders/delete', [folder.path]);
         await refresh();
       });
-    });
+      $('folders-title').focus();  // the row and its buttons are gone
+    }, 'Delete ' + folder.path);
   }
   const page = Math.floor(state.offset / state.limit) + 1;
   const pages = Math.max(1, Math.ceil(state.total / state.limit));
@@ -142,15 +154,20 @@ async function loadFolders() {
   $('previous').disabled = state.offset === 0;
   $('next').disabled = state.offset + state.limit >= state.total;
   for (const b of document.querySelectorAll('button.sort')) {
-    b.setAttribute('aria-sort', b.dataset.key === state.sortBy ? (state.direction === 'ASC' ? 'ascending' : 'descending') : 'none');
+    b.closest('th').setAttribute('aria-sort',
+      b.dataset.key === state.sortBy ? (state.direction === 'ASC' ? 'ascending' : 'descending') : 'none');
   }
 }
 
+// Changes a folder in place: its path stays (another path is another folder), Cancel goes back.
 function edit(folder) {
   $('folder-path').value = folder.path;
+  $('folder-path').readOnly = true;
   $('folder-name').value = folder.name;
   for (const kind of KINDS) $('folder-' + kind).checked = folder[kind];
-  $('folder-path').focus();
+  $('edit-title').textContent = 'Change folder ' + folder.path;
+  $('cancel-edit').hidden = false;
+  $('folder-name').focus();
 }
 
 function pauseText(pause) {
@@ -237,6 +254,7 @@ function renderProgress(progress) {
     const bar = document.createElement('span');
     bar.className = 'bar';
     bar.setAttribute('role', 'progressbar');
+    bar.setAttribute('aria-label', 'Indexing of share ' + share.share);
     const done = document.createElement('span');
     const percent = largest === 0 ? 0 : Math.round(100 * (largest - share.pending) / largest);
     done.style.width = percent + '%';
@@ -382,6 +400,9 @@ async function refresh() {
 
 function resetForm() {
   $('folder-form').reset();
+  $('folder-path').readOnly = false;
+  $('edit-title').textContent = 'Add or change a folder';
+  $('cancel-edit').hidden = true;
 }
 
 function wire() {
@@ -420,6 +441,7 @@ function wire() {
   $('explain-form').addEventListener('submit', (event) => { event.preventDefault(); explain($('explain-path').value.trim()); });
   $('search-form').addEventListener('submit', (event) => { event.preventDefault(); search(); });
   $('search-clear').addEventListener('click', () => { clearSearch(); $('search-query').focus(); });
+  $('cancel-edit').addEventListener('click', () => { resetForm(); $('folder-path').focus(); });
   act('Load', refresh);
   setInterval(() => refresh().catch((error) => show('Refresh failed: ' + error.message, 'error', error.log)), POLL_MS);
 }
