@@ -31,8 +31,9 @@ done
 conf+="\"/photo/2024\": {\"path\": \"/photo/2024\", \"name\": \"Photos\", \"document\": false, \"audio\": false, \"video\": false, \"photo\": true}"
 echo "${conf}}" >"$QIRA_ROOT/usr/qira/etc/fileindex/folder.conf"
 "$tools/fileindexd-ref" >"$output/daemon.log" 2>&1 & pids+=($!)
+export FILEINDEXD_PID=$!
 "$tools/fileindex-web" --listen 127.0.0.1:0 >"$output/web.log" 2>&1 & pids+=($!)
 for _ in $(seq 100); do grep -q "listening on" "$output/web.log" && break; sleep 0.05; done
 url=$(grep -o 'http://127.0.0.1:[0-9]*/' "$output/web.log")
 /usr/bin/python3 tests/browser/console_test.py "$url" "$QIRA_ROOT/usr/qira/etc/fileindex/web.token" "$output" "$tools"
-echo "browser-test: screenshots in $output (console.png, console-400.png)"
+echo "browser-test: screenshots in $output (console.png, console-400.png, banner-<state>-<width>.png)"

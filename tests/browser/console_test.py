@@ -2,8 +2,9 @@
 """The management console in a real browser: headless Chromium driven by Selenium against a
 fileindex-web on a seeded simulated appliance, with fileindexctl changing things beside it.
 Arguments: the console's URL, the token file, the directory for the screenshots and the directory
-of the tools."""
+of the tools; FILEINDEXD_PID names the indexing daemon stand-in."""
 import os
+import signal
 import subprocess
 import sys
 import unittest
@@ -73,8 +74,9 @@ class ConsoleTest(unittest.TestCase):
         b.get(URL)
         self.wait.until(lambda _: len(self.rows()) == 10)
         self.assertIn("(16 folders)", self.text("page-info"))
-        self.wait_text("daemon", "Indexing daemon: answers.")
         self.wait.until(lambda _: self.text("banner") not in ("", "…"))  # one sentence on top, whatever the state
+        self.click("#service-details summary")  # the details behind it, one click away
+        self.wait_text("daemon", "Indexing daemon: answers.")
 
         with open(TOKEN_FILE, encoding="ascii") as token:
             b.find_element(By.ID, "token").send_keys(token.read().strip())
@@ -142,8 +144,8 @@ class ConsoleTest(unittest.TestCase):
         hours.clear()
         hours.send_keys("0")
         self.click("#pause")
-        self.wait_text("pause-text", "paused until resumed")
         self.wait_text("banner", "Paused until resumed")
+        self.wait_text("pause-text", "paused until resumed")
         ctl("reindex", "/music/f01", "/music/f02")
         self.wait_text("progress", "music")
         self.wait.until(lambda _: "2 pending" in self.text("progress"))
@@ -188,7 +190,7 @@ class ConsoleTest(unittest.TestCase):
         query.clear()
         query.send_keys("!!")  # no word: a hint, not a failure
         self.click("#search-form button")
-        self.wait_text("message", "Type a word or the start of one")
+        self.wait_text("message", "Search for !!: the query holds no word. Type a word or the start of one")
         self.assertEqual(b.find_element(By.ID, "message").get_attribute("class"), "warning")
         self.assertEqual(self.text("search-total"), "")
         self.wait.until(lambda _: "done" in self.text("progress") and "2 pending" not in self.text("progress"))
@@ -206,6 +208,32 @@ class ConsoleTest(unittest.TestCase):
             self.assertLessEqual(cell.rect["x"] + cell.rect["width"], 400)
         b.execute_script("window.scrollTo(0, 0)")
         b.save_screenshot(OUTPUT + "/console-400.png")
+
+        # The banner in each state, at both widths. A stopped daemon still accepts connections
+        # but drains nothing, so work stays left to do.
+        daemon = int(os.environ["FILEINDEXD_PID"])
+        os.kill(daemon, signal.SIGSTOP)
+        ctl("reindex", "/music/f01", "/music/f02")
+        self.wait_text("banner", "changes left to index, time left unknown")
+        self.shoot("working")
+        os.kill(daemon, signal.SIGCONT)
+        self.wait_text("banner", "Up to date: ")
+        self.shoot("up-to-date")
+        ctl("service", "pause", "--hours", "2")
+        self.wait_text("banner", "Paused until")
+        self.assertTrue(b.find_element(By.ID, "resume").is_enabled())
+        self.shoot("paused")
+        ctl("service", "resume")
+        os.kill(daemon, signal.SIGTERM)
+        self.wait_text("banner", "The indexing daemon does not answer")
+        self.shoot("daemon-down")
+
+    def shoot(self, state):
+        for width in (1280, 400):
+            self.browser.set_window_size(width, 1000)
+            self.wait.until(lambda b: b.execute_script("return document.documentElement.scrollWidth") <= width)
+            self.browser.execute_script("window.scrollTo(0, 0)")
+            self.browser.save_screenshot("%s/banner-%s-%d.png" % (OUTPUT, state, width))
 
 
 if __name__ == "__main__":

@@ -75,7 +75,8 @@ async function act(description, work) {
       const next = error.cause === 'DAEMON_UNREACHABLE' ? ' It takes effect when the indexing daemon answers again.' : '';
       show(description + ': saved, not applied yet. ' + error.message + '.' + next, 'warning', error.log);
     } else if (error.cause === 'BAD_QUERY') {
-      show(description + ': ' + error.message + '. Type a word or the start of one, in letters or digits.', 'warning');
+      show(description + ': ' + error.message.replace(/^.*?BAD_QUERY: /, '') + '. Type a word or the start of one, in letters or digits.',
+        'warning');
     } else {
       show(description + ' failed: ' + error.message, 'error', error.log);
     }
