@@ -198,11 +198,18 @@ class ConsoleTest(unittest.TestCase):
         b.execute_script("window.scrollTo(0, 0)")
         b.save_screenshot(OUTPUT + "/console.png")
 
-        # At 400 px wide nothing needs a horizontal scroll and every row shows its status and actions.
+        # At 400 px wide nothing needs a horizontal scroll, not even a long path, and every row shows its
+        # status, actions and switches in one line.
+        long_path = "/music/" + "a-folder-name-that-never-breaks-" * 3
+        os.makedirs(os.environ["QIRA_ROOT"] + "/volume1" + long_path, exist_ok=True)
+        ctl("folder", "add", long_path, "--audio", "--photo")
+        self.wait_text("folders", long_path)
         b.set_window_size(400, 1000)
         self.wait.until(lambda _: b.execute_script("return document.documentElement.scrollWidth") <= 400)
         row = self.row_of("/music/f00")
-        for label in ("Status", "Actions"):
+        self.assertEqual(self.row_of(long_path).find_element(By.CSS_SELECTOR, 'td[data-label="Indexes"]').text,
+                         "audio, photos")
+        for label in ("Status", "Actions", "Indexes"):
             cell = row.find_element(By.CSS_SELECTOR, 'td[data-label="%s"]' % label)
             self.assertTrue(cell.is_displayed())
             self.assertLessEqual(cell.rect["x"] + cell.rect["width"], 400)
@@ -231,7 +238,13 @@ class ConsoleTest(unittest.TestCase):
     def shoot(self, state):
         for width in (1280, 400):
             self.browser.set_window_size(width, 1000)
-            self.wait.until(lambda b: b.execute_script("return document.documentElement.scrollWidth") <= width)
+            try:
+                self.wait.until(lambda b: b.execute_script("return document.documentElement.scrollWidth") <= width)
+            except TimeoutException:
+                wide = self.browser.execute_script(
+                    "return [...document.querySelectorAll('body *')].filter((e) => e.getBoundingClientRect().right > %d)"
+                    ".map((e) => e.tagName + '#' + e.id + '.' + e.className + ' ' + e.textContent.slice(0, 40))" % width)
+                self.fail("the %s page is wider than %d px: %s" % (state, width, wide[:5]))
             self.browser.execute_script("window.scrollTo(0, 0)")
             self.browser.save_screenshot("%s/banner-%s-%d.png" % (OUTPUT, state, width))
 

@@ -128,7 +128,10 @@ async function loadFolders() {
     const row = body.insertRow();
     cell(row, folder.path, 'Path');
     cell(row, folder.name, 'Name');
-    for (const kind of KINDS) cell(row, folder[kind] ? 'yes' : 'no', KIND_LABELS[kind]);
+    for (const kind of KINDS) cell(row, folder[kind] ? 'yes' : 'no', KIND_LABELS[kind]).classList.add('kind');
+    // On a narrow screen the four switches read as one line.
+    const kinds = KINDS.filter((kind) => folder[kind]).map((kind) => KIND_LABELS[kind].toLowerCase());
+    cell(row, kinds.length ? kinds.join(', ') : 'nothing', 'Indexes').classList.add('kinds');
     const [word, badge] = statusOf(folder.additional);
     cell(row, word, 'Status', badge);
     cell(row, folder.additional.is_valid ? 'valid' : 'not valid', 'Valid');
