@@ -234,6 +234,12 @@ class ConsoleTest(unittest.TestCase):
         os.kill(daemon, signal.SIGTERM)
         self.wait_text("banner", "The indexing daemon does not answer")
         self.shoot("daemon-down")
+        # A pause saved while the daemon is down is a warning that says what happens next.
+        self.click("#pause")
+        self.wait_text("message", "Pause: saved, not applied yet.")
+        self.wait_text("message", "It takes effect when the indexing daemon answers again.")
+        self.assertEqual(b.find_element(By.ID, "message").get_attribute("class"), "warning")
+        self.wait_text("banner", "The indexing daemon does not answer")
 
     def shoot(self, state):
         for width in (1280, 400):
