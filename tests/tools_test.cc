@@ -407,6 +407,11 @@ TEST_F(ToolTest, ExplainTellsWhetherAFileIsInTheIndexAndWhatKeepsItOut) {
     EXPECT_NE(text.find("the file: type document (switched off); in the index: no\n"), std::string::npos) << text;
     EXPECT_NE(text.find("12 more rules passed or were not needed (--rules shows them)"), std::string::npos) << text;
     EXPECT_EQ(testkit::CountOf(Ctl({"explain", "--rules", "/music/a/notes.txt"}).out, "\npass "), 12u);
+    // The listing counts each folder's files in the index, none where a share has no index yet.
+    const Json::Value listing = testkit::ParseJson(Ctl({"--json", "folder", "list", "--additional", "indexed_files"}).out)["result"];
+    EXPECT_EQ(listing["folder"][0]["additional"], J(R"({"indexed_files": 1})"));
+    EXPECT_EQ(listing["folder"][1]["additional"], J(R"({"indexed_files": 0})"));
+    EXPECT_NE(Ctl({"folder", "list", "--additional", "indexed_files"}).out.find("  FILES\n"), std::string::npos);
 }
 
 // wait ends when indexing is finished, or at its time-out with 3 while work is pending; progress

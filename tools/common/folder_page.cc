@@ -1,14 +1,71 @@
 #include "folder_page.h"
 
-#include <algorithm>
+#include <fcntl.h>
+#include <unistd.h>
 
-#include "fileindex/index_mgr.h"
+#include <algorithm>
+#include <chrono>
+#include <map>
+#include <memory>
+
+#include "fileindex/fileindex.h"
 #include "folder_view.h"
+#include "search_index.h"
 
 namespace tools {
 namespace {
 
 using QIRA::FILEINDEX::IndexMgr;
+
+constexpr char kIndexedFiles[] = "indexed_files";
+constexpr std::chrono::seconds kCountBudget{1};
+
+// The share's index as a search reads it, or null (`missing` when the share has none yet).
+std::unique_ptr<SearchIndex> OpenForCounting(const std::string& share, bool& missing) {
+    std::string shareDir;
+    IndexProblem problem = IndexProblem::None;
+    missing = false;
+    if (!QIRA::FILEINDEX::GetFullPath(shareDir, "/" + share) ||
+        faccessat(AT_FDCWD, shareDir.c_str(), R_OK | X_OK, AT_EACCESS) != 0) {
+        return nullptr;
+    }
+    std::string error;
+    auto index = SearchIndex::Open(shareDir, false, problem, error);
+    missing = problem == IndexProblem::Missing;
+    if (index) index->SetDeadline(std::chrono::steady_clock::now() + kCountBudget);
+    return index;
+}
+
+// Each folder's files in its share's index, every share's index opened once; none for a share
+// without an index yet.
+void AddIndexedFiles(Json::Value& listing) {
+    std::map<std::string, std::pair<std::unique_ptr<SearchIndex>, bool>> indexes;
+    for (auto& folder : listing["folder"]) {
+        const std::string path = folder["path"].asString();
+        std::string share;
+        QIRA::FILEINDEX::GetShareNameByPath(share, path);
+        auto found = indexes.find(share);
+        if (found == indexes.end()) {
+            bool missing = false;
+            auto index = OpenForCounting(share, missing);
+            found = indexes.emplace(share, std::make_pair(std::move(index), missing)).first;
+        }
+        const auto& [index, missing] = found->second;
+        const long long count = index ? index->CountUnder(path) : missing ? 0 : -1;
+        folder["additional"][kIndexedFiles] = count < 0 ? Json::Value() : Json::Value(static_cast<Json::Int64>(count));
+    }
+}
+
+// The facts of `additional` that the library knows.
+Json::Value LibraryFacts(const Json::Value& additional, bool& indexedFiles) {
+    Json::Value facts(Json::arrayValue);
+    indexedFiles = false;
+    for (const auto& name : additional) {
+        if (name == kIndexedFiles) indexedFiles = true;
+        else facts.append(name);
+    }
+    return facts;
+}
 
 // The library pages DESC as its first records reversed, so descending pages are cut from the
 // ascending order here.
@@ -29,12 +86,18 @@ bool DescendingPage(Json::Value& out, unsigned long offset, unsigned long limit,
 
 }  // namespace
 
+bool IsListingFact(const std::string& name) { return name == "status" || name == "is_valid" || name == kIndexedFiles; }
+
 bool ListFolderPage(Json::Value& out, unsigned long offset, unsigned long limit, const std::string& sortBy, bool descending,
                     const Json::Value& additional) {
-    const bool listed = descending ? DescendingPage(out, offset, limit, sortBy, additional)
-                                   : IndexMgr::List(out, offset, limit, sortBy, "ASC", additional);
-    if (listed) AddRefusingRules(out);
-    return listed;
+    bool indexedFiles = false;
+    const Json::Value facts = LibraryFacts(additional, indexedFiles);
+    const bool listed = descending ? DescendingPage(out, offset, limit, sortBy, facts)
+                                   : IndexMgr::List(out, offset, limit, sortBy, "ASC", facts);
+    if (!listed) return false;
+    AddRefusingRules(out);
+    if (indexedFiles) AddIndexedFiles(out);
+    return true;
 }
 
 }  // namespace tools

@@ -438,6 +438,13 @@ long long SearchIndex::Count() {
     return count.Ok() && count.Step() ? count.Number(0) : -1;
 }
 
+long long SearchIndex::CountUnder(const std::string& path) {
+    Statement count(db_, std::string("SELECT count(*) FROM files WHERE ") + kUnder);
+    if (!count.Ok()) return -1;
+    count.Bind(1, path);
+    return count.Step() ? count.Number(0) : -1;
+}
+
 bool SearchIndex::Search(const std::string& query, const std::string& type, int limit, std::vector<SearchHit>& hits,
                          std::string& error) {
     error = QueryError(query);

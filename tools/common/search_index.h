@@ -92,6 +92,8 @@ public:
     // Every stored path at or beneath `path`, with its size and modification time; false on failure.
     bool Under(const std::string& path, std::map<std::string, std::pair<long long, long long>>& stored);
     long long Count();
+    // Stored paths at or beneath `path`; -1 on failure.
+    long long CountUnder(const std::string& path);
 
     // The best hits for `query` (words, each a prefix, all required), of one type when `type` is
     // not empty; hits ranked alike in path order, so that pages follow each other. False, with `error` set, when the query fails QueryError or the statement fails.

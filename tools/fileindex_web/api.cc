@@ -211,8 +211,8 @@ void GuardHost(HttpServer& server, std::shared_ptr<const HostCheck> check) {
 void AddApiRoutes(HttpServer& server, const Token& token) {
     server.Get("/api/folders", [](const Request& req, Response& res) {
         for (const auto& name : Additional(Param(req, "additional"))) {
-            if (name != "status" && name != "is_valid") {
-                return Refuse(res, 400, "unknown additional fact \"" + name.asString() + "\"; use status, is_valid");
+            if (!tools::IsListingFact(name.asString())) {
+                return Refuse(res, 400, "unknown additional fact \"" + name.asString() + "\"; use status, is_valid, indexed_files");
             }
         }
         Run(res, "list folders", [&](Json::Value& result) {

@@ -40,13 +40,16 @@ int List(Context& ctx, unsigned long offset, unsigned long limit, const std::str
     }
     Table table;
     std::vector<std::string> header = {"PATH", "NAME", "DOCUMENT", "AUDIO", "VIDEO", "PHOTO"};
-    for (const auto& key : additional) header.push_back(key == "is_valid" ? "VALID" : key == "status" ? "STATUS" : key);
+    for (const auto& key : additional) {
+        header.push_back(key == "is_valid" ? "VALID" : key == "status" ? "STATUS" : key == "indexed_files" ? "FILES" : key);
+    }
     table.push_back(header);
     for (auto& folder : out["folder"]) {
         std::vector<std::string> row = {folder["path"].asString(), folder["name"].asString(), YesNo(folder["document"]),
                                         YesNo(folder["audio"]),     YesNo(folder["video"]),    YesNo(folder["photo"])};
         for (const auto& key : additional) {
-            row.push_back(key == "status" ? tools::StatusText(folder["additional"]) : YesNo(folder["additional"][key]));
+            const Json::Value& fact = folder["additional"][key];
+            row.push_back(key == "status" ? tools::StatusText(folder["additional"]) : fact.isIntegral() ? fact.asString() : YesNo(fact));
         }
         table.push_back(row);
     }
@@ -194,7 +197,7 @@ void AddFolderCommands(CLI::App& app, Context& ctx) {
     list->add_flag("--desc", *descending, "Descending page");
     list->add_option("--additional", *additional, "Facts to add, comma-separated")
         ->delimiter(',')
-        ->check(CLI::IsMember({"status", "is_valid"}));
+        ->check(CLI::IsMember({"status", "is_valid", "indexed_files"}));
     list->callback([&ctx, offset, limit, sortBy, descending, additional] {
         ctx.status = List(ctx, *offset, *limit, *sortBy, *descending, *additional);
     });

@@ -110,7 +110,7 @@ function button(parent, label, onClick, name) {
 
 function fetchPage() {
   return api('GET', '/api/folders?' + new URLSearchParams({ offset: state.offset, limit: state.limit, sort_by: state.sortBy,
-    sort_direction: state.direction, additional: 'status,is_valid' }));
+    sort_direction: state.direction, additional: 'status,is_valid,indexed_files' }));
 }
 
 // A folder that cannot be indexed carries the word "paused"; the console says why instead.
@@ -135,6 +135,8 @@ async function loadFolders() {
     const [word, badge] = statusOf(folder.additional);
     cell(row, word, 'Status', badge);
     cell(row, folder.additional.is_valid ? 'valid' : 'not valid', 'Valid');
+    const files = folder.additional.indexed_files;
+    cell(row, files === null ? 'unknown' : files + (files === 1 ? ' file' : ' files'), 'In the index');
     const actions = row.insertCell();
     actions.dataset.label = 'Actions';
     button(actions, 'Edit', () => edit(folder), 'Edit ' + folder.path);
