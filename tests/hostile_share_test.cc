@@ -299,12 +299,13 @@ TEST_F(HostileShareTest, QueueTakeNeverFollowsLinksSetsAsideWrongKindsAndLosesNo
     EXPECT_NE(testing::internal::GetCapturedStdout().find("1000 records not applied"), std::string::npos);
     EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
     std::vector<std::string> first;
-    for (const size_t expected : {1000u, 1000u, 500u}) {
+    for (const auto& [expected, applied] : {std::pair{1000u, 1000u}, {1000u, 2000u}, {500u, 0u}}) {
         EXPECT_EQ(music.ApplyNext(1000, [&](const Batch& batch) {
             if (first.empty()) first.push_back(batch.front().path);
             return true;
         }), expected);
         EXPECT_EQ(music.HasMore(), expected == 1000u);
+        EXPECT_EQ(music.Applied(), applied);  // of the companion being read
     }
     EXPECT_EQ(first, std::vector<std::string>{music_ + "/a/0.txt"});  // the failed batch came again
     EXPECT_FALSE(testkit::Exists(QueueOf("music") + ".tmp"));

@@ -5,6 +5,8 @@
 
 #include <httplib.h>
 
+#include "daemon_progress.h"
+
 #include <algorithm>
 
 namespace {
@@ -182,6 +184,9 @@ TEST_F(LiveApplianceTest, AFloodInOneShareDoesNotHoldAnotherBack) {
     ASSERT_NE(photo, std::string::npos) << log;
     EXPECT_LT(photo, log.rfind("share music: ")) << log;  // music was served again after photo
     EXPECT_TRUE(Finds("served", Paths{"/photo/a/found.txt"}));
+    const Json::Value published = tools::ReadDaemonProgress()["shares"]["music"];
+    EXPECT_EQ(published["applied"].asUInt64(), 0u);  // nothing taken is left
+    EXPECT_GE(published["up_to_date"].asInt64(), static_cast<Json::Int64>(time(nullptr)) - 600);
 }
 
 // SIGTERM stops the daemon amid a flood rather than after draining it.
@@ -195,6 +200,8 @@ TEST_F(LiveApplianceTest, TheDaemonStopsAmidAFlood) {
     indexer_ = -1;
     const std::string log = testkit::ReadFile(daemonLog_).substr(before);
     EXPECT_LT(testkit::RecordsApplied(log, "music"), 200000u);
+    // What it published tells how far it got with the batch it had taken, so the batch never looks frozen.
+    EXPECT_EQ(tools::ReadDaemonProgress()["shares"]["music"]["applied"].asUInt64(), testkit::RecordsApplied(log, "music"));
     EXPECT_NE(log.find("fileindexd-ref: stopped"), std::string::npos);
 }
 

@@ -326,6 +326,10 @@ TEST(BannerTest, OneSentenceInOrderOfWhatMattersMost) {
         EXPECT_EQ(banner["resume_time"].isNull(), state != "paused" || facts.resumeTime <= 0) << text;
         EXPECT_EQ(banner["seconds_left"], facts.rate > 0 ? Json::Value(20) : Json::Value()) << text;
     }
+    // What is pending less what the daemon applied of the batch it took, never below none.
+    EXPECT_EQ(tools::PendingOf(J(R"({"shares": [{"share": "music", "pending": 10}, {"share": "photo", "pending": 5}]})"),
+                               J(R"({"shares": {"music": {"applied": 4}, "photo": {"applied": 9}}})")),
+              6u);
     for (const auto& [seconds, words] : std::vector<std::pair<long long, std::string>>{
              {0, "0 s"}, {59, "59 s"}, {60, "1 min"}, {61, "2 min"}, {3600, "1 h"}, {3661, "1 h 2 min"}}) {
         EXPECT_EQ(tools::DurationText(seconds), words);

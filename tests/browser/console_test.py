@@ -139,7 +139,7 @@ class ConsoleTest(unittest.TestCase):
         self.wait.until(lambda _: "out of space" not in self.text("shares"))
         self.wait.until(lambda _: self.status_of("/music/f00") != "err_no_space")
 
-        # Paused with work held back; the idle share's bar is drawn empty, never full.
+        # Paused with work held back; the idle share's bar is full, and says since when it is up to date.
         hours = b.find_element(By.ID, "pause-hours")
         hours.clear()
         hours.send_keys("0")
@@ -151,7 +151,9 @@ class ConsoleTest(unittest.TestCase):
         self.wait.until(lambda _: "2 pending" in self.text("progress"))
         photo = [p for p in b.find_elements(By.CSS_SELECTOR, ".share-progress") if p.text.startswith("photo")][0]
         self.assertIn("0 pending, 0.0/s, done", photo.text)
-        self.assertEqual(photo.find_element(By.CSS_SELECTOR, ".bar").get_attribute("aria-valuenow"), "0")
+        done = photo.find_element(By.CSS_SELECTOR, ".bar")  # nothing pending is a full bar, for every share alike
+        self.assertEqual((done.get_attribute("aria-valuenow"), done.get_attribute("aria-valuetext")), ("100", "done"))
+        self.assertIn("up to date since", photo.text)
         self.assertRegex(self.text("progress"), r"music\s+2 pending, 0\.0/s, time left unknown")
 
         # An explanation in words: the problem, the rules with their facts as text.

@@ -7,6 +7,7 @@
 #include <cmath>
 #include <ctime>
 
+#include "daemon_progress.h"
 #include "fileindex/fileindex.h"
 #include "search_index.h"
 #include "time_text.h"
@@ -41,9 +42,11 @@ std::string WorkingText(const BannerFacts& facts, Json::Value& secondsLeft) {
 
 }  // namespace
 
-unsigned long long PendingOf(const Json::Value& progress) {
+unsigned long long PendingOf(const Json::Value& progress, const Json::Value& daemonProgress) {
     unsigned long long pending = 0;
-    for (const auto& share : progress["shares"]) pending += share["pending"].asUInt64();
+    for (const auto& share : progress["shares"]) {
+        pending += StillPending(share["pending"].asUInt64(), daemonProgress, share["share"].asString());
+    }
     return pending;
 }
 

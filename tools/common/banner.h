@@ -32,8 +32,9 @@ Json::Value Banner(const BannerFacts& facts);
 // counts none. Null when an index could not be read.
 Json::Value FilesIndexed(const std::vector<std::string>& shares);
 
-// The records pending over every share of a progress report (GetProgress).
-unsigned long long PendingOf(const Json::Value& progress);
+// The records pending over every share of a progress report (GetProgress), less what the daemon
+// reports applied of the batches it has taken (ReadDaemonProgress).
+unsigned long long PendingOf(const Json::Value& progress, const Json::Value& daemonProgress);
 
 // "1 h 12 min", "5 min", "40 s".
 std::string DurationText(long long seconds);

@@ -9,6 +9,7 @@
 #include "envelope.h"
 #include "fileindex/fileindex.h"
 #include "banner.h"
+#include "daemon_progress.h"
 #include "file_explain.h"
 #include "folder_page.h"
 #include "folder_view.h"
@@ -150,7 +151,14 @@ bool ServiceStatus(Json::Value& result) {
     bool stuck = false;
     const std::string reason = tools::NotDoneReason(word, folders, result["daemon"], stuck);
     result["not_done"] = reason.empty() ? Json::Value() : Json::Value(reason);
-    tools::BannerFacts facts{word, resumeTime, result["daemon"]["answers"].asBool(), folders.size(), tools::PendingOf(result["progress"]),
+    const Json::Value daemonProgress = tools::ReadDaemonProgress();
+    for (auto& share : result["progress"]["shares"]) {
+        const Json::Value& published = daemonProgress["shares"][share["share"].asString()];
+        share["applied"] = published["applied"].isUInt64() ? published["applied"] : Json::Value(0);
+        share["up_to_date"] = published["up_to_date"].isInt64() ? published["up_to_date"] : Json::Value();
+    }
+    tools::BannerFacts facts{word, resumeTime, result["daemon"]["answers"].asBool(), folders.size(),
+                             tools::PendingOf(result["progress"], daemonProgress),
                              reason, tools::FilesIndexed(tools::SharesOf(folders)), 0};
     facts.rate = g_pendingRate.Update(facts.pending);
     result["banner"] = tools::Banner(facts);

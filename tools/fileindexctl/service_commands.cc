@@ -3,6 +3,7 @@
 
 #include "banner.h"
 #include "commands.h"
+#include "daemon_progress.h"
 #include "fileindex/fileindex.h"
 #include "pause.h"
 #include "service_view.h"
@@ -69,7 +70,8 @@ int Status(Context& ctx) {
     Json::Value progress;
     bool stuck = false;
     const std::string notDone = tools::NotDoneReason(word, folders, out["daemon"], stuck);
-    const unsigned long long pending = QIRA::FILEINDEX::GetProgress(progress) ? tools::PendingOf(progress) : 0;
+    const unsigned long long pending =
+        QIRA::FILEINDEX::GetProgress(progress) ? tools::PendingOf(progress, tools::ReadDaemonProgress()) : 0;
     out["banner"] = tools::Banner({word, resumeTime, out["daemon"]["answers"].asBool(), folders.size(), pending, notDone,
                                    tools::FilesIndexed(tools::SharesOf(folders)), 0});
     Table table = {{"indexing", out["banner"]["text"].asString()},

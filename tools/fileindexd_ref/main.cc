@@ -22,6 +22,7 @@
 #include "appliance_root.h"
 #include "cli.h"
 #include "daemon_frame.h"
+#include "daemon_progress.h"
 #include "fileindex/fileindex.h"
 #include "queue_take.h"
 #include "service_view.h"
@@ -147,7 +148,9 @@ private:
         for (bool more = true; more && !g_stop && std::chrono::steady_clock::now() < passEnd;) {
             more = false;
             for (ShareWork* work : serving) {
-                more = ServeSlice(*work, folders) || more;
+                size_t applied = 0;
+                more = ServeSlice(*work, folders, applied) || more;
+                Publish(*work, applied > 0);
                 AcceptPending();
                 if (Paused() || g_stop) return;
             }
@@ -167,10 +170,22 @@ private:
         }
     }
 
-    // Batches of one share for at most kSlice; true when its companion holds more.
-    bool ServeSlice(ShareWork& work, const std::vector<QIRA::FILEINDEX::Folder>& folders) {
+    // Tells the tools how far the share has got: the records of its taken batch applied, and when
+    // it last finished what it had taken. Written only when that changes.
+    void Publish(ShareWork& work, bool appliedSome) {
+        Json::Value& share = published_["shares"][work.indexer.Share()];
+        const Json::Value applied = static_cast<Json::UInt64>(work.queue.Applied());
+        const bool caughtUp = !work.queue.HasMore() && (appliedSome || share["up_to_date"].isNull());
+        if (share["applied"] == applied && !caughtUp) return;
+        share["applied"] = applied;
+        if (caughtUp) share["up_to_date"] = static_cast<Json::Int64>(time(nullptr));
+        tools::WriteDaemonProgress(published_);
+    }
+
+    // Batches of one share for at most kSlice, counted in `applied`; true when its companion holds
+    // more.
+    bool ServeSlice(ShareWork& work, const std::vector<QIRA::FILEINDEX::Folder>& folders, size_t& applied) {
         const auto sliceEnd = std::chrono::steady_clock::now() + kSlice;
-        size_t applied = 0;
         do {
             applied += work.queue.ApplyNext(kBatchSize, [&](const fileindexd_ref::Batch& batch) {
                 if (work.indexer.Apply(batch, folders)) return true;
@@ -203,6 +218,7 @@ private:
     }
 
     std::map<std::string, std::unique_ptr<ShareWork>> shares_;
+    Json::Value published_;  // what Publish last wrote
     int listener_;
     long long resume_time_ = -1;
 };

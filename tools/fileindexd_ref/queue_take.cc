@@ -101,6 +101,7 @@ size_t QueueTake::ApplyNext(size_t batchSize, const std::function<bool(const Bat
         dev_ = st.st_dev;
         ino_ = st.st_ino;
         offset_ = 0;
+        applied_ = 0;
     }
     Batch batch;
     off_t next = offset_;
@@ -109,6 +110,7 @@ size_t QueueTake::ApplyNext(size_t batchSize, const std::function<bool(const Bat
         [&](const QIRA::FILEINDEX::QueueRecordView& record) { batch.push_back(record); }, [](off_t, size_t) {}, next);
     if (reading != QIRA::FILEINDEX::QueueReading::Read) {
         Remove(eaDir.Get(), kCompanion, st.st_dev, st.st_ino);  // the library marked the share
+        applied_ = 0;
         return 0;
     }
     if (!batch.empty() && !apply(batch)) {
@@ -118,10 +120,12 @@ size_t QueueTake::ApplyNext(size_t batchSize, const std::function<bool(const Bat
         return 0;
     }
     offset_ = next;
+    applied_ += batch.size();
     more_ = offset_ < st.st_size;
     if (!more_) {
         Remove(eaDir.Get(), kCompanion, st.st_dev, st.st_ino);
         offset_ = 0;
+        applied_ = 0;
     }
     return batch.size();
 }

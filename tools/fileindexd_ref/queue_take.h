@@ -38,6 +38,8 @@ public:
 
     // True while the companion holds records not yet applied.
     bool HasMore() const { return more_; }
+    // Records of the companion being read that are applied already; 0 when none is being read.
+    size_t Applied() const { return applied_; }
 
 private:
     tools::Fd OpenEaDir() const;
@@ -50,6 +52,7 @@ private:
     dev_t dev_ = 0;  // the companion being read, and how far
     ino_t ino_ = 0;
     off_t offset_ = 0;
+    size_t applied_ = 0;
     bool more_ = false;
 };
 

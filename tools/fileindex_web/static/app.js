@@ -241,7 +241,7 @@ function renderShares(shares) {
 function drain(name, pending, seconds) {
   const before = state.previous && state.previous[name];
   const rate = before !== undefined && seconds > 0 && before > pending ? (before - pending) / seconds : 0;
-  const left = pending === 0 ? 'done' : rate > 0 ? 'about ' + Math.ceil(pending / rate) + ' s left' : 'time left unknown';
+  const left = pending === 0 ? 'done' : rate > 0 ? 'about ' + durationText(Math.ceil(pending / rate)) + ' left' : 'time left unknown';
   return { rate, left };
 }
 
@@ -252,8 +252,10 @@ function renderProgress(progress) {
   target.replaceChildren();
   const pendings = {};
   for (const share of progress.shares) {
-    pendings[share.share] = share.pending;
-    state.largest[share.share] = Math.max(state.largest[share.share] || 0, share.pending);
+    // What the daemon has applied of the batch it took is no longer pending, though still queued.
+    const pending = Math.max(0, share.pending - (share.applied || 0));
+    pendings[share.share] = pending;
+    state.largest[share.share] = Math.max(state.largest[share.share] || 0, pending);
     const largest = state.largest[share.share];
     const line = document.createElement('p');
     line.className = 'share-progress';
@@ -262,13 +264,16 @@ function renderProgress(progress) {
     bar.setAttribute('role', 'progressbar');
     bar.setAttribute('aria-label', 'Indexing of share ' + share.share);
     const done = document.createElement('span');
-    const percent = largest === 0 ? 0 : Math.round(100 * (largest - share.pending) / largest);
+    // Nothing pending is a full bar, for every share alike.
+    const percent = pending === 0 ? 100 : Math.round(100 * (largest - pending) / largest);
     done.style.width = percent + '%';
     bar.setAttribute('aria-valuenow', String(percent));
+    bar.setAttribute('aria-valuetext', pending === 0 ? 'done' : pending + ' pending');
     bar.appendChild(done);
-    const { rate, left } = drain(share.share, share.pending, seconds);
+    const { rate, left } = drain(share.share, pending, seconds);
     const unread = share.unread.length ? ' (' + share.unread.join(', ') + ' not read: sparse or too large)' : '';
-    line.append(share.share + ' ', bar, ' ' + share.pending + ' pending' + unread + ', ' + rate.toFixed(1) + '/s, ' + left);
+    const since = pending === 0 && share.up_to_date ? ', up to date since ' + new Date(share.up_to_date * 1000).toLocaleTimeString() : '';
+    line.append(share.share + ' ', bar, ' ' + pending + ' pending' + unread + ', ' + rate.toFixed(1) + '/s, ' + left + since);
     target.appendChild(line);
   }
   if (!progress.shares.length) target.textContent = 'Nothing is indexed.';
