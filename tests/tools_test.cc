@@ -388,7 +388,7 @@ TEST_F(ToolTest, ExplainTellsWhetherAFileIsInTheIndexAndWhatKeepsItOut) {
         {"/music/#recycle/z.mp3", [] {}, "not indexed: the path lies in the share's recycle bin"},
         {"/music/a/new.mp3", [] {}, "not in the index yet: the indexing daemon has not reached it"},
         {"/music/a/gone.mp3", [] {}, "not indexed: nothing is at that path"},
-        {"/photo/a/p.jpg", [] {}, "the index could not be read: the share has no index yet"},
+        {"/photo/a/p.jpg", [] {}, "not in the index yet: the indexing daemon has not reached it"},  // no index yet
         {"/music/a/new.mp3", [this] { testkit::AppendFile(QueueOf("music"), "{\"event\":2,\"path\":\"" + music_ + "/a/new.mp3\"}\n"); },
          "not in the index yet: 1 change waiting"},
         {"/music/a/new.mp3", [] { ASSERT_TRUE(StatusMgr::Pause(0)); }, "not in the index yet: indexing is paused with 1 change waiting"},

@@ -1,15 +1,12 @@
 #include "banner.h"
 
-#include <fcntl.h>
-#include <unistd.h>
-
 #include <chrono>
 #include <cmath>
 #include <ctime>
 
 #include "daemon_progress.h"
 #include "fileindex/fileindex.h"
-#include "search_index.h"
+#include "share_index.h"
 #include "time_text.h"
 
 namespace tools {
@@ -92,17 +89,12 @@ Json::Value FilesIndexed(const std::vector<std::string>& shares) {
     unsigned long long files = 0;
     for (const auto& share : shares) {
         std::string shareDir;
-        if (!QIRA::FILEINDEX::GetFullPath(shareDir, "/" + share) ||
-            faccessat(AT_FDCWD, shareDir.c_str(), R_OK | X_OK, AT_EACCESS) != 0) {
-            return Json::Value();
-        }
+        if (!QIRA::FILEINDEX::GetFullPath(shareDir, "/" + share)) shareDir.clear();
         IndexProblem problem = IndexProblem::None;
-        std::string error;
-        const auto index = SearchIndex::Open(shareDir, false, problem, error);
+        Cause cause;
+        const auto index = OpenShareIndex(share, shareDir, kCountBudget, problem, cause);
         if (!index && problem == IndexProblem::Missing) continue;
-        if (!index) return Json::Value();
-        index->SetDeadline(std::chrono::steady_clock::now() + kCountBudget);
-        const long long count = index->Count();
+        const long long count = index ? index->Count() : -1;
         if (count < 0) return Json::Value();
         files += static_cast<unsigned long long>(count);
     }

@@ -1,16 +1,14 @@
 #include "file_explain.h"
 
-#include <fcntl.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
+#include <algorithm>
 #include <chrono>
-#include <map>
 
 #include "fileindex/fileindex.h"
 #include "file_types.h"
 #include "pause.h"
-#include "search_index.h"
+#include "share_index.h"
 #include "service_view.h"
 
 namespace tools {
@@ -24,29 +22,18 @@ std::string KindOf(const Json::Value& fullPath) {
     return S_ISREG(st.st_mode) ? "file" : S_ISDIR(st.st_mode) ? "directory" : "other";
 }
 
-// Entries of the share's index at or beneath the share path; false with `problem` when the index
-// cannot be read.
-bool IndexedEntries(const std::string& share, const std::string& path, size_t& count, std::string& problem) {
+// Entries of the share's index at or beneath the share path, none while the share has no index
+// yet; false with `problem` when the index cannot be read.
+bool IndexedEntries(const std::string& share, const std::string& path, long long& count, std::string& problem) {
     std::string shareDir;
-    if (!QIRA::FILEINDEX::GetFullPath(shareDir, "/" + share)) {
-        problem = "share " + share + " cannot be resolved";
-        return false;
-    }
-    if (faccessat(AT_FDCWD, shareDir.c_str(), R_OK | X_OK, AT_EACCESS) != 0) {
-        problem = "you may not read the directory of share " + share;
-        return false;
-    }
+    if (!QIRA::FILEINDEX::GetFullPath(shareDir, "/" + share)) shareDir.clear();
     IndexProblem kind = IndexProblem::None;
-    const auto index = SearchIndex::Open(shareDir, false, kind, problem);
-    if (!index) return false;
-    index->SetDeadline(std::chrono::steady_clock::now() + kIndexBudget);
-    std::map<std::string, std::pair<long long, long long>> stored;
-    if (!index->Under(path, stored)) {
-        problem = "the index of share " + share + " could not be read in time or is damaged";
-        return false;
-    }
-    count = stored.size();
-    return true;
+    Cause cause;
+    const auto index = OpenShareIndex(share, shareDir, kIndexBudget, kind, cause);
+    count = index ? index->CountUnder(path) : kind == IndexProblem::Missing ? 0 : -1;
+    if (count >= 0) return true;
+    problem = index ? "the index of share " + share + " could not be read in time or is damaged" : cause.text;
+    return false;
 }
 
 Json::Value FileFacts(const Json::Value& e) {
@@ -56,11 +43,11 @@ Json::Value FileFacts(const Json::Value& e) {
     file["type"] = type.empty() ? Json::Value() : Json::Value(type);
     const Json::Value& folder = e["governing_folder"];
     file["type_switched_on"] = type.empty() || folder.isNull() ? Json::Value() : folder[type];
-    size_t count = 0;
+    long long count = 0;
     std::string problem;
     const bool read = IndexedEntries(e["share"].asString(), e["path"].asString(), count, problem);
     file["in_index"] = read ? Json::Value(count > 0) : Json::Value();
-    file["indexed_files"] = static_cast<Json::UInt64>(count);
+    file["indexed_files"] = static_cast<Json::Int64>(std::max(count, 0LL));
     file["index_problem"] = read ? Json::Value() : Json::Value(problem);
     return file;
 }

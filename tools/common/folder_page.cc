@@ -1,8 +1,5 @@
 #include "folder_page.h"
 
-#include <fcntl.h>
-#include <unistd.h>
-
 #include <algorithm>
 #include <chrono>
 #include <map>
@@ -10,7 +7,7 @@
 
 #include "fileindex/fileindex.h"
 #include "folder_view.h"
-#include "search_index.h"
+#include "share_index.h"
 
 namespace tools {
 namespace {
@@ -23,16 +20,11 @@ constexpr std::chrono::seconds kCountBudget{1};
 // The share's index as a search reads it, or null (`missing` when the share has none yet).
 std::unique_ptr<SearchIndex> OpenForCounting(const std::string& share, bool& missing) {
     std::string shareDir;
+    if (!QIRA::FILEINDEX::GetFullPath(shareDir, "/" + share)) shareDir.clear();
     IndexProblem problem = IndexProblem::None;
-    missing = false;
-    if (!QIRA::FILEINDEX::GetFullPath(shareDir, "/" + share) ||
-        faccessat(AT_FDCWD, shareDir.c_str(), R_OK | X_OK, AT_EACCESS) != 0) {
-        return nullptr;
-    }
-    std::string error;
-    auto index = SearchIndex::Open(shareDir, false, problem, error);
+    Cause cause;
+    auto index = OpenShareIndex(share, shareDir, kCountBudget, problem, cause);
     missing = problem == IndexProblem::Missing;
-    if (index) index->SetDeadline(std::chrono::steady_clock::now() + kCountBudget);
     return index;
 }
 

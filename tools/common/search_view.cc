@@ -1,14 +1,12 @@
 #include "search_view.h"
 
-#include <fcntl.h>
-#include <unistd.h>
-
 #include <algorithm>
 #include <chrono>
 
 #include "fileindex/fileindex.h"
 #include "search_index.h"
 #include "service_view.h"
+#include "share_index.h"
 #include "text_safety.h"
 #include "time_text.h"
 
@@ -51,22 +49,6 @@ Json::Value HitJson(const std::string& share, const SearchHit& hit) {
     return entry;
 }
 
-Cause IndexCause(IndexProblem problem, const std::string& share, const std::string& error) {
-    switch (problem) {
-        case IndexProblem::Missing:
-            return {"INDEX_MISSING", 0, "share " + share + " has no index yet: " + error, 404};
-        case IndexProblem::Damaged:
-            return {"INDEX_DAMAGED", 0,
-                    "the index of share " + share + " is damaged or not this service's (" + error +
-                        "); the indexing daemon sets it aside and rebuilds it",
-                    503};
-        case IndexProblem::TimedOut:
-            return {"SEARCH_TIMED_OUT", 0, "the search of share " + share + " took too long: " + error, 503};
-        default:
-            return {"INDEX_UNREADABLE", 0, "the index of share " + share + " cannot be read: " + error, 503};
-    }
-}
-
 Json::Value CauseJson(const std::string& share, const Cause& cause) {
     Json::Value entry(Json::objectValue);
     entry["share"] = share;
@@ -79,22 +61,10 @@ Json::Value CauseJson(const std::string& share, const Cause& cause) {
 // with `cause` when its index cannot be read.
 bool SearchOne(const SearchRequest& request, const SearchTarget& target, std::vector<SearchHit>& hits, long long& total,
                Cause& cause) {
-    if (target.shareDir.empty()) {
-        cause = {"SHARE_UNKNOWN", 0, "no share is named \"" + target.share + "\"", 404};
-        return false;
-    }
-    if (faccessat(AT_FDCWD, target.shareDir.c_str(), R_OK | X_OK, AT_EACCESS) != 0) {
-        cause = {"NOT_PERMITTED", 0, "you may not read the directory of share " + target.share, 403};
-        return false;
-    }
     IndexProblem problem = IndexProblem::None;
+    const auto index = OpenShareIndex(target.share, target.shareDir, kSearchBudget, problem, cause);
+    if (!index) return false;
     std::string error;
-    const auto index = SearchIndex::Open(target.shareDir, false, problem, error);
-    if (!index) {
-        cause = IndexCause(problem, target.share, error);
-        return false;
-    }
-    index->SetDeadline(std::chrono::steady_clock::now() + kSearchBudget);
     if (index->Search(request.query, request.type, request.offset + request.limit, hits, error) &&
         index->CountHits(request.query, request.type, total, error)) {
         return true;
