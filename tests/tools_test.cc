@@ -265,6 +265,8 @@ TEST_F(ToolTest, BashCompletionOffersCommandsOptionsAndIndexedFolders) {
     };
     const std::vector<std::tuple<std::string, int, std::string>> cases = {
         {"fileindexctl sh", 1, "share\n"},
+        {"fileindexctl st", 1, "status\n"},
+        {"fileindexctl search --o", 2, "--offset\n"},
         {"fileindexctl share re", 2, "remove rename resume revive\n"},
         {"fileindexctl share revive m", 3, "music\n"},
         {"fileindexctl is ro", 2, "roomy\n"},
@@ -295,6 +297,7 @@ TEST_F(ToolTest, ServiceStatusShowsPauseAndFlags) {
                     "no_space": ["music"], "need_reindex": []})"));
     const auto text = Ctl({"service", "status"}).out;
     EXPECT_EQ(text.rfind("indexing          Paused until resumed\n", 0), 0u) << text;
+    EXPECT_EQ(Ctl({"status"}).out, text);
     EXPECT_NE(text.find("pause             paused until resumed"), std::string::npos) << text;
     EXPECT_NE(text.find("daemon            answers at " + DaemonSocketPath()), std::string::npos);
     EXPECT_NE(text.find("watched in music  " + music_ + "/a"), std::string::npos);

@@ -25,7 +25,7 @@ _fileindexctl() {
     done
     local words="" options=""
     case "$command" in
-        "") words="folder service share is reindex migrate explain progress wait" ;;
+        "") words="status folder service share is reindex migrate explain search progress wait" ;;
         folder)
             case "$sub" in
                 "") words="list get add set delete status" ;;
@@ -51,7 +51,12 @@ _fileindexctl() {
             esac
             ;;
         is) [ -z "$sub" ] && words="share-indexed path-indexed full-path-indexed contains-indexed indexable skipped roomy" ;;
-        reindex | explain) words=$(_fileindexctl_indexed_paths) ;;
+        reindex) words=$(_fileindexctl_indexed_paths) ;;
+        explain)
+            options="--rules"
+            words=$(_fileindexctl_indexed_paths)
+            ;;
+        search) options="--type --share --limit --offset" ;;
         progress) options="--watch --interval --samples" ;;
         wait) options="--timeout" ;;
     esac

@@ -88,9 +88,11 @@ int Status(Context& ctx) {
 }  // namespace
 
 void AddServiceCommands(CLI::App& app, Context& ctx) {
+    // The first question, so it has a short name of its own beside "service status".
+    app.add_subcommand("status", "Whether indexing is done, and the service's state")->callback([&ctx] { ctx.status = Status(ctx); });
     auto* service = app.add_subcommand("service", "The indexing service");
     service->require_subcommand(1);
-    service->add_subcommand("status", "Service status word, pause state and share flags")->callback([&ctx] {
+    service->add_subcommand("status", "Whether indexing is done, and the service's state")->callback([&ctx] {
         ctx.status = Status(ctx);
     });
 
