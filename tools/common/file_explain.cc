@@ -8,8 +8,8 @@
 #include "fileindex/fileindex.h"
 #include "file_types.h"
 #include "pause.h"
-#include "share_index.h"
 #include "service_view.h"
+#include "share_index.h"
 
 namespace tools {
 namespace {
