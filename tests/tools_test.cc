@@ -345,7 +345,7 @@ TEST(BannerTest, TheDrainRateFollowsTheSamples) {
     const auto start = tools::PendingRate::Clock::now();
     const auto at = [&](double seconds) { return start + std::chrono::milliseconds(static_cast<long long>(seconds * 1000)); };
     const std::vector<std::tuple<double, unsigned long long, double>> samples = {
-        {0, 100, 0}, {0.5, 90, 0}, {2, 80, 10}, {3, 120, 0}, {5, 100, 10}, {65, 40, 1}, {125, 10, 0.5}};
+        {0, 100, 0}, {0.5, 90, 0}, {2, 80, 10}, {3, 120, 0}, {4, 110, 10}, {5, 115, 0}, {7, 95, 10}, {67, 35, 1}, {127, 5, 0.5}};
     for (const auto& [seconds, pending, expected] : samples) EXPECT_DOUBLE_EQ(rate.Update(pending, at(seconds)), expected) << seconds;
 }
 
@@ -394,6 +394,8 @@ TEST_F(ToolTest, ExplainTellsWhetherAFileIsInTheIndexAndWhatKeepsItOut) {
         {"/photo/a/p.jpg", [] {}, "not in the index yet: the indexing daemon has not reached it"},  // no index yet
         {"/music/a/new.mp3", [this] { testkit::AppendFile(QueueOf("music"), "{\"event\":2,\"path\":\"" + music_ + "/a/new.mp3\"}\n"); },
          "not in the index yet: 1 change waiting"},
+        {"/music/a/new.mp3", [this] { testkit::WriteFile(StatusConf(), R"({"resume_time": 1})"); },  // a pause long over
+         "not in the index yet: 1 change waiting"},
         {"/music/a/new.mp3", [] { ASSERT_TRUE(StatusMgr::Pause(0)); }, "not in the index yet: indexing is paused with 1 change waiting"},
         {"/music/a/new.mp3", [this] { ASSERT_TRUE(StatusMgr::Resume()); daemon_.reset(); },
          "not in the index yet: the indexing daemon does not answer"},
@@ -405,6 +407,8 @@ TEST_F(ToolTest, ExplainTellsWhetherAFileIsInTheIndexAndWhatKeepsItOut) {
         EXPECT_EQ(e["verdict"].asString(), verdict);
         EXPECT_EQ(e["service"]["daemon_answers"].asBool(), daemon_ != nullptr);
     }
+    ASSERT_EQ(symlink((music_ + "/a/song.mp3").c_str(), (music_ + "/a/link.mp3").c_str()), 0);
+    EXPECT_EQ(testkit::ParseJson(Ctl({"--json", "explain", "/music/a/link.mp3"}).out)["result"]["file"]["kind"], "other");
     const Json::Value folder = testkit::ParseJson(Ctl({"--json", "explain", "/music/a"}).out)["result"];
     EXPECT_EQ(folder["file"], J(R"({"kind": "directory", "type": null, "type_switched_on": null, "in_index": true,
                                      "indexed_files": 1, "index_problem": null})"));
