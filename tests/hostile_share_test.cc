@@ -444,6 +444,7 @@ TEST_F(HostileShareTest, QueriesAreBoundedInBytesWordsAndHits) {
         for (const auto& hit : page["hits"]) paged.append(hit);
     }
     EXPECT_EQ(paged, all);
+    EXPECT_EQ(search({"--type", "photo"})["total"].asInt(), 0);  // the total keeps to the type asked for
     for (const auto& [page, footer] : std::vector<std::pair<std::vector<std::string>, std::string>>{
              {{"--limit", "7"}, "(7 found)"}, {{"--limit", "3", "--offset", "3"}, "(4-6 of 7; --offset 6 for more)"},
              {{"--offset", "6"}, "(7-7 of 7)"}, {{"--offset", "7"}, "(none from 8 on; 7 found)"}}) {

@@ -156,7 +156,9 @@ TEST_F(WebApiTest, FolderPagesFollowEachOtherInBothDirectionsAsInTheTool) {
                 std::string expected;
                 for (size_t i = offset; i < std::min(offset + limit, order.size()); ++i) expected += order[i] + " ";
                 const std::string page = "offset=" + std::to_string(offset) + "&limit=" + std::to_string(limit);
-                EXPECT_EQ(paths(Get("/api/folders?" + page + (descending ? "&sort_direction=DESC" : "")).body["result"]), expected);
+                const Json::Value listing = Get("/api/folders?" + page + (descending ? "&sort_direction=DESC" : "")).body["result"];
+                EXPECT_EQ(paths(listing), expected);
+                EXPECT_EQ(listing["offset"].asUInt64(), offset);
                 std::vector<std::string> args = {FILEINDEXCTL, "--json", "folder", "list", "--offset", std::to_string(offset), "--limit",
                                                  std::to_string(limit)};
                 if (descending) args.push_back("--desc");
