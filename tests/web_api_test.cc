@@ -175,6 +175,10 @@ TEST_F(WebApiTest, StatusAndListingTellTheDaemonsStateAndWhyAFolderIsNotIndexabl
     EXPECT_EQ(status["daemon"], J(R"({"socket": ")" + DaemonSocketPath() + R"(", "answers": true, "reason": null})"));
     EXPECT_TRUE(status["not_done"].isNull());
     EXPECT_EQ(status["banner"]["text"].asString(), "Up to date: 0 files indexed");
+    for (const auto& share : status["progress"]["shares"]) {  // nothing published by a daemon: nothing applied, no date
+        EXPECT_EQ(share["applied"], Json::Value(0));
+        EXPECT_TRUE(share["up_to_date"].isNull());
+    }
     const Answer added = Post("/api/folders", R"([{"path": "/music/ghost"}])");
     EXPECT_EQ(added.body["result"]["warnings"][0].asString(),
               "/music/ghost cannot be indexed now: the directory does not exist (canonical_path); it stays listed as not "
