@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <cstdlib>
+#include <cstring>
 #include <filesystem>
 #include <fstream>
 #include <sstream>
@@ -119,7 +120,9 @@ size_t RecordsApplied(const std::string& daemonLog, const std::string& share) {
     const std::string marker = "fileindexd-ref: share " + share + ": ";
     size_t applied = 0;
     for (size_t at = daemonLog.find(marker); at != std::string::npos; at = daemonLog.find(marker, at + 1)) {
-        applied += std::strtoul(daemonLog.c_str() + at + marker.size(), nullptr, 10);
+        char* end = nullptr;
+        const unsigned long count = std::strtoul(daemonLog.c_str() + at + marker.size(), &end, 10);
+        if (std::strncmp(end, " records applied", 16) == 0) applied += count;  // not "records not applied"
     }
     return applied;
 }
