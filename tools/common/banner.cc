@@ -6,6 +6,7 @@
 
 #include "daemon_progress.h"
 #include "fileindex/fileindex.h"
+#include "service_view.h"
 #include "share_index.h"
 #include "time_text.h"
 
@@ -52,6 +53,14 @@ std::string DurationText(long long seconds) {
     const long long minutes = (seconds + 59) / 60;
     if (minutes < 60) return std::to_string(minutes) + " min";
     return std::to_string(minutes / 60) + " h" + (minutes % 60 ? " " + std::to_string(minutes % 60) + " min" : "");
+}
+
+BannerFacts GatherBannerFacts(const std::string& word, long long resumeTime, const Json::Value& daemon,
+                              const std::vector<QIRA::FILEINDEX::Folder>& folders, const Json::Value& progress,
+                              const Json::Value& daemonProgress) {
+    bool stuck = false;
+    return {word, resumeTime, daemon["answers"].asBool(), folders.size(), PendingOf(progress, daemonProgress),
+            NotDoneReason(word, folders, daemon, stuck), FilesIndexed(SharesOf(folders)), 0};
 }
 
 Json::Value Banner(const BannerFacts& facts) {

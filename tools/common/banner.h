@@ -7,6 +7,8 @@
 
 #include <json/value.h>
 
+#include "fileindex/folder.h"
+
 namespace tools {
 
 struct BannerFacts {
@@ -19,6 +21,13 @@ struct BannerFacts {
     Json::Value filesIndexed;          // FilesIndexed's answer
     double rate = 0;                   // records drained per second lately; 0 when unknown
 };
+
+// The facts of the state read from the library: the service word, the pause (GetPauseInfo), the
+// daemon's state (DaemonState), the indexed folders, a progress report (GetProgress) and what
+// the daemon published (ReadDaemonProgress); the rate is left for the caller to measure.
+BannerFacts GatherBannerFacts(const std::string& word, long long resumeTime, const Json::Value& daemon,
+                              const std::vector<QIRA::FILEINDEX::Folder>& folders, const Json::Value& progress,
+                              const Json::Value& daemonProgress);
 
 // {"state": "no_folders" | "daemon_down" | "paused" | "working" | "up_to_date", "text",
 //  "files_indexed", "pending", "resume_time" (null unless paused until a time), "rate" and

@@ -148,20 +148,17 @@ bool ServiceStatus(Json::Value& result) {
     result["pause"] = tools::PauseState(resumeTime);
     result["progress"]["pause"] = result["pause"];
     result["daemon"] = tools::DaemonState();
-    bool stuck = false;
-    const std::string reason = tools::NotDoneReason(word, folders, result["daemon"], stuck);
-    result["not_done"] = reason.empty() ? Json::Value() : Json::Value(reason);
     const Json::Value daemonProgress = tools::ReadDaemonProgress();
+    tools::BannerFacts facts =
+        tools::GatherBannerFacts(word, resumeTime, result["daemon"], folders, result["progress"], daemonProgress);
+    facts.rate = g_pendingRate.Update(facts.pending);
+    result["banner"] = tools::Banner(facts);
+    result["not_done"] = facts.notDone.empty() ? Json::Value() : Json::Value(facts.notDone);
     for (auto& share : result["progress"]["shares"]) {
         const Json::Value& published = daemonProgress["shares"][share["share"].asString()];
         share["applied"] = published["applied"].isUInt64() ? published["applied"] : Json::Value(0);
         share["up_to_date"] = published["up_to_date"].isInt64() ? published["up_to_date"] : Json::Value();
     }
-    tools::BannerFacts facts{word, resumeTime, result["daemon"]["answers"].asBool(), folders.size(),
-                             tools::PendingOf(result["progress"], daemonProgress),
-                             reason, tools::FilesIndexed(tools::SharesOf(folders)), 0};
-    facts.rate = g_pendingRate.Update(facts.pending);
-    result["banner"] = tools::Banner(facts);
     result["shares"] = Json::Value(Json::arrayValue);
     for (const auto& share : tools::SharesOf(folders)) {
         Json::Value flags(Json::objectValue);

@@ -68,12 +68,9 @@ int Status(Context& ctx) {
     ShareFlags(folders, out["no_space"], out["need_reindex"]);
     out["watched"] = tools::WatchedShares(folders);
     Json::Value progress;
-    bool stuck = false;
-    const std::string notDone = tools::NotDoneReason(word, folders, out["daemon"], stuck);
-    const unsigned long long pending =
-        QIRA::FILEINDEX::GetProgress(progress) ? tools::PendingOf(progress, tools::ReadDaemonProgress()) : 0;
-    out["banner"] = tools::Banner({word, resumeTime, out["daemon"]["answers"].asBool(), folders.size(), pending, notDone,
-                                   tools::FilesIndexed(tools::SharesOf(folders)), 0});
+    QIRA::FILEINDEX::GetProgress(progress);  // a report that cannot be read counts nothing pending
+    out["banner"] =
+        tools::Banner(tools::GatherBannerFacts(word, resumeTime, out["daemon"], folders, progress, tools::ReadDaemonProgress()));
     Table table = {{"indexing", out["banner"]["text"].asString()},
                    {"status", word},
                    {"daemon", DaemonText(out["daemon"])},
