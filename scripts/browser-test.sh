@@ -5,7 +5,7 @@ set -euo pipefail
 cd "$(dirname "$0")/.."
 scripts/install-deps.sh chromium chromium-driver python3-selenium
 cmake -S . -B build-browser -DCMAKE_BUILD_TYPE=Release -DFILEINDEX_BUILD_TESTS=OFF >/dev/null
-cmake --build build-browser -j "$(nproc)" --target fileindex-web qira-sim fileindexd-ref fileindexctl >/dev/null
+cmake --build build-browser -j "$(nproc)" --target fileindex-web qira-sim fileindexd-ref fileindexctl qiranotifyd-sim >/dev/null
 tools="$PWD/build-browser/tools"
 output="$PWD/build-browser/browser-test"
 mkdir -p "$output"
@@ -30,7 +30,9 @@ for i in $(seq -w 0 14); do
 done
 conf+="\"/photo/2024\": {\"path\": \"/photo/2024\", \"name\": \"Photos\", \"document\": false, \"audio\": false, \"video\": false, \"photo\": true}"
 echo "${conf}}" >"$QIRA_ROOT/usr/qira/etc/fileindex/folder.conf"
-"$tools/fileindexd-ref" >"$output/daemon.log" 2>&1 & pids+=($!)
+"$PWD/build-browser/platform/qiranotifyd-sim" >"$output/notifier.log" 2>&1 & pids+=($!)
+# Five records a pass, so that a drain lasts long enough to watch progress move.
+"$tools/fileindexd-ref" --pace 5 >"$output/daemon.log" 2>&1 & pids+=($!)
 export FILEINDEXD_PID=$!
 "$tools/fileindex-web" --listen 127.0.0.1:0 >"$output/web.log" 2>&1 & pids+=($!)
 for _ in $(seq 100); do grep -q "listening on" "$output/web.log" && break; sleep 0.05; done

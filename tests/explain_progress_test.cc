@@ -104,22 +104,24 @@ TEST_F(ExplainTest, TellsTheGoverningFolderByTheLastMatchAndWhatIsPending) {
     EXPECT_TRUE(Explain("/photo/a")["governing_folder"].isNull());
 }
 
-TEST_F(ExplainTest, ProgressCountsLinesPerShareAndRecordsPerFolder) {
+// A new file is queued as created, then written: one file, two records.
+TEST_F(ExplainTest, ProgressCountsLinesPerShareAndRecordsAndFilesPerFolder) {
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/a/b": {}, "/music/c": {}, "/photo/a": {}})");
     MakeDir(music_ + "/@eaDir");
     const auto record = [this](const std::string& inside, int event = 1, const std::string& old = "") {
         return "{\"event\":" + std::to_string(event) + ",\"path\":\"" + music_ + inside + "\"" +
                (old.empty() ? "" : ",\"path_old\":\"" + music_ + old + "\"") + "}\n";
     };
-    testkit::WriteFile(QueueOf("music"), record("/a/x") + record("/a/b/y") + "garbage\n" + record("/ab") +
+    testkit::WriteFile(QueueOf("music"), record("/a/x") + record("/a/x", 2) + record("/a/b/y") + "garbage\n" + record("/ab") +
                                              record("/elsewhere", 256, "/c/z") + record("/a", 256, "/a/q"));
     testkit::WriteFile(QueueOf("music") + ".tmp", record("/c") + "{\"event\":1}");
     Json::Value out;
     ASSERT_TRUE(GetProgress(out));
     EXPECT_EQ(out["pause"], J(R"({"paused": false, "resume_time": -1})"));
     ASSERT_EQ(out["shares"].size(), 2u);
-    EXPECT_EQ(out["shares"][0], J(R"({"share": "music", "queue": 6, "companion": 2, "pending": 8, "unread": [], "folders": [
-        {"path": "/music/a", "pending": 3}, {"path": "/music/a/b", "pending": 1}, {"path": "/music/c", "pending": 2}]})"));
+    EXPECT_EQ(out["shares"][0], J(R"({"share": "music", "queue": 7, "companion": 2, "pending": 9, "files": 6, "unread": [],
+        "folders": [{"path": "/music/a", "pending": 4, "files": 3}, {"path": "/music/a/b", "pending": 1, "files": 1},
+                    {"path": "/music/c", "pending": 2, "files": 2}]})"));
     EXPECT_EQ(out["shares"][1]["pending"].asUInt(), 0u);
     EXPECT_EQ(testkit::LogMessages(), (std::vector<std::string>{"Malformed command: garbage", "Malformed command: {\"event\":1}"}));
     testkit::ClearLog();
@@ -134,3 +136,31 @@ TEST_F(ExplainTest, ProgressCountsLinesPerShareAndRecordsPerFolder) {
 }
 
 }  // namespace
+
+// A path seen again among the last kRecentFiles new files is the same file; further back, a new
+// change. Repeats do not push older files out.
+TEST(FileChangesTest, ARepeatIsOneFileWithinTheRecentOnesAndANewChangeBeyond) {
+    const auto others = [](size_t n) {
+        std::vector<std::string> paths;
+        for (size_t i = 0; i < n; ++i) paths.push_back("/v/" + std::to_string(i));
+        return paths;
+    };
+    const auto around = [](std::vector<std::string> between) {
+        between.insert(between.begin(), "/v/a");
+        between.push_back("/v/a");
+        return between;
+    };
+    const size_t recent = FileChanges::kRecentFiles;
+    const std::vector<std::pair<std::vector<std::string>, size_t>> cases = {
+        {around({}), 1},
+        {around(others(recent - 1)), recent},
+        {around(others(recent)), recent + 2},
+        {around(std::vector<std::string>(3 * recent, "/v/b")), 2},
+    };
+    for (const auto& [paths, files] : cases) {
+        FileChanges changes;
+        size_t counted = 0;
+        for (const auto& path : paths) counted += changes.IsNewFile(path) ? 1 : 0;
+        EXPECT_EQ(counted, files) << paths.size();
+    }
+}

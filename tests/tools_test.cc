@@ -5,6 +5,7 @@
 #include <sys/inotify.h>
 
 #include "banner.h"
+#include "daemon_progress.h"
 #include "pending_rate.h"
 #include "share_indexer.h"
 #include "time_text.h"
@@ -329,13 +330,40 @@ TEST(BannerTest, OneSentenceInOrderOfWhatMattersMost) {
         EXPECT_EQ(banner["resume_time"].isNull(), state != "paused" || facts.resumeTime <= 0) << text;
         EXPECT_EQ(banner["seconds_left"], facts.rate > 0 ? Json::Value(20) : Json::Value()) << text;
     }
-    // What is pending less what the daemon applied of the batch it took, never below none.
-    EXPECT_EQ(tools::PendingOf(J(R"({"shares": [{"share": "music", "pending": 10}, {"share": "photo", "pending": 5}]})"),
-                               J(R"({"shares": {"music": {"applied": 4}, "photo": {"applied": 9}}})")),
+    // The files pending less those the daemon applied of the batch it took, never below none.
+    EXPECT_EQ(tools::PendingOf(J(R"({"shares": [{"share": "music", "pending": 20, "files": 10}, {"share": "photo", "files": 5}]})"),
+                               J(R"({"shares": {"music": {"applied": 8, "applied_files": 4}, "photo": {"applied_files": 9}}})")),
               6u);
     for (const auto& [seconds, words] : std::vector<std::pair<long long, std::string>>{
              {0, "0 s"}, {59, "59 s"}, {60, "1 min"}, {61, "2 min"}, {3600, "1 h"}, {3661, "1 h 2 min"}}) {
         EXPECT_EQ(tools::DurationText(seconds), words);
+    }
+}
+
+// Files left per share and folder are what the report counts less what the daemon published as
+// applied; a folder is up to date since its own date, or else its share's.
+TEST(BannerTest, WhatTheDaemonPublishedIsTakenFromTheFilesPending) {
+    const Json::Value published = J(R"({"shares": {"music": {"applied": 7, "applied_files": 4, "up_to_date": 100,
+        "folders": {"/music/a": {"applied_files": 3, "up_to_date": 50}, "/music/b": {"applied_files": 9}}}}})");
+    const std::vector<std::tuple<std::string, Json::Value, std::string>> cases = {
+        {R"({"share": "music", "files": 10, "folders": [{"path": "/music/a", "files": 5}, {"path": "/music/b", "files": 2},
+            {"path": "/music/c", "files": 1}]})", published,
+         R"({"applied": 7, "files_left": 6, "up_to_date": 100, "folders": [{"files_left": 2, "up_to_date": 50},
+            {"files_left": 0, "up_to_date": 100}, {"files_left": 1, "up_to_date": 100}]})"},
+        {R"({"share": "photo", "files": 3, "folders": [{"path": "/photo/a", "files": 3}]})", published,
+         R"({"applied": 0, "files_left": 3, "up_to_date": null, "folders": [{"files_left": 3, "up_to_date": null}]})"},
+        {R"({"share": "music", "files": 2, "folders": []})", Json::Value(), R"({"applied": 0, "files_left": 2, "up_to_date": null, "folders": []})"},
+    };
+    for (const auto& [report, daemon, expected] : cases) {
+        Json::Value share = J(report);
+        tools::AddDaemonProgress(share, daemon);
+        for (auto& folder : share["folders"]) {
+            folder.removeMember("path");
+            folder.removeMember("files");
+        }
+        share.removeMember("share");
+        share.removeMember("files");
+        EXPECT_EQ(share, J(expected)) << report;
     }
 }
 
@@ -434,12 +462,12 @@ TEST_F(ToolTest, WaitAndWatchFollowThePendingWork) {
     const auto lines = Ctl({"progress", "--watch", "--samples", "2", "--interval", "0.05"});
     ASSERT_EQ(lines.status, 0) << lines.err;
     ASSERT_EQ(Lines(lines.out).size(), 2u);
-    for (const std::string& line : Lines(lines.out)) EXPECT_EQ(testkit::ParseJson(line)["shares"][0]["pending"].asUInt(), 1u);
+    for (const std::string& line : Lines(lines.out)) EXPECT_EQ(testkit::ParseJson(line)["shares"][0]["files_left"].asUInt(), 1u);
     const auto screen = testkit::Run({"/usr/bin/script", "-qec",
                                       std::string(FILEINDEXCTL) + " progress --watch --samples 2 --interval 0.05", "/dev/null"});
     ASSERT_EQ(screen.status, 0) << screen.err;
     EXPECT_NE(screen.out.find("\033[H\033[J"), std::string::npos);
-    EXPECT_NE(screen.out.find("music [------------------------------] 1 pending"), std::string::npos) << screen.out;
+    EXPECT_NE(screen.out.find("music [------------------------------] 1 file left"), std::string::npos) << screen.out;
     ASSERT_TRUE(StatusMgr::Pause(0));
     EXPECT_EQ(Ctl({"wait", "--timeout", "0.2"}).status, 3);  // paused with work pending
     unlink(QueueOf("music").c_str());                        // drained
@@ -470,7 +498,7 @@ TEST_F(ToolTest, TheDaemonStandInHoldsWorkBackWhilePausedAndProgressFollowsTheDr
     const auto backlogs = [&] {
         std::vector<unsigned> seen;
         for (const std::string& line : Lines(testkit::ReadFile(samples))) {
-            seen.push_back(testkit::ParseJson(line)["shares"][0]["pending"].asUInt());
+            seen.push_back(testkit::ParseJson(line)["shares"][0]["files_left"].asUInt());
         }
         return seen;
     };

@@ -177,6 +177,7 @@ TEST_F(WebApiTest, StatusAndListingTellTheDaemonsStateAndWhyAFolderIsNotIndexabl
     EXPECT_EQ(status["banner"]["text"].asString(), "Up to date: 0 files indexed");
     for (const auto& share : status["progress"]["shares"]) {  // nothing published by a daemon: nothing applied, no date
         EXPECT_EQ(share["applied"], Json::Value(0));
+        EXPECT_EQ(share["files_left"], share["files"]);
         EXPECT_TRUE(share["up_to_date"].isNull());
     }
     const Answer added = Post("/api/folders", R"([{"path": "/music/ghost"}])");

@@ -6,6 +6,7 @@
 #include "fileindex/error.h"
 #include "fileindex/fileidx.h"
 #include "fileindex/explain.h"
+#include "fileindex/file_changes.h"
 #include "fileindex/folder.h"
 #include "fileindex/folders.h"
 #include "fileindex/index_mgr.h"

@@ -1,5 +1,5 @@
 // How far indexing has got: per share the lines pending in its queue files, per indexed folder
-// the records that concern it, and the pause state.
+// the records and files that concern it, and the pause state.
 #include "fileindex/progress.h"
 
 #include <ctime>
@@ -47,11 +47,13 @@ Json::Value ShareProgress(const std::string& share, const std::vector<Folder>& f
     entry["queue"] = static_cast<Json::Int64>(queue.lines);
     entry["companion"] = static_cast<Json::Int64>(companion.lines);
     entry["pending"] = static_cast<Json::Int64>(queue.lines + companion.lines);
+    entry["files"] = static_cast<Json::Int64>(queue.all.files + companion.all.files);
     entry["folders"] = Json::Value(Json::arrayValue);
     for (size_t i = 0; i < folders.size(); ++i) {
         Json::Value folder(Json::objectValue);
         folder[Json::StaticString("path")] = folders[i].path;
-        folder[Json::StaticString("pending")] = static_cast<Json::Int64>(queue.under[i] + companion.under[i]);
+        folder[Json::StaticString("pending")] = static_cast<Json::Int64>(queue.under[i].records + companion.under[i].records);
+        folder[Json::StaticString("files")] = static_cast<Json::Int64>(queue.under[i].files + companion.under[i].files);
         entry["folders"].append(std::move(folder));
     }
     return entry;

@@ -10,7 +10,7 @@ unsigned long long CountRecordsUnder(const std::string& file, const std::string&
     QueueAnswer answer;
     ReadQueue(file, {prefix}, answer);
     if (refused != nullptr) *refused = answer.refused;
-    return answer.under[0];
+    return answer.under[0].records;
 }
 
 }  // namespace detail

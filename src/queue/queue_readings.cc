@@ -18,6 +18,7 @@
 #include <thread>
 
 #include "ea_dir.h"
+#include "fileindex/file_changes.h"
 #include "line_reader.h"
 #include "log.h"
 #include "queue_file.h"
@@ -31,7 +32,7 @@ namespace {
 constexpr off_t kHeadBytes = 4096;
 constexpr off_t kSampleBytes = 64;
 
-using Counts = std::map<std::string, unsigned long long, std::less<>>;  // folder full path -> records
+using Counts = std::map<std::string, Tally, std::less<>>;  // folder full path -> its records and files
 
 struct Sample {
     off_t offset;
@@ -46,6 +47,8 @@ struct Reading {
     off_t committed = 0;   // bytes read, up to and including the last "\n"
     off_t loggedUpTo = 0;  // malformed lines that begin before this offset were logged
     unsigned long long lines = 0;
+    Tally all;
+    FileChanges changes;
     Counts counts;
     std::set<size_t> lengths;  // of the folder paths in `counts`
     // The last question's prefixes and each one's entry in `counts` (end() for ""): a host that
@@ -131,7 +134,9 @@ void TakeSamples(Reading& reading) {
 void ReadAgain(Reading& reading, bool rewritten) {
     reading.committed = 0;
     reading.lines = 0;
-    for (auto& entry : reading.counts) entry.second = 0;
+    reading.all = Tally();
+    reading.changes = FileChanges();
+    for (auto& entry : reading.counts) entry.second = Tally();
     reading.samples.clear();
     if (rewritten) {
         reading.loggedUpTo = 0;
@@ -159,7 +164,7 @@ bool Track(Reading& reading, const std::vector<std::string>& prefixes) {
         }
     }
     for (const auto folder : missing) {
-        reading.counts.emplace(folder, 0);
+        reading.counts.emplace(folder, Tally());
         reading.lengths.insert(folder.size());
     }
     reading.asked = prefixes;
@@ -190,7 +195,22 @@ void ForEachFolder(const std::set<size_t>& lengths, Counts& counts, const QueueR
     if (record.event == kEventRename && !record.path_old.empty()) match(record.path_old);
 }
 
-const auto kCountOne = [](Counts::iterator folder) { ++folder->second; };
+void Add(Tally& to, const Tally& from) {
+    to.records += from.records;
+    to.files += from.files;
+}
+
+// Counts a well-formed record in `all` and in the tally `into` gives for each folder of `counts`
+// that holds it; the file too when `changes` finds it new.
+template <typename Into>
+void CountRecord(const std::set<size_t>& lengths, Counts& counts, const QueueRecord& record, FileChanges& changes,
+                 Tally& all, Into into) {
+    const Tally one{1, changes.IsNewFile(record.path) ? 1u : 0u};
+    Add(all, one);
+    ForEachFolder(lengths, counts, record, [&](Counts::iterator folder) { Add(into(folder), one); });
+}
+
+Tally& InPlace(Counts::iterator folder) { return folder->second; }
 
 void LogMalformed(const std::string& queueFile, const char* text, off_t offset, size_t length) {
     if (text == nullptr) {
@@ -228,8 +248,9 @@ off_t EachLine(LineReader& lines, off_t base, bool parse, Take take) {
 }
 
 // Reads on from the offset read to, up to `until`, counting lines (and, when `parse`, records
-// and malformed lines). A last line without "\n" goes to `tail` and `tailLines`, for this answer only.
-void ReadOn(Reading& reading, const std::string& queueFile, off_t until, bool parse, Counts& tail,
+// and malformed lines). A last line without "\n" goes to `tail`, `tailAll` and `tailLines`, for this
+// answer only.
+void ReadOn(Reading& reading, const std::string& queueFile, off_t until, bool parse, Counts& tail, Tally& tailAll,
             unsigned long long& tailLines) {
     LineReader lines(reading.fd, kMaxQueueLine, reading.committed, until);
     const auto take = [&](const LineReader::Line& line, off_t offset, bool terminated, bool wellFormed,
@@ -237,13 +258,15 @@ void ReadOn(Reading& reading, const std::string& queueFile, off_t until, bool pa
         const char* text = line.overlong ? nullptr : line.begin;
         if (terminated) {
             ++reading.lines;
-            if (wellFormed) ForEachFolder(reading.lengths, reading.counts, record, kCountOne);
+            if (wellFormed) CountRecord(reading.lengths, reading.counts, record, reading.changes, reading.all, InPlace);
             else if (parse && offset >= reading.loggedUpTo) LogMalformed(queueFile, text, offset, line.length);
             return true;
         }
         ++tailLines;
         if (wellFormed) {
-            ForEachFolder(reading.lengths, reading.counts, record, [&](Counts::iterator folder) { ++tail[folder->first]; });
+            FileChanges changes = reading.changes;  // the line may be completed: not remembered
+            CountRecord(reading.lengths, reading.counts, record, changes, tailAll,
+                        [&](Counts::iterator folder) -> Tally& { return tail[folder->first]; });
         } else if (parse && (offset != reading.tailLoggedAt || line.length != reading.tailLoggedLength)) {
             LogMalformed(queueFile, text, offset, line.length);
             reading.tailLoggedAt = offset;
@@ -265,6 +288,8 @@ struct Part {
     off_t end = 0;
     off_t stoppedAt = 0;  // the first byte not taken: a line start
     unsigned long long lines = 0;
+    Tally all;
+    FileChanges changes;
     Counts counts;        // the reading's folders
     std::vector<std::pair<off_t, size_t>> malformed;  // offset and length
 };
@@ -295,7 +320,7 @@ void ReadPart(const Reading& reading, Part& part) {
         // Not taken: a last line without "\n", or a malformed line past what may be held.
         if (!terminated || (!wellFormed && part.malformed.size() >= kMaxHeldMalformed)) return false;
         ++part.lines;
-        if (wellFormed) ForEachFolder(reading.lengths, part.counts, record, kCountOne);
+        if (wellFormed) CountRecord(reading.lengths, part.counts, record, part.changes, part.all, InPlace);
         else part.malformed.emplace_back(offset, line.length);
         return true;
     };
@@ -307,14 +332,17 @@ void TakePart(Reading& reading, const std::string& queueFile, const Part& part) 
         if (offset >= reading.loggedUpTo) LogMalformedAt(reading.fd, queueFile, offset, length);
     }
     reading.lines += part.lines;
+    Add(reading.all, part.all);
+    reading.changes = part.changes;
     auto theirs = part.counts.begin();
-    for (auto& mine : reading.counts) mine.second += (theirs++)->second;  // the same folders, in order
+    for (auto& mine : reading.counts) Add(mine.second, (theirs++)->second);  // the same folders, in order
     reading.committed = part.stoppedAt;
 }
 
 // Reads what was appended since the last reading (all of the file the first time): counting lines
 // only until a folder is asked about, so that malformed lines are logged when first parsed.
-void CatchUp(Reading& reading, const std::string& queueFile, off_t size, Counts& tail, unsigned long long& tailLines) {
+void CatchUp(Reading& reading, const std::string& queueFile, off_t size, Counts& tail, Tally& tailAll,
+             unsigned long long& tailLines) {
     constexpr off_t kToTheEnd = std::numeric_limits<off_t>::max();
     const bool parse = !reading.counts.empty();
     Part part;
@@ -323,19 +351,19 @@ void CatchUp(Reading& reading, const std::string& queueFile, off_t size, Counts&
     if (part.begin > 0) {
         part.end = size;
         part.counts = reading.counts;
-        for (auto& entry : part.counts) entry.second = 0;
+        for (auto& entry : part.counts) entry.second = Tally();
         try {
             helper = std::thread([&] { ReadPart(reading, part); });
         } catch (const std::system_error&) {
             part.begin = -1;
         }
     }
-    ReadOn(reading, queueFile, helper.joinable() ? part.begin : kToTheEnd, parse, tail, tailLines);
+    ReadOn(reading, queueFile, helper.joinable() ? part.begin : kToTheEnd, parse, tail, tailAll, tailLines);
     if (helper.joinable()) {
         helper.join();
         if (reading.committed == part.begin) {
             TakePart(reading, queueFile, part);
-            ReadOn(reading, queueFile, kToTheEnd, parse, tail, tailLines);
+            ReadOn(reading, queueFile, kToTheEnd, parse, tail, tailAll, tailLines);
         }
     }
     if (parse) reading.loggedUpTo = std::max(reading.loggedUpTo, reading.committed);
@@ -346,7 +374,7 @@ void CatchUp(Reading& reading, const std::string& queueFile, off_t size, Counts&
 
 bool ReadQueue(const std::string& queueFile, const std::vector<std::string>& prefixes, QueueAnswer& answer) {
     answer = QueueAnswer();
-    answer.under.assign(prefixes.size(), 0);
+    answer.under.assign(prefixes.size(), Tally());
     const int fd = OpenNoFollow(queueFile, O_RDONLY);
     struct stat st;
     if (fd < 0 || fstat(fd, &st) != 0) {
@@ -367,14 +395,18 @@ bool ReadQueue(const std::string& queueFile, const std::vector<std::string>& pre
     if (st.st_size < reading->committed || !SamplesHold(*reading)) ReadAgain(*reading, true);
     if (Track(*reading, prefixes)) ReadAgain(*reading, false);
     Counts tail;
+    Tally tailAll;
     unsigned long long tailLines = 0;
-    CatchUp(*reading, queueFile, st.st_size, tail, tailLines);
+    CatchUp(*reading, queueFile, st.st_size, tail, tailAll, tailLines);
     answer.lines = reading->lines + tailLines;
+    answer.all = reading->all;
+    Add(answer.all, tailAll);
     for (size_t i = 0; i < prefixes.size(); ++i) {
         const Counts::iterator slot = reading->slots[i];
         if (slot == reading->counts.end()) continue;
         const auto inTail = tail.empty() ? tail.end() : tail.find(slot->first);
-        answer.under[i] = slot->second + (inTail != tail.end() ? inTail->second : 0);
+        answer.under[i] = slot->second;
+        if (inTail != tail.end()) Add(answer.under[i], inTail->second);
     }
     return true;
 }

@@ -11,6 +11,9 @@
 // question when it asks about more), never by its records,
 // and at most kMaxQueuesRead files are held. Safe when several threads ask.
 //
+// Files are counted with FileChanges in file order; a stretch read by two threads starts the
+// second thread's recent paths afresh.
+//
 // Until a folder is asked about, a file's lines are only counted (the progress report); records
 // are parsed, and malformed lines logged, once per process, when a question first needs them. A
 // last line without "\n" is counted but not kept, since a writer may be completing it. A stretch
@@ -30,13 +33,20 @@ namespace detail {
 constexpr size_t kMaxFoldersPerQueue = 4096;
 constexpr size_t kMaxQueuesRead = 256;
 
+// Well-formed records, and the files they change as FileChanges counts them.
+struct Tally {
+    unsigned long long records = 0;
+    unsigned long long files = 0;
+};
+
 struct QueueAnswer {
     bool refused = false;          // sparse or oversized: not read (logged once, share marked)
     unsigned long long lines = 0;  // every line, a last one without "\n" included
+    Tally all;                     // once a folder was asked about
     // Per folder prefix asked ("<full path>/"), in the order asked: the well-formed records whose
     // path (or old path, for event 256) is the folder or lies beneath it, each record counted
-    // once; 0 for an empty prefix.
-    std::vector<unsigned long long> under;
+    // once; none for an empty prefix.
+    std::vector<Tally> under;
 };
 
 // Answers for `queueFile` and `prefixes` ("<full path>/" each). False, with errno set, when the

@@ -21,7 +21,7 @@ bool IsFolderInQueue(const std::string& folderPath, const std::string& queuePath
         FILEIDX_LOG("Failed to open queue=%s, reason=%m", queuePath.c_str());
         return false;
     }
-    return answer.refused || answer.under[0] > 0;
+    return answer.refused || answer.under[0].records > 0;
 }
 
 }  // namespace detail

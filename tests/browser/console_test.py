@@ -4,6 +4,7 @@ fileindex-web on a seeded simulated appliance, with fileindexctl changing things
 Arguments: the console's URL, the token file, the directory for the screenshots and the directory
 of the tools; FILEINDEXD_PID names the indexing daemon stand-in."""
 import os
+import re
 import signal
 import subprocess
 import sys
@@ -23,6 +24,19 @@ URL, TOKEN_FILE, OUTPUT, TOOLS = sys.argv[1:5]
 def ctl(*args):
     """fileindexctl on the same appliance, as another administrator would run it."""
     subprocess.run([os.path.join(TOOLS, "fileindexctl"), *args], check=True, capture_output=True)
+
+
+def write(path, text="some text"):
+    with open(path, "w", encoding="utf-8") as file:
+        file.write(text)
+
+
+# The controls a screen reader cannot name: no aria-label, no label, no text of their own.
+UNNAMED = """return [...document.querySelectorAll('button, input, select, summary, [role=progressbar]')]
+  .filter((e) => e.offsetParent !== null || e.tagName === 'SUMMARY')
+  .filter((e) => !(e.getAttribute('aria-label') || '').trim() && !e.getAttribute('aria-labelledby')
+    && !(e.labels && [...e.labels].some((l) => l.textContent.trim())) && !e.textContent.trim())
+  .map((e) => e.outerHTML.slice(0, 80));"""
 
 
 class ConsoleTest(unittest.TestCase):
@@ -148,13 +162,18 @@ class ConsoleTest(unittest.TestCase):
         self.wait_text("pause-text", "paused until resumed")
         ctl("reindex", "/music/f01", "/music/f02")
         self.wait_text("progress", "music")
-        self.wait.until(lambda _: "2 pending" in self.text("progress"))
+        self.wait.until(lambda _: "2 files left" in self.text("progress"))
         photo = [p for p in b.find_elements(By.CSS_SELECTOR, ".share-progress") if p.text.startswith("photo")][0]
-        self.assertIn("0 pending, 0.0/s, done", photo.text)
-        done = photo.find_element(By.CSS_SELECTOR, ".bar")  # nothing pending is a full bar, for every share alike
+        self.assertIn("0 files left, 0.0/s, done", photo.text)
+        done = photo.find_element(By.CSS_SELECTOR, ".bar")  # nothing left is a full bar, for every share alike
         self.assertEqual((done.get_attribute("aria-valuenow"), done.get_attribute("aria-valuetext")), ("100", "done"))
         self.assertIn("up to date since", photo.text)
-        self.assertRegex(self.text("progress"), r"music\s+2 pending, 0\.0/s, time left unknown")
+        progress = self.text("progress")
+        self.assertRegex(progress, r"music\s+2 files left, 0\.0/s, time left unknown")
+        # Per folder: the two with work left on their own lines, the rest folded under one.
+        self.assertRegex(progress, r"/music/f01\s+1 file left, 0\.0/s, time left unknown")
+        self.assertRegex(progress, r"/music/f02\s+1 file left")
+        self.assertRegex(progress, r"\d+ folders of music up to date")
 
         # An explanation in words: the problem, the rules with their facts as text.
         b.find_element(By.ID, "explain-path").send_keys("/music/#recycle/old")
@@ -219,13 +238,40 @@ class ConsoleTest(unittest.TestCase):
         b.save_screenshot(OUTPUT + "/console-400.png")
 
         # The banner in each state, at both widths. A stopped daemon still accepts connections
-        # but drains nothing, so work stays left to do.
+        # but drains nothing, so work stays left to do: here a burst of new files, each queued as
+        # created and then written, counted once.
         daemon = int(os.environ["FILEINDEXD_PID"])
         os.kill(daemon, signal.SIGSTOP)
-        ctl("reindex", "/music/f01", "/music/f02")
-        self.wait_text("banner", "changes left to index, time left unknown")
+        other = os.path.join(os.environ["QIRA_ROOT"], "volume1/music/other")
+        write(other + "/probe.txt")
+        self.wait.until(lambda _: "1 file left" in self.text("banner") or "1 change left" in self.text("banner"))
+        for i in range(119):
+            write("%s/burst-%03d.txt" % (other, i))
+        self.wait_text("banner", "120 changes left to index, time left unknown")
         self.shoot("working")
+        # The daemon applies 5 records a pass: the share's and the folder's files left fall while
+        # it works, and the banner gives a rate and a time left.
         os.kill(daemon, signal.SIGCONT)
+        seen = {"share": [], "folder": [], "banner": []}
+
+        def note(_):
+            bars = {bar.get_attribute("aria-label"): bar.get_attribute("aria-valuetext")
+                    for bar in b.find_elements(By.CSS_SELECTOR, "#progress .bar")}
+            for key, label in (("share", "Indexing of music"), ("folder", "Indexing of /music/other")):
+                value = bars.get(label)
+                if value and (not seen[key] or seen[key][-1] != value):
+                    seen[key].append(value)
+            seen["banner"].append(self.text("banner"))
+            return seen["share"] and seen["share"][-1] == "done"
+
+        WebDriverWait(b, 180, poll_frequency=0.2, ignored_exceptions=(StaleElementReferenceException,)).until(note)
+        for key in ("share", "folder"):
+            lefts = [int(value.split()[0]) for value in seen[key] if value != "done"]
+            self.assertGreaterEqual(len(lefts), 3, seen[key])  # it moved, more than once, while work was done
+            self.assertTrue(all(a > b for a, b in zip(lefts, lefts[1:])), seen[key])
+        self.assertEqual(seen["share"][0], "120 files left")
+        self.assertTrue(any(re.search(r"changes left to index, [0-9.]+ per second, about .+ left", text)
+                            for text in seen["banner"]), seen["banner"][-5:])
         self.wait_text("banner", "Up to date: ")
         self.shoot("up-to-date")
         ctl("service", "pause", "--hours", "2")
@@ -253,6 +299,7 @@ class ConsoleTest(unittest.TestCase):
                     "return [...document.querySelectorAll('body *')].filter((e) => e.getBoundingClientRect().right > %d)"
                     ".map((e) => e.tagName + '#' + e.id + '.' + e.className + ' ' + e.textContent.slice(0, 40))" % width)
                 self.fail("the %s page is wider than %d px: %s" % (state, width, wide[:5]))
+            self.assertEqual(self.browser.execute_script(UNNAMED), [], "%s at %d px" % (state, width))
             self.browser.execute_script("window.scrollTo(0, 0)")
             self.browser.save_screenshot("%s/banner-%s-%d.png" % (OUTPUT, state, width))
 

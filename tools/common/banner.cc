@@ -43,7 +43,7 @@ std::string WorkingText(const BannerFacts& facts, Json::Value& secondsLeft) {
 unsigned long long PendingOf(const Json::Value& progress, const Json::Value& daemonProgress) {
     unsigned long long pending = 0;
     for (const auto& share : progress["shares"]) {
-        pending += StillPending(share["pending"].asUInt64(), daemonProgress, share["share"].asString());
+        pending += Left(share["files"].asUInt64(), daemonProgress["shares"][share["share"].asString()]["applied_files"]);
     }
     return pending;
 }

@@ -16,10 +16,10 @@ struct BannerFacts {
     long long resumeTime = -1;         // as GetPauseInfo gives it
     bool daemonAnswers = true;
     size_t folders = 0;                // indexed folders
-    unsigned long long pending = 0;    // records waiting in every share's queue and companion
+    unsigned long long pending = 0;    // files waiting in every share's queue and companion
     std::string notDone;               // NotDoneReason's answer
     Json::Value filesIndexed;          // FilesIndexed's answer
-    double rate = 0;                   // records drained per second lately; 0 when unknown
+    double rate = 0;                   // files drained per second lately; 0 when unknown
 };
 
 // The facts of the state read from the library: the service word, the pause (GetPauseInfo), the
@@ -41,7 +41,7 @@ Json::Value Banner(const BannerFacts& facts);
 // counts none. Null when an index could not be read.
 Json::Value FilesIndexed(const std::vector<std::string>& shares);
 
-// The records pending over every share of a progress report (GetProgress), less what the daemon
+// The files pending over every share of a progress report (GetProgress), less what the daemon
 // reports applied of the batches it has taken (ReadDaemonProgress).
 unsigned long long PendingOf(const Json::Value& progress, const Json::Value& daemonProgress);
 

@@ -1,4 +1,4 @@
-// How fast the pending records drain, from the counts the console saw at its status answers.
+// How fast the pending files drain, from the counts the console saw at its status answers.
 #pragma once
 
 #include <chrono>
@@ -12,7 +12,7 @@ class PendingRate {
 public:
     using Clock = std::chrono::steady_clock;
 
-    // Notes the count seen now and answers the records drained per second since the newest
+    // Notes the count seen now and answers the files drained per second since the newest
     // sample at least a minute old (or the oldest one); 0 while there is no drain to measure, or
     // less than a second of it. New work restarts the measure, so that a
     // burst of arrivals never reads as a negative rate.

@@ -154,11 +154,7 @@ bool ServiceStatus(Json::Value& result) {
     facts.rate = g_pendingRate.Update(facts.pending);
     result["banner"] = tools::Banner(facts);
     result["not_done"] = facts.notDone.empty() ? Json::Value() : Json::Value(facts.notDone);
-    for (auto& share : result["progress"]["shares"]) {
-        const Json::Value& published = daemonProgress["shares"][share["share"].asString()];
-        share["applied"] = published["applied"].isUInt64() ? published["applied"] : Json::Value(0);
-        share["up_to_date"] = published["up_to_date"].isInt64() ? published["up_to_date"] : Json::Value();
-    }
+    for (auto& share : result["progress"]["shares"]) tools::AddDaemonProgress(share, daemonProgress);
     result["shares"] = Json::Value(Json::arrayValue);
     for (const auto& share : tools::SharesOf(folders)) {
         Json::Value flags(Json::objectValue);

@@ -9,10 +9,12 @@
 #include <thread>
 
 #include "commands.h"
+#include "daemon_progress.h"
 #include "file_explain.h"
 #include "fileindex/fileindex.h"
 #include "pause.h"
 #include "service_view.h"
+#include "time_text.h"
 
 namespace fileindexctl {
 namespace {
@@ -92,16 +94,16 @@ void PrintExplanation(const Json::Value& e, bool allRules) {
     if (folded > 0) std::cout << folded << " more rules passed or were not needed (--rules shows them)\n";
 }
 
-// Adds to `now` the drain rate (records per second) and the estimated seconds left of every share
+// Adds to `now` the drain rate (files per second) and the estimated seconds left of every share
 // and folder, from the previous sample taken `seconds` before.
 void AddRates(Json::Value& now, const Json::Value& before, double seconds) {
     std::map<std::string, unsigned long long> previous;
     for (const auto& share : before["shares"]) {
-        previous[share["share"].asString()] = share["pending"].asUInt64();
-        for (const auto& folder : share["folders"]) previous[folder["path"].asString()] = folder["pending"].asUInt64();
+        previous[share["share"].asString()] = share["files_left"].asUInt64();
+        for (const auto& folder : share["folders"]) previous[folder["path"].asString()] = folder["files_left"].asUInt64();
     }
     const auto rate = [&](Json::Value& entry, const std::string& key) {
-        const double pending = static_cast<double>(entry["pending"].asUInt64());
+        const double pending = static_cast<double>(entry["files_left"].asUInt64());
         const auto found = previous.find(key);
         const double drained = found == previous.end() ? 0 : static_cast<double>(found->second) - pending;
         const double perSecond = seconds > 0 && drained > 0 ? drained / seconds : 0;
@@ -116,20 +118,24 @@ void AddRates(Json::Value& now, const Json::Value& before, double seconds) {
 
 std::string Eta(const Json::Value& eta) { return eta.isNull() ? "-" : std::to_string(eta.asLargestInt()) + "s"; }
 
-std::string PendingText(const Json::Value& share) {
-    const std::string pending = std::to_string(share["pending"].asUInt64());
-    return share["unread"].empty() ? pending : pending + " + " + Join(share["unread"]) + " not read";
+std::string FilesLeftText(const Json::Value& entry) {
+    const std::string left = std::to_string(entry["files_left"].asUInt64());
+    return entry["unread"].empty() ? left : left + " + " + Join(entry["unread"]) + " not read";
+}
+
+std::string UpToDateText(const Json::Value& entry) {
+    return entry["files_left"].asUInt64() == 0 && entry["up_to_date"].isInt64() ? tools::FormatLocalTime(entry["up_to_date"].asInt64()) : "-";
 }
 
 Table ProgressTable(const Json::Value& sample) {
-    Table table = {{"SHARE / FOLDER", "PENDING", "RATE/S", "LEFT"}};
+    Table table = {{"SHARE / FOLDER", "FILES LEFT", "RATE/S", "TIME LEFT", "UP TO DATE SINCE"}};
+    const auto row = [&](const std::string& name, const Json::Value& entry) {
+        table.push_back({name, FilesLeftText(entry), QIRA::FILEINDEX::toString(entry["rate"]), Eta(entry["eta_seconds"]),
+                         UpToDateText(entry)});
+    };
     for (const auto& share : sample["shares"]) {
-        table.push_back({share["share"].asString(), PendingText(share),
-                         QIRA::FILEINDEX::toString(share["rate"]), Eta(share["eta_seconds"])});
-        for (const auto& folder : share["folders"]) {
-            table.push_back({"  " + folder["path"].asString(), std::to_string(folder["pending"].asUInt64()),
-                             QIRA::FILEINDEX::toString(folder["rate"]), Eta(folder["eta_seconds"])});
-        }
+        row(share["share"].asString(), share);
+        for (const auto& folder : share["folders"]) row("  " + folder["path"].asString(), folder);
     }
     return table;
 }
@@ -142,12 +148,13 @@ void DrawScreen(const Json::Value& sample, std::map<std::string, unsigned long l
               << "\n\n";
     for (const auto& share : sample["shares"]) {
         const std::string name = share["share"].asString();
-        const unsigned long long pending = share["pending"].asUInt64();
-        largest[name] = std::max(largest[name], pending);
+        const unsigned long long left = share["files_left"].asUInt64();
+        largest[name] = std::max(largest[name], left);
         const int width = 30;
-        const int done = largest[name] == 0 ? 0 : static_cast<int>(width * (largest[name] - pending) / largest[name]);
-        std::cout << name << " [" << std::string(done, '#') << std::string(width - done, '-') << "] " << pending
-                  << " pending, " << QIRA::FILEINDEX::toString(share["rate"]) << "/s, left " << Eta(share["eta_seconds"])
+        const int done = largest[name] == 0 ? width : static_cast<int>(width * (largest[name] - left) / largest[name]);
+        std::cout << name << " [" << std::string(done, '#') << std::string(width - done, '-') << "] " << left
+                  << (left == 1 ? " file" : " files") << " left, " << QIRA::FILEINDEX::toString(share["rate"])
+                  << "/s, time left " << Eta(share["eta_seconds"])
                   << "\n";
     }
     std::cout.flush();
@@ -166,6 +173,8 @@ bool Sample(Context& ctx, Json::Value& sample, std::string& stuckReason) {
     }
     sample["pause"] = tools::PauseState(sample["pause"]["resume_time"].asInt64());
     sample["daemon"] = tools::DaemonState();
+    const Json::Value daemonProgress = tools::ReadDaemonProgress();
+    for (auto& share : sample["shares"]) tools::AddDaemonProgress(share, daemonProgress);
     bool stuck = false;
     const std::string reason = tools::NotDoneReason(word, folders, sample["daemon"], stuck);
     stuckReason = stuck ? reason : "";

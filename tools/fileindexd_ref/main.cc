@@ -19,6 +19,7 @@
 
 #include <CLI/CLI.hpp>
 
+#include "applied_files.h"
 #include "appliance_root.h"
 #include "cli.h"
 #include "daemon_frame.h"
@@ -64,7 +65,8 @@ bool ReadExactly(int fd, char* buffer, size_t size) {
 
 class Daemon {
 public:
-    explicit Daemon(int listener) : listener_(listener) { QIRA::FILEINDEX::StatusMgr::GetPauseInfo(resume_time_); }
+    // `pace`: at most this many records applied per share and pass; 0 for no limit.
+    Daemon(int listener, size_t pace) : listener_(listener), pace_(pace) { QIRA::FILEINDEX::StatusMgr::GetPauseInfo(resume_time_); }
 
     // Commands are answered at once; the queues are drained once per interval.
     void Serve(int intervalMs) {
@@ -120,6 +122,7 @@ private:
     struct ShareWork {
         fileindexd_ref::ShareIndexer indexer;
         fileindexd_ref::QueueTake queue;
+        fileindexd_ref::AppliedFiles files;
     };
 
     // One pass over the shares holding indexed folders: take each queue, apply the records to the
@@ -135,7 +138,7 @@ private:
             std::string shareDir;
             if (!QIRA::FILEINDEX::GetFullPath(shareDir, "/" + share)) continue;
             auto& work = shares_[share];
-            if (!work) work.reset(new ShareWork{{share, &g_stop}, {share, shareDir}});
+            if (!work) work.reset(new ShareWork{{share, &g_stop}, {share, shareDir}, {}});
             work->indexer.ForgetIfRemoved();
             work->queue.Take();
             serving.push_back(work.get());
@@ -145,11 +148,14 @@ private:
         AcceptPending();
         if (Paused()) return;
         const auto passEnd = std::chrono::steady_clock::now() + kPassBudget;
+        std::vector<size_t> allowance(serving.size(), pace_ > 0 ? pace_ : SIZE_MAX);
         for (bool more = true; more && !g_stop && std::chrono::steady_clock::now() < passEnd;) {
             more = false;
-            for (ShareWork* work : serving) {
+            for (size_t i = 0; i < serving.size(); ++i) {
+                ShareWork* work = serving[i];
+                if (allowance[i] == 0) continue;  // paced: its turn is over for this pass
                 size_t applied = 0;
-                more = ServeSlice(*work, folders, applied) || more;
+                more = (ServeSlice(*work, folders, allowance[i], applied) && allowance[i] > 0) || more;
                 Publish(*work, applied > 0);
                 AcceptPending();
                 if (Paused() || g_stop) return;
@@ -170,33 +176,51 @@ private:
         }
     }
 
-    // Tells the tools how far the share has got: the records of its taken batch applied, and when
-    // it last finished what it had taken. Written only when that changes.
+    // Tells the tools how far the share has got: the records and files of its taken batch applied,
+    // over the share and per folder, and when the share and the folders the batch touched were
+    // last brought up to date. Written only when that changes.
     void Publish(ShareWork& work, bool appliedSome) {
         Json::Value& share = published_["shares"][work.indexer.Share()];
+        const bool reading = work.queue.Applied() > 0;  // a finished companion is gone, and so is what it counted
         const Json::Value applied = static_cast<Json::UInt64>(work.queue.Applied());
         const bool caughtUp = !work.queue.HasMore() && (appliedSome || share["up_to_date"].isNull());
         if (share["applied"] == applied && !caughtUp) return;
+        const Json::Value now = static_cast<Json::Int64>(time(nullptr));
         share["applied"] = applied;
-        if (caughtUp) share["up_to_date"] = static_cast<Json::Int64>(time(nullptr));
+        share["applied_files"] = static_cast<Json::UInt64>(reading ? work.files.Files() : 0);
+        if (caughtUp) share["up_to_date"] = now;
+        for (auto& folder : share["folders"]) folder["applied_files"] = 0;
+        for (const auto& [path, files] : work.files.PerFolder()) {
+            Json::Value& folder = share["folders"][path];
+            folder["applied_files"] = static_cast<Json::UInt64>(reading ? files : 0);
+            if (caughtUp) folder["up_to_date"] = now;
+        }
         tools::WriteDaemonProgress(published_);
     }
 
-    // Batches of one share for at most kSlice, counted in `applied`; true when its companion holds
-    // more.
-    bool ServeSlice(ShareWork& work, const std::vector<QIRA::FILEINDEX::Folder>& folders, size_t& applied) {
+    // Batches of one share for at most kSlice and `allowance` records, counted in `applied` and
+    // taken from `allowance`; true when its companion holds more.
+    bool ServeSlice(ShareWork& work, const std::vector<QIRA::FILEINDEX::Folder>& folders, size_t& allowance,
+                    size_t& applied) {
         const auto sliceEnd = std::chrono::steady_clock::now() + kSlice;
         do {
-            applied += work.queue.ApplyNext(kBatchSize, [&](const fileindexd_ref::Batch& batch) {
-                if (work.indexer.Apply(batch, folders)) return true;
+            const size_t done = work.queue.ApplyNext(std::min(kBatchSize, allowance), [&](const fileindexd_ref::Batch& batch) {
+                const bool restart = work.queue.Applied() == 0;
+                if (work.indexer.Apply(batch, folders)) {
+                    work.files.Count(batch, folders, restart);
+                    return true;
+                }
                 if (g_stop || work.indexer.LastProblem() != tools::IndexProblem::TimedOut) return false;
                 // Applying it again would take as long: the walk the mark asks for covers it.
                 Report(work.indexer.Share(), std::to_string(batch.size()) + " records ran past the batch's time and were"
                                              " dropped; the share is marked need-reindex", work.indexer);
                 QIRA::FILEINDEX::StatusMgr::ShareSetNeedReindex(work.indexer.Share(), true);
+                work.files.Count(batch, folders, restart);
                 return true;
             });
-        } while (work.queue.HasMore() && !g_stop && std::chrono::steady_clock::now() < sliceEnd);
+            applied += done;
+            allowance -= done;
+        } while (work.queue.HasMore() && allowance > 0 && !g_stop && std::chrono::steady_clock::now() < sliceEnd);
         if (applied > 0) Report(work.indexer.Share(), std::to_string(applied) + " records applied", work.indexer);
         return work.queue.HasMore();
     }
@@ -220,6 +244,7 @@ private:
     std::map<std::string, std::unique_ptr<ShareWork>> shares_;
     Json::Value published_;  // what Publish last wrote
     int listener_;
+    size_t pace_;
     long long resume_time_ = -1;
 };
 
@@ -230,8 +255,11 @@ int main(int argc, char** argv) {
     app.set_version_flag("--version", "fileindexd-ref " FILEINDEX_VERSION);
     std::string root;
     int intervalMs = 200;
+    size_t pace = 0;
     app.add_option("--root", root, "Root prefix of the appliance (instead of QIRA_ROOT)");
     app.add_option("--interval", intervalMs, "Milliseconds between passes over the queues")->check(CLI::Range(1, 60000));
+    app.add_option("--pace", pace, "At most this many records applied per share and pass, to watch progress move "
+                                   "(default: no limit)")->check(CLI::Range(size_t{1}, kBatchSize));
     if (const auto ended = tools::Parse(app, argc, argv)) return *ended;
     if (!root.empty()) QIRA::FILEINDEX::UseRootPrefix(root);
     if (root.empty()) tools::WarnWithoutAppliance("fileindexd-ref");
@@ -245,7 +273,7 @@ int main(int argc, char** argv) {
         return 1;
     }
     std::cout << "fileindexd-ref: listening on " << path << std::endl;
-    Daemon(listener).Serve(intervalMs);
+    Daemon(listener, pace).Serve(intervalMs);
     close(listener);
     unlink(path.c_str());
     std::cout << "fileindexd-ref: stopped" << std::endl;

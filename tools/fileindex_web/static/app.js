@@ -6,7 +6,7 @@
 const POLL_MS = 3000;
 const KINDS = ['document', 'audio', 'video', 'photo'];
 const KIND_LABELS = { document: 'Documents', audio: 'Audio', video: 'Video', photo: 'Photos' };
-const state = { offset: 0, limit: 10, sortBy: 'path', direction: 'ASC', total: 0, largest: {}, previous: null };
+const state = { offset: 0, limit: 10, sortBy: 'path', direction: 'ASC', total: 0, largest: {}, previous: null, pendings: {}, openFolds: {} };
 const $ = (id) => document.getElementById(id);
 
 function show(text, kind, details) {
@@ -237,47 +237,75 @@ function renderShares(shares) {
   }
 }
 
-// Records per second drained since the previous poll, and the time left at that rate.
-function drain(name, pending, seconds) {
+// Files per second drained since the previous poll, and the time left at that rate.
+function drain(name, left, seconds) {
   const before = state.previous && state.previous[name];
-  const rate = before !== undefined && seconds > 0 && before > pending ? (before - pending) / seconds : 0;
-  const left = pending === 0 ? 'done' : rate > 0 ? 'about ' + durationText(Math.ceil(pending / rate)) + ' left' : 'time left unknown';
-  return { rate, left };
+  const rate = before !== undefined && seconds > 0 && before > left ? (before - left) / seconds : 0;
+  const timeLeft = left === 0 ? 'done' : rate > 0 ? 'about ' + durationText(Math.ceil(left / rate)) + ' left' : 'time left unknown';
+  return { rate, timeLeft };
 }
 
+function filesText(n) {
+  return n + (n === 1 ? ' file' : ' files');
+}
+
+// A labelled bar and its words for a share or folder: files left (what the daemon has applied of
+// the batch it took no longer counts), rate, time left, and since when it is up to date.
+function progressLine(key, label, entry, seconds, extra) {
+  const left = entry.files_left;
+  state.pendings[key] = left;
+  state.largest[key] = Math.max(state.largest[key] || 0, left);
+  const largest = state.largest[key];
+  const line = document.createElement('p');
+  const bar = document.createElement('span');
+  bar.className = 'bar';
+  bar.setAttribute('role', 'progressbar');
+  bar.setAttribute('aria-label', 'Indexing of ' + label);
+  const done = document.createElement('span');
+  // Nothing left is a full bar, for every share and folder alike.
+  const percent = left === 0 ? 100 : Math.round(100 * (largest - left) / largest);
+  done.style.width = percent + '%';
+  bar.setAttribute('aria-valuenow', String(percent));
+  bar.setAttribute('aria-valuetext', left === 0 ? 'done' : filesText(left) + ' left');
+  bar.appendChild(done);
+  const { rate, timeLeft } = drain(key, left, seconds);
+  const since = left === 0 && entry.up_to_date ? ', up to date since ' + new Date(entry.up_to_date * 1000).toLocaleTimeString() : '';
+  line.append(label + ' ', bar, ' ' + filesText(left) + ' left' + extra + ', ' + rate.toFixed(1) + '/s, ' + timeLeft + since);
+  return line;
+}
+
+// Per share a line, then a line per folder with files left; the folders that are up to date are
+// folded away under one line, and stay open once opened.
 function renderProgress(progress) {
   const now = Date.now();
   const seconds = state.previousAt ? (now - state.previousAt) / 1000 : 0;
   const target = $('progress');
   target.replaceChildren();
-  const pendings = {};
+  state.pendings = {};
   for (const share of progress.shares) {
-    // What the daemon has applied of the batch it took is no longer pending, though still queued.
-    const pending = Math.max(0, share.pending - (share.applied || 0));
-    pendings[share.share] = pending;
-    state.largest[share.share] = Math.max(state.largest[share.share] || 0, pending);
-    const largest = state.largest[share.share];
-    const line = document.createElement('p');
-    line.className = 'share-progress';
-    const bar = document.createElement('span');
-    bar.className = 'bar';
-    bar.setAttribute('role', 'progressbar');
-    bar.setAttribute('aria-label', 'Indexing of share ' + share.share);
-    const done = document.createElement('span');
-    // Nothing pending is a full bar, for every share alike.
-    const percent = pending === 0 ? 100 : Math.round(100 * (largest - pending) / largest);
-    done.style.width = percent + '%';
-    bar.setAttribute('aria-valuenow', String(percent));
-    bar.setAttribute('aria-valuetext', pending === 0 ? 'done' : pending + ' pending');
-    bar.appendChild(done);
-    const { rate, left } = drain(share.share, pending, seconds);
     const unread = share.unread.length ? ' (' + share.unread.join(', ') + ' not read: sparse or too large)' : '';
-    const since = pending === 0 && share.up_to_date ? ', up to date since ' + new Date(share.up_to_date * 1000).toLocaleTimeString() : '';
-    line.append(share.share + ' ', bar, ' ' + pending + ' pending' + unread + ', ' + rate.toFixed(1) + '/s, ' + left + since);
+    const line = progressLine('share ' + share.share, share.share, share, seconds, unread);
+    line.className = 'share-progress';
     target.appendChild(line);
+    const folderLine = (folder) => {
+      const item = progressLine(folder.path, folder.path, folder, seconds, '');
+      item.className = 'folder-progress';
+      return item;
+    };
+    for (const folder of share.folders.filter((f) => f.files_left > 0)) target.appendChild(folderLine(folder));
+    const idle = share.folders.filter((f) => f.files_left === 0);
+    if (!idle.length) continue;
+    const fold = document.createElement('details');
+    fold.className = 'folder-fold';
+    fold.open = Boolean(state.openFolds[share.share]);
+    fold.addEventListener('toggle', () => { state.openFolds[share.share] = fold.open; });
+    const summary = document.createElement('summary');
+    summary.textContent = idle.length + (idle.length === 1 ? ' folder' : ' folders') + ' of ' + share.share + ' up to date';
+    fold.append(summary, ...idle.map(folderLine));
+    target.appendChild(fold);
   }
   if (!progress.shares.length) target.textContent = 'Nothing is indexed.';
-  state.previous = pendings;
+  state.previous = state.pendings;
   state.previousAt = now;
 }
 
