@@ -1,4 +1,5 @@
 // Why a path is or is not indexed, and how far indexing has got.
+#include "applied_files.h"
 #include "testkit.h"
 
 namespace {
@@ -10,6 +11,11 @@ protected:
         std::string path;
         for (int i = 0; i < levels; ++i) path += "/d";
         return path;
+    }
+    // A queue line of the music share: `inside` and, for event 256, `old` beneath the share.
+    std::string Record(const std::string& inside, int event = 1, const std::string& old = "") const {
+        return "{\"event\":" + std::to_string(event) + ",\"path\":\"" + music_ + inside + "\"" +
+               (old.empty() ? "" : ",\"path_old\":\"" + music_ + old + "\"") + "}\n";
     }
     Json::Value Explain(const std::string& path) {
         Json::Value out;
@@ -108,13 +114,9 @@ TEST_F(ExplainTest, TellsTheGoverningFolderByTheLastMatchAndWhatIsPending) {
 TEST_F(ExplainTest, ProgressCountsLinesPerShareAndRecordsAndFilesPerFolder) {
     testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/a/b": {}, "/music/c": {}, "/photo/a": {}})");
     MakeDir(music_ + "/@eaDir");
-    const auto record = [this](const std::string& inside, int event = 1, const std::string& old = "") {
-        return "{\"event\":" + std::to_string(event) + ",\"path\":\"" + music_ + inside + "\"" +
-               (old.empty() ? "" : ",\"path_old\":\"" + music_ + old + "\"") + "}\n";
-    };
-    testkit::WriteFile(QueueOf("music"), record("/a/x") + record("/a/x", 2) + record("/a/b/y") + "garbage\n" + record("/ab") +
-                                             record("/elsewhere", 256, "/c/z") + record("/a", 256, "/a/q"));
-    testkit::WriteFile(QueueOf("music") + ".tmp", record("/c") + "{\"event\":1}");
+    testkit::WriteFile(QueueOf("music"), Record("/a/x") + Record("/a/x", 2) + Record("/a/b/y") + "garbage\n" + Record("/ab") +
+                                             Record("/elsewhere", 256, "/c/z") + Record("/a", 256, "/a/q"));
+    testkit::WriteFile(QueueOf("music") + ".tmp", Record("/c") + "{\"event\":1}");
     Json::Value out;
     ASSERT_TRUE(GetProgress(out));
     EXPECT_EQ(out["pause"], J(R"({"paused": false, "resume_time": -1})"));
@@ -137,6 +139,35 @@ TEST_F(ExplainTest, ProgressCountsLinesPerShareAndRecordsAndFilesPerFolder) {
 
 }  // namespace
 
+// What the daemon stand-in counts applied of a companion is what the report counts pending in it,
+// per folder too (a rename's old path included), and a new companion is counted afresh.
+TEST_F(ExplainTest, TheDaemonCountsAppliedFilesAsTheReportCountsThemPending) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/c": {}})");
+    MakeDir(music_ + "/@eaDir");
+    const std::string companion = QueueOf("music") + ".tmp";
+    testkit::WriteFile(companion, Record("/a/x") + Record("/a/x", 2) + Record("/elsewhere", 256, "/c/z") + Record("/a/y") +
+                                      Record("/c"));
+    Json::Value out;
+    ASSERT_TRUE(GetProgress(out));
+    const Json::Value& music = out["shares"][0];
+    ASSERT_EQ(music["files"].asUInt64(), 4u);
+    fileindexd_ref::Batch batch;
+    ASSERT_EQ(ReadQueueRecords(companion, [&](const QueueRecordView& record) { batch.push_back(record); }, [](off_t, size_t) {}),
+              QueueReading::Read);
+    std::vector<Folder> folders;
+    ASSERT_TRUE(IndexMgr::List(folders));
+    fileindexd_ref::AppliedFiles applied;
+    for (int companions = 1; companions <= 2; ++companions) {
+        applied.Count(batch, folders, true);
+        EXPECT_EQ(applied.Files(), music["files"].asUInt64()) << companions;
+        for (const auto& folder : music["folders"]) {
+            const auto found = applied.PerFolder().find(folder["path"].asString());
+            EXPECT_EQ(folder["files"].asUInt64(), 2u) << folder["path"].asString();
+            EXPECT_EQ(found == applied.PerFolder().end() ? 0 : found->second, folder["files"].asUInt64()) << folder["path"].asString() << companions;
+        }
+    }
+}
+
 // A path seen again among the last kRecentFiles new files is the same file; further back, a new
 // change. Repeats do not push older files out.
 TEST(FileChangesTest, ARepeatIsOneFileWithinTheRecentOnesAndANewChangeBeyond) {
@@ -151,8 +182,11 @@ TEST(FileChangesTest, ARepeatIsOneFileWithinTheRecentOnesAndANewChangeBeyond) {
         return between;
     };
     const size_t recent = FileChanges::kRecentFiles;
+    std::vector<std::string> full = others(recent);
+    full.push_back(full.back());  // the newest, in the window's last place
     const std::vector<std::pair<std::vector<std::string>, size_t>> cases = {
         {around({}), 1},
+        {full, recent},
         {around(others(recent - 1)), recent},
         {around(others(recent)), recent + 2},
         {around(std::vector<std::string>(3 * recent, "/v/b")), 2},

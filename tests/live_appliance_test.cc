@@ -186,7 +186,10 @@ TEST_F(LiveApplianceTest, AFloodInOneShareDoesNotHoldAnotherBack) {
     EXPECT_TRUE(Finds("served", Paths{"/photo/a/found.txt"}));
     const Json::Value published = tools::ReadDaemonProgress()["shares"]["music"];
     EXPECT_EQ(published["applied"].asUInt64(), 0u);  // nothing taken is left
+    EXPECT_EQ(published["applied_files"].asUInt64(), 0u);
+    EXPECT_EQ(published["folders"]["/music/a"]["applied_files"].asUInt64(), 0u);
     EXPECT_GE(published["up_to_date"].asInt64(), static_cast<Json::Int64>(time(nullptr)) - 600);
+    EXPECT_TRUE(published["folders"]["/music/a"]["up_to_date"].isInt64());  // brought up to date in the flood
 }
 
 // SIGTERM stops the daemon amid a flood rather than after draining it.

@@ -161,6 +161,19 @@ TEST_F(QueueReadingsTest, ALongQueueReadInTwoPartsLogsEachMalformedLineOnceInOrd
     EXPECT_EQ(testkit::LogMessages(), std::vector<std::string>{"Malformed command: junk"});
 }
 
+// A last line without "\n" counts for that answer only: completed, its file counts once.
+TEST_F(QueueReadingsTest, ACompletedLastLineCountsItsFileOnce) {
+    const auto line = [this](const char* name) { return "{\"event\":1,\"path\":\"" + dir_ + "/a/" + name + "\"}"; };
+    testkit::WriteFile(queue_, line("x") + "\n" + line("y"));
+    for (const char* appended : {"", "\n"}) {
+        testkit::AppendFile(queue_, appended);
+        QueueAnswer answer;
+        ASSERT_TRUE(detail::ReadQueue(queue_, {dir_ + "/a/"}, answer));
+        EXPECT_EQ(answer.all, (detail::Tally{2, 2})) << appended;
+        EXPECT_EQ(answer.under[0], (detail::Tally{2, 2})) << appended;
+    }
+}
+
 // The folders kept per file are bounded, but never below one question's: a question about more
 // folders than the bound still gets every count.
 TEST_F(QueueReadingsTest, AQuestionAboutMoreFoldersThanKeptIsAnsweredWhole) {
