@@ -94,7 +94,9 @@ std::string QueueText(const std::string& input) {
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     const Appliance& appliance = Setup();
-    static fileindexd_ref::ShareIndexer indexer("music", &g_stop);
+    // Paths are what is fuzzed here: files are indexed by name, no extraction worker being built beside.
+    static fileindexd_ref::ExtractorClient extractor({fileindexd_ref::DefaultExtractorProgram(), {}, std::chrono::seconds(10)});
+    static fileindexd_ref::ShareIndexer indexer("music", &g_stop, extractor);
     static fileindexd_ref::QueueTake queue("music", fuzzkit::MusicDir());
     fuzzkit::WriteFile(fuzzkit::QueuePath(), QueueText(std::string(reinterpret_cast<const char*>(data), size)));
     queue.Take();

@@ -87,7 +87,7 @@ protected:
     std::string IndexFile(const std::string& share) { return DbDir(share) + "/index.sqlite"; }
     // Builds the music share's index afresh and runs `statements` on it.
     void IndexMusicAndRun(const char* statements) {
-        ASSERT_TRUE(fileindexd_ref::ShareIndexer("music", &stop_).Reindex(folders_));
+        ASSERT_TRUE(fileindexd_ref::ShareIndexer("music", &stop_, extractor_).Reindex(folders_));
         sqlite3* db = nullptr;
         ASSERT_EQ(sqlite3_open(IndexFile("music").c_str(), &db), SQLITE_OK);
         EXPECT_EQ(sqlite3_exec(db, statements, nullptr, nullptr, nullptr), SQLITE_OK) << sqlite3_errmsg(db);
@@ -102,6 +102,7 @@ protected:
 
     std::vector<QIRA::FILEINDEX::Folder> folders_;
     volatile sig_atomic_t stop_ = 0;
+    fileindexd_ref::ExtractorClient extractor_{{FILEINDEX_EXTRACTOR, {}, std::chrono::seconds(30)}};
 };
 
 // Every path not canonical beneath the share, at the start, middle or end of a batch and through
@@ -120,7 +121,7 @@ TEST_F(HostileShareTest, RecordsClimbingOutOfTheShareChangeNothingAndOpenNothing
         music_ + "/a/../../../outside/secret.txt", music_ + "/../photo/a/other.txt", music_ + "/..", music_ + "x/sibling.txt",
         outside + "/secret.txt", music_ + "/a/./../../photo", music_ + "//a", music_ + "/a/", music_ + std::string("/a\0/../..", 9),
         "../../outside", ""};
-    fileindexd_ref::ShareIndexer indexer("music", &stop_);
+    fileindexd_ref::ShareIndexer indexer("music", &stop_, extractor_);
     OpenWatch watch({outside, photo_ + "/a", music_ + "x"});
     for (const auto& bad : climbing) {
         for (const unsigned event : {1u, 2u, 4u, 8u, 256u, 65536u, 131072u}) {
@@ -145,7 +146,7 @@ TEST_F(HostileShareTest, RecordsClimbingOutOfTheShareChangeNothingAndOpenNothing
 // a new index made; a search of the thing answers Damaged at once.
 TEST_F(HostileShareTest, AnIndexNotOursIsSetAsideAndRebuiltAndSearchSaysItIsDamaged) {
     testkit::WriteFile(music_ + "/a/one.txt", "good");
-    fileindexd_ref::ShareIndexer photo("photo", &stop_);
+    fileindexd_ref::ShareIndexer photo("photo", &stop_, extractor_);
     ASSERT_TRUE(photo.Reindex(folders_));  // a real index elsewhere, to link to
     const std::string photoIndex = testkit::ReadFile(IndexFile("photo"));
     const auto sql = [this](const char* statements) { return [this, statements] { IndexMusicAndRun(statements); }; };
@@ -188,7 +189,7 @@ TEST_F(HostileShareTest, AnIndexNotOursIsSetAsideAndRebuiltAndSearchSaysItIsDama
             return !tools::SearchIndex::Open(ShareDir("music"), false, problem, error) && problem == tools::IndexProblem::Damaged;
         });
         EXPECT_EQ(damaged, c.searchRefuses ? 1 : 0);
-        fileindexd_ref::ShareIndexer indexer("music", &stop_);
+        fileindexd_ref::ShareIndexer indexer("music", &stop_, extractor_);
         testing::internal::CaptureStdout();
         EXPECT_TRUE(indexer.Apply({Record(2, music_ + "/a/one.txt")}, folders_));
         EXPECT_NE(testing::internal::GetCapturedStdout().find("set aside as"), std::string::npos);
@@ -206,7 +207,7 @@ TEST_F(HostileShareTest, CorruptionMetLaterSetsTheIndexAsideAndMarksTheShare) {
     IndexMusicAndRun("PRAGMA wal_checkpoint(TRUNCATE); PRAGMA journal_mode=DELETE;");
     const std::string text = testkit::ReadFile(IndexFile("music"));
     testkit::WriteFile(IndexFile("music"), text.substr(0, 4096) + std::string(text.size() - 4096, '\x7f'));  // all but the schema
-    fileindexd_ref::ShareIndexer later("music", &stop_);
+    fileindexd_ref::ShareIndexer later("music", &stop_, extractor_);
     testing::internal::CaptureStdout();
     EXPECT_FALSE(later.Apply({Record(2, music_ + "/a/one.txt")}, folders_));
     EXPECT_NE(testing::internal::GetCapturedStdout().find("the index turned out damaged; set aside as"), std::string::npos);
@@ -243,7 +244,7 @@ TEST_F(HostileShareTest, LiveRecordsAndWalksGiveTheSameIndex) {
     batch.push_back(Record(1, deep + "/e/past-the-bound.txt"));
     batch.push_back(Record(1, deep + "/e"));
     const Paths expected = {"/music/a/ok.txt", "/music/b/sub/x.txt", deep.substr(music_.size() - 6) + "/at-the-bound.txt"};
-    fileindexd_ref::ShareIndexer indexer("music", &stop_);
+    fileindexd_ref::ShareIndexer indexer("music", &stop_, extractor_);
     testing::internal::CaptureStdout();
     ASSERT_TRUE(indexer.Apply(batch, folders_));
     EXPECT_EQ(Found("music"), expected);
@@ -325,7 +326,7 @@ TEST_F(HostileShareTest, RecordsForOnePathAreAppliedOncePerBatch) {
     testkit::WriteFile(big, "before " + std::string(256 * 1024, 'w'));
     Batch batch(1000, Record(2, big));
     batch.push_back(Record(8, big));
-    fileindexd_ref::ShareIndexer indexer("music", &stop_);
+    fileindexd_ref::ShareIndexer indexer("music", &stop_, extractor_);
     OpenWatch watch({music_ + "/a"}, IN_OPEN);
     ASSERT_TRUE(indexer.Apply(batch, folders_));
     const auto opened = watch.Opened();
@@ -348,7 +349,7 @@ TEST_F(HostileShareTest, MovesAndRemovalsKeepToTheirPathAndRenameTheText) {
     MakeDir(music_ + "/a/live");
     MakeDir(music_ + "/a/live-2023");
     for (const std::string file : {"/a/live/x.txt", "/a/live.txt", "/a/live-2023/y.txt"}) testkit::WriteFile(music_ + file, "text");
-    fileindexd_ref::ShareIndexer indexer("music", &stop_);
+    fileindexd_ref::ShareIndexer indexer("music", &stop_, extractor_);
     ASSERT_TRUE(indexer.Reindex(folders_));
     ASSERT_EQ(rename((music_ + "/a/live").c_str(), (music_ + "/a/gone").c_str()), 0);
     ASSERT_TRUE(indexer.Apply({Record(256, music_ + "/a/gone", music_ + "/a/live")}, folders_));
@@ -358,7 +359,8 @@ TEST_F(HostileShareTest, MovesAndRemovalsKeepToTheirPathAndRenameTheText) {
     ASSERT_EQ(rename((music_ + "/a/gone/x.txt").c_str(), (music_ + "/a/live.txt.bak").c_str()), 0);
     ASSERT_EQ(rmdir((music_ + "/a/gone").c_str()), 0);
     ASSERT_TRUE(indexer.Apply({Record(8, music_ + "/a/gone"), Record(1, music_ + "/a/live.txt.bak")}, folders_));
-    EXPECT_EQ(Found("music"), (Paths{"/music/a/live-2023/y.txt", "/music/a/live.txt"}));  // ".bak" is no known type
+    // ".bak" tells no type: the file is typed by what it holds, text.
+    EXPECT_EQ(Found("music"), (Paths{"/music/a/live-2023/y.txt", "/music/a/live.txt", "/music/a/live.txt.bak"}));
 }
 
 // Names are shown as their bytes, never acted on: the table escapes them as ls does, JSON carries
@@ -384,7 +386,7 @@ TEST_F(HostileShareTest, NamesWithControlCharactersAndBrokenUtf8AreShownSafely) 
     }
 
     for (const std::string name : {"a\nb.txt", "\x1b[31mred.txt", "caf\xe9.txt"}) testkit::WriteFile(music_ + "/a/" + name, "needle");
-    fileindexd_ref::ShareIndexer indexer("music", &stop_);
+    fileindexd_ref::ShareIndexer indexer("music", &stop_, extractor_);
     ASSERT_TRUE(indexer.Reindex(folders_));
     const auto table = testkit::Run({FILEINDEXCTL, "search", "needle"});
     EXPECT_EQ(table.status, 0) << table.err;
@@ -425,7 +427,7 @@ TEST_F(HostileShareTest, QueriesAreBoundedInBytesWordsAndHits) {
         for (const char* name : {"/a/1.txt", "/a/2.txt", "/a/3.txt"}) testkit::WriteFile(dir + name, "needle");
     }
     testkit::WriteFile(photo_ + "/a/needle.txt", "");
-    for (const auto& share : {"music", "photo"}) ASSERT_TRUE(fileindexd_ref::ShareIndexer(share, &stop_).Reindex(folders_));
+    for (const auto& share : {"music", "photo"}) ASSERT_TRUE(fileindexd_ref::ShareIndexer(share, &stop_, extractor_).Reindex(folders_));
     const auto search = [](const std::vector<std::string>& page) {
         std::vector<std::string> args = {FILEINDEXCTL, "--json", "search", "needle"};
         args.insert(args.end(), page.begin(), page.end());
@@ -458,7 +460,7 @@ TEST_F(HostileShareTest, QueriesAreBoundedInBytesWordsAndHits) {
 // The CLI reads a share's index only where its user may read the share's directory.
 TEST_F(HostileShareTest, SearchReadsNoIndexOfAShareTheCallerCannotRead) {
     testkit::WriteFile(music_ + "/a/one.txt", "needle");
-    ASSERT_TRUE(fileindexd_ref::ShareIndexer("music", &stop_).Reindex(folders_));
+    ASSERT_TRUE(fileindexd_ref::ShareIndexer("music", &stop_, extractor_).Reindex(folders_));
     ASSERT_EQ(chmod(root().c_str(), 0755), 0);
     for (const mode_t mode : {0700, 0711, 0744}) {  // neither listing nor entering is enough alone
         ASSERT_EQ(chmod(music_.c_str(), mode), 0);

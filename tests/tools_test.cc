@@ -7,8 +7,8 @@
 #include "banner.h"
 #include "daemon_progress.h"
 #include "pending_rate.h"
-#include "share_indexer.h"
 #include "time_text.h"
+#include "share_indexer.h"
 
 namespace {
 
@@ -408,7 +408,8 @@ TEST_F(ToolTest, ExplainTellsWhetherAFileIsInTheIndexAndWhatKeepsItOut) {
     std::vector<Folder> folders;
     ASSERT_TRUE(IndexMgr::List(folders));
     volatile sig_atomic_t stop = 0;
-    ASSERT_TRUE(fileindexd_ref::ShareIndexer("music", &stop).Reindex(folders));
+    fileindexd_ref::ExtractorClient extractor({FILEINDEX_EXTRACTOR, {}, std::chrono::seconds(30)});
+    ASSERT_TRUE(fileindexd_ref::ShareIndexer("music", &stop, extractor).Reindex(folders));
     testkit::WriteFile(music_ + "/a/new.mp3", "x");  // after the walk
     const std::vector<std::tuple<std::string, std::function<void()>, std::string>> cases = {
         {"/music/a/song.mp3", [] {}, "in the index"},
@@ -453,12 +454,45 @@ TEST_F(ToolTest, ExplainTellsWhetherAFileIsInTheIndexAndWhatKeepsItOut) {
     EXPECT_NE(Ctl({"folder", "list", "--additional", "indexed_files"}).out.find("  FILES\n"), std::string::npos);
 }
 
+// What the daemon published is read only from a regular file of at most 1 MiB reached without a
+// link, and only as objects, so that a damaged file shows nothing wrong.
+TEST_F(ToolTest, ThePublishedProgressIsReadOnlyWhereAndAsItIsWritten) {
+    const std::string file = tools::DaemonProgressPath();
+    const std::string published =
+        R"({"shares": {"music": {"applied": 3, "folders": {"/music/a": 5, "/music/b": {"applied_files": 1}}}, "photo": 7}})";
+    const Json::Value read = J(R"({"shares": {"music": {"applied": 3, "folders": {"/music/b": {"applied_files": 1}}}}})");
+    const std::string padded = published + std::string((1 << 20) - published.size(), ' ');
+    const std::vector<std::tuple<std::string, std::function<void()>, Json::Value>> cases = {
+        {"as written", [&] { testkit::WriteFile(file, published); }, read},
+        {"1 MiB", [&] { testkit::WriteFile(file, padded); }, read},
+        {"1 MiB and a byte", [&] { testkit::WriteFile(file, padded + " "); }, Json::Value()},
+        {"a link", [&] { testkit::WriteFile(file + ".real", published); ASSERT_EQ(symlink((file + ".real").c_str(), file.c_str()), 0); }, Json::Value()},
+        {"a FIFO", [&] { ASSERT_EQ(mkfifo(file.c_str(), 0600), 0); }, Json::Value()},
+        {"no shares object", [&] { testkit::WriteFile(file, R"({"shares": []})"); }, Json::Value()},
+    };
+    for (const auto& [what, make, expected] : cases) {
+        unlink(file.c_str());
+        make();
+        EXPECT_EQ(tools::ReadDaemonProgress(), expected) << what;
+    }
+}
+
 // wait ends when indexing is finished, or at its time-out with 3 while work is pending; progress
 // --watch writes JSON lines off a terminal and bars on one.
 TEST_F(ToolTest, WaitAndWatchFollowThePendingWork) {
-    testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/photo/a": {}})");
     MakeDir(music_ + "/@eaDir");
     testkit::WriteFile(QueueOf("music"), "{\"event\":1,\"path\":\"" + music_ + "/a/x\"}\n");
+    // Since when a share is up to date is shown only when nothing is left of it.
+    ASSERT_TRUE(tools::WriteDaemonProgress(J(R"({"shares": {"music": {"up_to_date": 1700000000},
+                                                            "photo": {"up_to_date": 1700000000}}})")));
+    const std::string table = Ctl({"progress", "--interval", "0.05"}).out;
+    const std::string since = tools::FormatLocalTime(1700000000);
+    ASSERT_EQ(Lines(table).size(), 5u) << table;
+    for (const std::string& row : Lines(table)) {
+        const std::string end = row.find("music") != std::string::npos ? "-" : row.find("photo") != std::string::npos ? since : "";
+        EXPECT_EQ(row.substr(row.size() - end.size()), end) << table;
+    }
     const auto lines = Ctl({"progress", "--watch", "--samples", "2", "--interval", "0.05"});
     ASSERT_EQ(lines.status, 0) << lines.err;
     ASSERT_EQ(Lines(lines.out).size(), 2u);
@@ -474,6 +508,26 @@ TEST_F(ToolTest, WaitAndWatchFollowThePendingWork) {
     const auto result = Ctl({"wait", "--timeout", "5", "--json"});
     EXPECT_EQ(result.status, 0);
     EXPECT_EQ(testkit::ParseJson(result.out)["result"]["status"].asString(), "finished");
+}
+
+// Paced, the daemon stand-in applies at most so many records of a share per pass.
+TEST_F(ToolTest, APacedDaemonAppliesAtMostItsPacePerPass) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {}})");
+    daemon_.reset();
+    MakeDir(music_ + "/@eaDir");
+    std::string queue;
+    for (int i = 0; i < 50; ++i) queue += "{\"event\":2,\"path\":\"" + music_ + "/a/gone" + std::to_string(i) + "\"}\n";
+    testkit::WriteFile(QueueOf("music"), queue);
+    const std::string log = Path("/daemon.log");
+    const pid_t daemon = testkit::Start({FILEINDEXD_REF, "--interval", "5", "--pace", "7"}, log);
+    const std::shared_ptr<void> stop(nullptr, [daemon](void*) { EXPECT_EQ(testkit::Stop(daemon), 0); });
+    ASSERT_TRUE(testkit::WaitFor([&] { return testkit::RecordsApplied(testkit::ReadFile(log), "music") == 50; }));
+    std::vector<unsigned long> slices;
+    for (const std::string& line : Lines(testkit::ReadFile(log))) {
+        const size_t at = line.find("share music: ");
+        if (at != std::string::npos && line.find(" records applied") != std::string::npos) slices.push_back(std::stoul(line.substr(at + 13)));
+    }
+    EXPECT_EQ(slices, (std::vector<unsigned long>{7, 7, 7, 7, 7, 7, 7, 1}));
 }
 
 // A pause holds the work back; progress --watch shows the backlog shrink once the daemon drains

@@ -27,7 +27,7 @@ const char kPragmas[] = "PRAGMA journal_mode=WAL; PRAGMA synchronous=NORMAL;";
 const char kInMemoryTemp[] = "PRAGMA temp_store=MEMORY;";
 const char kSchema[] =
     "CREATE TABLE IF NOT EXISTS files(id INTEGER PRIMARY KEY, path TEXT NOT NULL UNIQUE, type TEXT NOT NULL,"
-    " size INTEGER NOT NULL, mtime INTEGER NOT NULL);"
+    " size INTEGER NOT NULL, mtime INTEGER NOT NULL, problem TEXT NOT NULL DEFAULT '');"
     "CREATE VIRTUAL TABLE IF NOT EXISTS search USING fts5(name, path, body,"
     " tokenize = 'unicode61 remove_diacritics 2', prefix = '2 3');";
 
@@ -382,9 +382,11 @@ void SearchIndex::Rollback() {
 
 bool SearchIndex::Put(const IndexedFile& file) {
     Statement upsert(db_,
-                     "INSERT INTO files(path, type, size, mtime) VALUES(?1, ?2, ?3, ?4) ON CONFLICT(path) DO UPDATE SET"
-                     " type = excluded.type, size = excluded.size, mtime = excluded.mtime RETURNING id");
-    if (!upsert.Ok() || !upsert.Bind(1, file.path).Bind(2, file.type).Bind(3, file.size).Bind(4, file.mtime).Step()) {
+                     "INSERT INTO files(path, type, size, mtime, problem) VALUES(?1, ?2, ?3, ?4, ?5) ON CONFLICT(path) DO"
+                     " UPDATE SET type = excluded.type, size = excluded.size, mtime = excluded.mtime,"
+                     " problem = excluded.problem RETURNING id");
+    if (!upsert.Ok() ||
+        !upsert.Bind(1, file.path).Bind(2, file.type).Bind(3, file.size).Bind(4, file.mtime).Bind(5, file.problem).Step()) {
         return Check(SQLITE_ERROR);
     }
     const long long id = upsert.Number(0);

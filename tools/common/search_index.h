@@ -31,6 +31,7 @@ struct IndexedFile {
     long long size = 0;
     long long mtime = 0;
     std::string text;  // the text of a plain-text document, valid UTF-8; empty otherwise
+    std::string problem;  // why its content could not be read (indexed by name only); "" when none
 };
 
 struct SearchHit {

@@ -66,7 +66,8 @@ bool ReadExactly(int fd, char* buffer, size_t size) {
 class Daemon {
 public:
     // `pace`: at most this many records applied per share and pass; 0 for no limit.
-    Daemon(int listener, size_t pace) : listener_(listener), pace_(pace) { QIRA::FILEINDEX::StatusMgr::GetPauseInfo(resume_time_); }
+    Daemon(int listener, size_t pace, fileindexd_ref::ExtractorSettings extraction)
+        : listener_(listener), pace_(pace), extractor_(std::move(extraction)) { QIRA::FILEINDEX::StatusMgr::GetPauseInfo(resume_time_); }
 
     // Commands are answered at once; the queues are drained once per interval.
     void Serve(int intervalMs) {
@@ -138,7 +139,7 @@ private:
             std::string shareDir;
             if (!QIRA::FILEINDEX::GetFullPath(shareDir, "/" + share)) continue;
             auto& work = shares_[share];
-            if (!work) work.reset(new ShareWork{{share, &g_stop}, {share, shareDir}, {}});
+            if (!work) work.reset(new ShareWork{{share, &g_stop, extractor_}, {share, shareDir}, {}});
             work->indexer.ForgetIfRemoved();
             work->queue.Take();
             serving.push_back(work.get());
@@ -245,6 +246,7 @@ private:
     Json::Value published_;  // what Publish last wrote
     int listener_;
     size_t pace_;
+    fileindexd_ref::ExtractorClient extractor_;  // one worker for every share
     long long resume_time_ = -1;
 };
 
@@ -256,11 +258,21 @@ int main(int argc, char** argv) {
     std::string root;
     int intervalMs = 200;
     size_t pace = 0;
+    fileindexd_ref::ExtractorSettings extraction;
+    extraction.program = fileindexd_ref::DefaultExtractorProgram();
+    long long deadlineMs = extraction.deadline.count();
     app.add_option("--root", root, "Root prefix of the appliance (instead of QIRA_ROOT)");
     app.add_option("--interval", intervalMs, "Milliseconds between passes over the queues")->check(CLI::Range(1, 60000));
     app.add_option("--pace", pace, "At most this many records applied per share and pass, to watch progress move "
                                    "(default: no limit)")->check(CLI::Range(size_t{1}, kBatchSize));
+    app.add_option("--extract-memory", extraction.limits.memoryMiB, "Address space of the extraction worker, in MiB")
+        ->check(CLI::Range(64, 65536));
+    app.add_option("--extract-cpu", extraction.limits.cpuSeconds, "CPU seconds the extraction worker may spend on one file")
+        ->check(CLI::Range(1, 3600));
+    app.add_option("--extract-deadline", deadlineMs, "Milliseconds the extraction worker may take for one file")
+        ->check(CLI::Range(100, 3600000));
     if (const auto ended = tools::Parse(app, argc, argv)) return *ended;
+    extraction.deadline = std::chrono::milliseconds(deadlineMs);
     if (!root.empty()) QIRA::FILEINDEX::UseRootPrefix(root);
     if (root.empty()) tools::WarnWithoutAppliance("fileindexd-ref");
     signal(SIGTERM, OnTerm);
@@ -273,7 +285,7 @@ int main(int argc, char** argv) {
         return 1;
     }
     std::cout << "fileindexd-ref: listening on " << path << std::endl;
-    Daemon(listener, pace).Serve(intervalMs);
+    Daemon(listener, pace, extraction).Serve(intervalMs);
     close(listener);
     unlink(path.c_str());
     std::cout << "fileindexd-ref: stopped" << std::endl;

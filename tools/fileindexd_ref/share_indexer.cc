@@ -29,19 +29,6 @@ constexpr unsigned kReindex = 0x10000;
 constexpr std::chrono::seconds kBatchBudget{30};
 constexpr int kDirFlags = O_RDONLY | O_DIRECTORY;
 
-// The first kTextCap bytes of a regular file in `dirFd`, opened without following a link or blocking.
-std::string ReadText(int dirFd, const std::string& name) {
-    const tools::Fd fd(openat(dirFd, name.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
-    struct stat st;
-    std::string text;
-    if (fd.Valid() && fstat(fd.Get(), &st) == 0 && S_ISREG(st.st_mode)) {
-        text.resize(kTextCap);
-        const ssize_t got = read(fd.Get(), &text[0], text.size());
-        text.resize(got > 0 ? static_cast<size_t>(got) : 0);
-    }
-    return tools::ValidUtf8(text, " ");
-}
-
 bool IsTooDeep(const char* refusal) { return refusal != nullptr && std::strcmp(refusal, "too_deep") == 0; }
 
 void Say(const std::string& share, const std::string& what) {
@@ -238,16 +225,46 @@ void ShareIndexer::Walk(int fd, const std::string& path, int depth, bool force, 
     closedir(dir);
 }
 
+extractor::Reply ShareIndexer::Extract(int dirFd, const std::string& name, const std::string& sharePath) {
+    const tools::Fd fd(openat(dirFd, name.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+    struct stat st;
+    extractor::Reply reply;
+    if (!fd.Valid() || fstat(fd.Get(), &st) != 0 || !S_ISREG(st.st_mode)) {
+        reply.problem = "not a regular file reached without a link";
+    } else {
+        reply = extractor_.Extract(fd.Get(), name, kTextCap);
+    }
+    if (!reply.problem.empty()) {
+        Say(share_, tools::EscapeForTerminal(sharePath) + ": indexed by name only: " + tools::EscapeForTerminal(reply.problem));
+    }
+    return reply;
+}
+
+// A file whose name tells its kind is indexed as that kind, its text read when it is a document;
+// one whose name does not is typed by what it holds. Unchanged files are not read again, so that
+// a file that failed is not retried until it changes.
 void ShareIndexer::IndexFile(int dirFd, const std::string& name, const std::string& fullPath, const struct stat& st,
                              const Json::Value& governing, bool force, const Stored& stored, std::set<std::string>& seen) {
-    const std::string type = tools::FileTypeOf(name);
-    if (type.empty() || !governing.get(type, false).asBool()) return;  // unseen: removed when stored
+    const auto on = [&governing](const std::string& type) { return !type.empty() && governing.get(type, false).asBool(); };
+    std::string type = tools::FileTypeOf(name);
+    if (!type.empty() && !on(type)) return;  // unseen: removed when stored
     const std::string sharePath = SharePathOf(fullPath);
-    seen.insert(sharePath);
     const auto found = stored.find(sharePath);
     const std::pair<long long, long long> stamp(st.st_size, st.st_mtime);
-    if (!force && found != stored.end() && found->second == stamp) return;
-    index_->Put({sharePath, type, st.st_size, st.st_mtime, tools::HasPlainText(name) ? ReadText(dirFd, name) : ""});
+    if (!force && found != stored.end() && found->second == stamp) {
+        seen.insert(sharePath);
+        return;
+    }
+    tools::IndexedFile file{sharePath, type, st.st_size, st.st_mtime, "", ""};
+    if (type.empty() || type == "document") {
+        extractor::Reply reply = Extract(dirFd, name, sharePath);
+        if (type.empty()) file.type = reply.type;
+        file.text = std::move(reply.text);
+        file.problem = std::move(reply.problem);
+    }
+    if (!on(file.type)) return;
+    seen.insert(sharePath);
+    index_->Put(file);
 }
 
 }  // namespace fileindexd_ref

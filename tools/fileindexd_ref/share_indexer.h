@@ -20,21 +20,24 @@
 #include <json/value.h>
 
 #include "beneath.h"
+#include "extractor_client.h"
 #include "fileindex/folder.h"
 #include "fileindex/queue_reader.h"
 #include "search_index.h"
 
 namespace fileindexd_ref {
 
-// Text of plain-text documents is indexed up to this many bytes.
+// Text of documents is indexed up to this many bytes.
 constexpr size_t kTextCap = 256 * 1024;
 
 using Stored = std::map<std::string, std::pair<long long, long long>>;  // share path -> size, mtime
 
 class ShareIndexer {
 public:
-    // Statements and walks stop once `*stop` becomes nonzero.
-    ShareIndexer(std::string share, const volatile sig_atomic_t* stop) : share_(std::move(share)), stop_(stop) {}
+    // Statements and walks stop once `*stop` becomes nonzero. What files hold is read through
+    // `extractor`: documents' text, and the kind of a file whose name tells none.
+    ShareIndexer(std::string share, const volatile sig_atomic_t* stop, ExtractorClient& extractor)
+        : share_(std::move(share)), stop_(stop), extractor_(extractor) {}
 
     // Applies the records in one transaction, each path once (a move starts afresh): 1 created, 2
     // written and 65536 reindex read the path afresh, 4 (attributes), 8 (deleted) and 131072
@@ -64,6 +67,8 @@ private:
     void Walk(int fd, const std::string& path, int depth, bool force, std::set<std::string>& seen, const Stored& stored);
     void IndexFile(int dirFd, const std::string& name, const std::string& fullPath, const struct stat& st,
                    const Json::Value& governing, bool force, const Stored& stored, std::set<std::string>& seen);
+    // What the file `name` in `dirFd` holds; a problem is logged.
+    extractor::Reply Extract(int dirFd, const std::string& name, const std::string& sharePath);
     int Depth(const std::string& fullPath) const;
     // EntryRefusal of a directory on the way, asked once per batch.
     const char* WayRefusal(const std::string& dir);
@@ -72,6 +77,7 @@ private:
 
     std::string share_;
     const volatile sig_atomic_t* stop_;
+    ExtractorClient& extractor_;
     std::string shareDir_;  // the share directory: full path = volume_ + share path
     std::string volume_;
     tools::Fd shareFd_;

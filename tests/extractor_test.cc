@@ -1,0 +1,135 @@
+// The extraction worker: what it reads from files of each kind, the bounds of its requests, its
+// sandbox, and the daemon's side living through a worker that stops answering or dies.
+#include <signal.h>
+#include <sys/socket.h>
+#include <sys/wait.h>
+
+#include <thread>
+
+#include "beneath.h"
+#include "extractor_client.h"
+#include "worker_sandbox.h"
+#include "testkit.h"
+
+namespace {
+
+using fileindexd_ref::ExtractorClient;
+
+class ExtractorTest : public testkit::Sandbox {
+protected:
+    extractor::Reply Extract(const std::string& name, const std::string& content, size_t maxText = 1024) {
+        const std::string path = Path("/" + name);
+        testkit::WriteFile(path, content);
+        const tools::Fd fd(open(path.c_str(), O_RDONLY | O_CLOEXEC));
+        return client_.Extract(fd.Get(), name, maxText);
+    }
+    ExtractorClient client_{{FILEINDEX_EXTRACTOR, {}, std::chrono::seconds(30)}};
+};
+
+// A file's kind is told by what it holds, whatever its name; text is read in its encoding.
+TEST_F(ExtractorTest, KindAndTextComeFromTheContent) {
+    const std::string jpeg("\xFF\xD8\xFF\xE0\x00\x10JFIF\x00\x01\x01\x00\x00\x01\x00\x01\x00\x00", 20);
+    const std::string mp3 = std::string("ID3\x03\x00\x00\x00\x00\x00\x00\xFF\xFB\x90\x64", 14) + std::string(417, '\0');
+    const std::vector<std::tuple<std::string, std::string, std::string, std::string, std::string>> cases = {
+        // name, content, type, mime, text
+        {"notes", "An old manuscript\nfrom the attic\n", "document", "text/plain", "An old manuscript\nfrom the attic\n"},
+        {"latin", "caf\xE9 cr\xE8me br\xFBl\xE9" "e au four, d\xE9j\xE0 pr\xEAte\n", "document", "text/plain",
+         "café crème brûlée au four, déjà prête\n"},
+        {"wide", std::string("\xFF\xFEh\0i\0 \0t\0h\0e\0r\0e\0", 18), "document", "text/plain", "hi there"},
+        {"page", "<html><head><title>The  Title</title><style>p {}</style></head><body><script>var x;</script>"
+                 "<p>Hello <b>bold</b>\n world</p></body></html>", "document", "text/html", "Hello bold world"},
+        {"IMG_0001", jpeg, "photo", "image/jpeg", ""},
+        {"song", mp3, "audio", "audio/mpeg", ""},
+        {"flac", std::string("fLaC\x00\x00\x00\x22", 8) + std::string(64, '\0'), "audio", "audio/flac", ""},
+        {"blob", std::string("\x01\x02\x03\x04\x00\xFE", 6) + std::string(64, '\0'), "", "application/octet-stream", ""},
+    };
+    for (const auto& [name, content, type, mime, text] : cases) {
+        const extractor::Reply reply = Extract(name, content);
+        EXPECT_EQ(reply.problem, "") << name;
+        EXPECT_EQ(reply.type + " " + reply.mime, type + " " + mime) << name;
+        EXPECT_EQ(reply.text, text) << name;
+    }
+    EXPECT_EQ(Extract("page.html", "<title>The  Title</title><p>x</p>").fields, testkit::ParseJson(R"({"title": "The Title"})"));
+    // The text is cut to what was asked, at a character's start.
+    EXPECT_EQ(Extract("cut", "d\xC3\xA9j\xC3\xA0 vu", 5).text, "d\xC3\xA9j");
+}
+
+// Requests are taken within their bounds, on both sides of each.
+TEST(ExtractorProtocolTest, RequestsAreTakenWithinTheirBounds) {
+    const std::string longest(extractor::kMaxName, 'n');
+    const std::vector<std::pair<std::string, std::string>> cases = {
+        {R"({"name": ")" + longest + R"(", "max_text": 1048576})", ""},
+        {R"({"name": "a", "max_text": 0})", ""},
+        {R"({"name": ")" + longest + R"(n", "max_text": 1})", "\"name\" is not a file name of 1 to 255 bytes"},
+        {R"({"name": "", "max_text": 1})", "\"name\" is not a file name of 1 to 255 bytes"},
+        {R"({"name": "a/b", "max_text": 1})", "\"name\" is not a file name of 1 to 255 bytes"},
+        {R"({"name": "a\u0000b", "max_text": 1})", "\"name\" is not a file name of 1 to 255 bytes"},
+        {R"({"name": 7, "max_text": 1})", "\"name\" is not a file name of 1 to 255 bytes"},
+        {R"({"name": "a", "max_text": 1048577})", "\"max_text\" is not a whole number from 0 to 1048576"},
+        {R"({"name": "a", "max_text": -1})", "\"max_text\" is not a whole number from 0 to 1048576"},
+        {R"({"name": "a", "max_text": 1.5})", "\"max_text\" is not a whole number from 0 to 1048576"},
+        {R"(["a", 1])", "the request is not a JSON object of at most 4096 bytes"},
+        {R"({"name": "a", "max_text": 1, "pad": ")" + std::string(4096, 'p') + "\"}", "the request is not a JSON object of at most 4096 bytes"},
+    };
+    for (const auto& [json, problem] : cases) {
+        extractor::Request request;
+        std::string found;
+        EXPECT_EQ(extractor::DecodeRequest(json, request, found), problem.empty()) << json.substr(0, 60);
+        EXPECT_EQ(found, problem) << json.substr(0, 60);
+    }
+}
+
+// In the sandbox a process may read what it was handed and make threads, but opening a file
+// fails, and starting a program, a process or a socket ends it.
+TEST(ExtractorSandboxTest, OnlyWhatWasHandedOverCanBeReached) {
+    const std::vector<std::pair<std::string, std::function<int()>>> cases = {
+        {"thread", [] { std::thread([] {}).join(); return 0; }},
+        {"open", [] { return open("/etc/hostname", O_RDONLY) < 0 && errno == EACCES ? 0 : 1; }},
+        {"socket", [] { return socket(AF_UNIX, SOCK_STREAM, 0) >= 0 ? 0 : 1; }},
+        {"fork", [] { return fork() >= 0 ? 0 : 1; }},
+        {"exec", [] { execl("/bin/true", "true", nullptr); return 1; }},
+    };
+    for (const auto& [name, attempt] : cases) {
+        const pid_t child = fork();
+        ASSERT_GE(child, 0);
+        if (child == 0) _exit(extractor::EnterSandbox({}) ? attempt() : 2);
+        int status = 0;
+        ASSERT_EQ(waitpid(child, &status, 0), child);
+        const bool allowed = name == "thread" || name == "open";
+        EXPECT_EQ(WIFEXITED(status) && WEXITSTATUS(status) == 0, allowed) << name << " status " << status;
+        EXPECT_EQ(WIFSIGNALED(status) && WTERMSIG(status) == SIGSYS, !allowed) << name << " status " << status;
+    }
+}
+
+// A worker that stops answering costs its file a name-only entry and is replaced; so does one
+// that died: the next file is read by a new worker.
+TEST_F(ExtractorTest, AWorkerThatHangsOrDiesIsReplaced) {
+    ASSERT_EQ(Extract("first", "first words\n").text, "first words\n");
+    ExtractorClient quick({FILEINDEX_EXTRACTOR, {}, std::chrono::milliseconds(200)});
+    const std::string path = Path("/first");
+    const tools::Fd fd(open(path.c_str(), O_RDONLY | O_CLOEXEC));
+    ASSERT_EQ(quick.Extract(fd.Get(), "first", 100).problem, "");
+    const pid_t hung = quick.Worker();
+    ASSERT_EQ(kill(hung, SIGSTOP), 0);
+    EXPECT_EQ(quick.Extract(fd.Get(), "first", 100).problem, "the extractor took longer than 200 ms");
+    EXPECT_EQ(quick.Worker(), 0);
+    EXPECT_NE(kill(hung, 0), 0);  // killed and reaped
+    EXPECT_EQ(quick.Extract(fd.Get(), "first", 100).text, "first words\n");
+    const std::vector<std::pair<int, std::string>> deaths = {
+        {SIGKILL, "the extractor was stopped by signal 9"},
+        {SIGSYS, "the extractor tried a system call its sandbox forbids"},
+        {SIGXCPU, "the extractor ran past its CPU time limit"},
+    };
+    for (const auto& [signal, problem] : deaths) {
+        const pid_t worker = client_.Worker();
+        ASSERT_GT(worker, 0);
+        ASSERT_EQ(kill(worker, signal), 0);
+        EXPECT_EQ(Extract("again", "more words\n").problem, problem);
+        EXPECT_EQ(Extract("again", "more words\n").text, "more words\n");
+        EXPECT_NE(client_.Worker(), worker);
+    }
+    ExtractorClient missing({Path("/no-such-program"), {}, std::chrono::seconds(1)});
+    EXPECT_EQ(missing.Extract(fd.Get(), "first", 100).problem, "the extractor cannot be started");
+}
+
+}  // namespace

@@ -1,0 +1,44 @@
+// What a file holds, read from a descriptor only: its kind by content (libmagic), and the text of
+// plain text in any common encoding (as UTF-8) and of HTML (tags, scripts and styles left out,
+// the title as a field). Other kinds are typed, and their text and fields left for later readers.
+#pragma once
+
+#include <iconv.h>
+
+#include <map>
+#include <string>
+
+#include <magic.h>
+
+#include "protocol.h"
+
+namespace extractor {
+
+class ContentReader {
+public:
+    ContentReader() = default;
+    ContentReader(const ContentReader&) = delete;
+    ContentReader& operator=(const ContentReader&) = delete;
+    ~ContentReader();
+
+    // Loads what reading needs from files (libmagic's database, the encoding converters): before
+    // the sandbox forbids opening them. False when libmagic cannot be loaded.
+    bool Load();
+
+    // Reads the regular file open as `fd` from its start; `problem` says why nothing was read.
+    Reply Read(int fd, const Request& request);
+
+private:
+    std::string ToUtf8(const std::string& bytes, const std::string& charset);
+
+    magic_t magic_ = nullptr;
+    std::map<std::string, iconv_t> converters_;  // libmagic's charset name -> to UTF-8
+};
+
+// The kind a MIME type is indexed as: "document", "audio", "video", "photo" or "".
+std::string KindOf(const std::string& mime);
+
+// The text of an HTML page and its title (empty when it has none).
+std::string HtmlText(const std::string& html, std::string& title);
+
+}  // namespace extractor
