@@ -54,7 +54,7 @@ done
 
 echo "install-check: exported symbols, manual pages, completion"
 scripts/check-exports.sh "$prefix"/lib*/libfileindex.so.1
-for page in fileindexctl fileindex-web qira-sim fileindexd-ref qiranotifyd-sim; do
+for page in fileindexctl fileindex-web qira-sim fileindexd-ref qiranotifyd-sim fileindex-extractor; do
   warnings=$(groff -man -z -ww "$prefix/share/man/man1/$page.1" 2>&1)
   [ -z "$warnings" ] || { echo "install-check: the manual page of $page has faults: $warnings"; exit 1; }
   for section in NAME SYNOPSIS DESCRIPTION "EXIT STATUS" ENVIRONMENT; do

@@ -73,7 +73,7 @@ protected:
         tools::IndexProblem problem;
         std::string error;
         const auto index = tools::SearchIndex::Open(ShareDir(share), false, problem, error);
-        std::map<std::string, std::pair<long long, long long>> stored;
+        std::map<std::string, tools::StoredFile> stored;
         std::vector<tools::SearchHit> hits;
         if (!index || !(query.empty() ? index->Under("/" + share, stored) : index->Search(query, "", 100, hits, error))) {
             return {"(failed: " + error + ")"};

@@ -6,6 +6,7 @@
 #include <httplib.h>
 
 #include "daemon_progress.h"
+#include "media_fixtures.h"
 
 #include <algorithm>
 
@@ -234,6 +235,22 @@ TEST_F(LiveApplianceTest, AnOverflowLeadsToReindexRecordsAndACompleteIndexAgain)
     ASSERT_TRUE(testkit::WaitFor([&] { return Logged(notifierLog_, "queued a reindex of " + music_ + "/a"); }));
     EXPECT_TRUE(Logged(notifierLog_, "raise fs.inotify.max_queued_events"));
     EXPECT_TRUE(Finds("overflowed", expected));
+}
+
+// A song is found by its artist, a PDF by a sentence inside, a photo by its camera, whatever their
+// names; a damaged file is found by its name, with the reason in the log, and the rest goes on.
+TEST_F(LiveApplianceTest, WhatFilesHoldIsFoundAndADamagedFileCostsOnlyItsContent) {
+    testkit::WriteMp3(music_ + "/a/track01", "So What", "Miles Davis", "Kind of Blue", 1959);
+    testkit::WriteFile(music_ + "/a/report.txt", testkit::MakePdf("Quarterly", "Ann", "Revenue grew in the third quarter"));
+    testkit::WriteJpeg(music_ + "/a/IMG_0001", "2019:06:14 10:20:30", "FUJIFILM", "X-T3");
+    testkit::WriteFile(music_ + "/a/broken.pdf", testkit::MakePdf("T", "A", "never read").substr(0, 40));
+    Index("/music/a", R"("document": true, "audio": true, "photo": true)");
+    EXPECT_TRUE(Finds("davis kind", Paths{"/music/a/track01"}));
+    EXPECT_TRUE(Finds("revenue third quarter", Paths{"/music/a/report.txt"}));
+    EXPECT_TRUE(Finds("fujifilm", Paths{"/music/a/IMG_0001"}));
+    EXPECT_TRUE(Finds("broken", Paths{"/music/a/broken.pdf"}));
+    EXPECT_TRUE(Logged(daemonLog_, "share music: /music/a/broken.pdf: indexed by name only: the PDF cannot be read\n"));
+    EXPECT_EQ(Search({"davis", "--type", "audio"}), Paths{"/music/a/track01"});
 }
 
 // Words are prefixes, accents and case do not matter, a name ranks above a text, and a search

@@ -27,7 +27,8 @@ const char kPragmas[] = "PRAGMA journal_mode=WAL; PRAGMA synchronous=NORMAL;";
 const char kInMemoryTemp[] = "PRAGMA temp_store=MEMORY;";
 const char kSchema[] =
     "CREATE TABLE IF NOT EXISTS files(id INTEGER PRIMARY KEY, path TEXT NOT NULL UNIQUE, type TEXT NOT NULL,"
-    " size INTEGER NOT NULL, mtime INTEGER NOT NULL, problem TEXT NOT NULL DEFAULT '');"
+    " size INTEGER NOT NULL, mtime INTEGER NOT NULL, problem TEXT NOT NULL DEFAULT '',"
+    " fields TEXT NOT NULL DEFAULT '{}');"
     "CREATE VIRTUAL TABLE IF NOT EXISTS search USING fts5(name, path, body,"
     " tokenize = 'unicode61 remove_diacritics 2', prefix = '2 3');";
 
@@ -382,11 +383,11 @@ void SearchIndex::Rollback() {
 
 bool SearchIndex::Put(const IndexedFile& file) {
     Statement upsert(db_,
-                     "INSERT INTO files(path, type, size, mtime, problem) VALUES(?1, ?2, ?3, ?4, ?5) ON CONFLICT(path) DO"
-                     " UPDATE SET type = excluded.type, size = excluded.size, mtime = excluded.mtime,"
-                     " problem = excluded.problem RETURNING id");
-    if (!upsert.Ok() ||
-        !upsert.Bind(1, file.path).Bind(2, file.type).Bind(3, file.size).Bind(4, file.mtime).Bind(5, file.problem).Step()) {
+                     "INSERT INTO files(path, type, size, mtime, problem, fields) VALUES(?1, ?2, ?3, ?4, ?5, ?6) ON CONFLICT(path)"
+                     " DO UPDATE SET type = excluded.type, size = excluded.size, mtime = excluded.mtime,"
+                     " problem = excluded.problem, fields = excluded.fields RETURNING id");
+    if (!upsert.Ok() || !upsert.Bind(1, file.path).Bind(2, file.type).Bind(3, file.size).Bind(4, file.mtime)
+                             .Bind(5, file.problem).Bind(6, file.fields).Step()) {
         return Check(SQLITE_ERROR);
     }
     const long long id = upsert.Number(0);
@@ -426,12 +427,12 @@ bool SearchIndex::Rename(const std::string& from, const std::string& to) {
     return true;
 }
 
-bool SearchIndex::Under(const std::string& path, std::map<std::string, std::pair<long long, long long>>& stored) {
+bool SearchIndex::Under(const std::string& path, std::map<std::string, StoredFile>& stored) {
     stored.clear();
-    Statement rows(db_, std::string("SELECT path, size, mtime FROM files WHERE ") + kUnder);
+    Statement rows(db_, std::string("SELECT path, size, mtime, type FROM files WHERE ") + kUnder);
     if (!rows.Ok()) return Check(SQLITE_ERROR);
     rows.Bind(1, path);
-    while (rows.Step()) stored[rows.Text(0)] = {rows.Number(1), rows.Number(2)};
+    while (rows.Step()) stored[rows.Text(0)] = {rows.Number(1), rows.Number(2), rows.Text(3)};
     return rows.Done() || Check(SQLITE_ERROR);
 }
 

@@ -32,6 +32,14 @@ struct IndexedFile {
     long long mtime = 0;
     std::string text;  // the text of a plain-text document, valid UTF-8; empty otherwise
     std::string problem;  // why its content could not be read (indexed by name only); "" when none
+    std::string fields = "{}";  // what was read besides the text, a JSON object
+};
+
+// What the index holds of a file, to tell whether it changed.
+struct StoredFile {
+    long long size = 0;
+    long long mtime = 0;
+    std::string type;
 };
 
 struct SearchHit {
@@ -90,8 +98,8 @@ public:
     bool Remove(const std::string& path);
     // Moves `from` and everything beneath it to `to`.
     bool Rename(const std::string& from, const std::string& to);
-    // Every stored path at or beneath `path`, with its size and modification time; false on failure.
-    bool Under(const std::string& path, std::map<std::string, std::pair<long long, long long>>& stored);
+    // Every stored path at or beneath `path`, with its size, modification time and type; false on failure.
+    bool Under(const std::string& path, std::map<std::string, StoredFile>& stored);
     long long Count();
     // Stored paths at or beneath `path`; -1 on failure.
     long long CountUnder(const std::string& path);

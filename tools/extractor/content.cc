@@ -8,15 +8,21 @@
 #include <cstring>
 #include <memory>
 
-#include <libxml/HTMLparser.h>
+#include <libxml/parser.h>
 
+#include <exiv2/exiv2.hpp>
+
+#include "readers.h"
 #include "text_safety.h"
+#include "xml_text.h"
 
 namespace extractor {
 namespace {
 
 // Bytes read at most: text wants a little more than it keeps (encodings, markup).
 constexpr size_t kMaxRead = 8 << 20;
+// A PDF or a photo is read whole, up to this size.
+constexpr size_t kMaxWhole = 128 << 20;
 
 const std::pair<const char*, const char*> kCharsets[] = {
     {"iso-8859-1", "WINDOWS-1252"}, {"unknown-8bit", "WINDOWS-1252"}, {"utf-16le", "UTF-16LE"}, {"utf-16be", "UTF-16BE"}};
@@ -35,57 +41,6 @@ std::string ReadUpTo(int fd, size_t limit) {
     return bytes;
 }
 
-// At most `limit` bytes of valid UTF-8, cut at a character's start.
-std::string Cut(std::string text, size_t limit) {
-    if (text.size() <= limit) return text;
-    size_t end = limit;
-    while (end > 0 && (static_cast<unsigned char>(text[end]) & 0xC0) == 0x80) --end;
-    text.resize(end);
-    return text;
-}
-
-bool Skipped(const xmlNode* node) {
-    return node->type == XML_ELEMENT_NODE && node->name != nullptr &&
-           (xmlStrcasecmp(node->name, BAD_CAST "script") == 0 || xmlStrcasecmp(node->name, BAD_CAST "style") == 0 ||
-            xmlStrcasecmp(node->name, BAD_CAST "head") == 0);
-}
-
-// Text of the tree below `root`, walked without recursion so that deep markup cannot exhaust the stack.
-void CollectText(const xmlNode* root, std::string& text) {
-    const xmlNode* node = root;
-    while (node != nullptr) {
-        if (node->type == XML_TEXT_NODE && node->content != nullptr) {
-            if (!text.empty() && text.back() != ' ') text += ' ';
-            text += reinterpret_cast<const char*>(node->content);
-        }
-        if (node->children != nullptr && !Skipped(node)) {
-            node = node->children;
-            continue;
-        }
-        while (node != nullptr && node != root && node->next == nullptr) node = node->parent;
-        if (node == nullptr || node == root) break;
-        node = node->next;
-    }
-}
-
-const xmlNode* Find(const xmlNode* root, const char* name) {
-    for (const xmlNode* node = root; node != nullptr; node = node->next) {
-        if (node->type == XML_ELEMENT_NODE && xmlStrcasecmp(node->name, BAD_CAST name) == 0) return node;
-    }
-    return nullptr;
-}
-
-std::string Squeezed(const std::string& text) {
-    std::string out;
-    for (const char c : text) {
-        const bool space = c == ' ' || c == '\n' || c == '\r' || c == '\t' || c == '\f' || c == '\v';
-        if (!space) out += c;
-        else if (!out.empty() && out.back() != ' ') out += ' ';
-    }
-    if (!out.empty() && out.back() == ' ') out.pop_back();
-    return out;
-}
-
 }  // namespace
 
 ContentReader::~ContentReader() {
@@ -101,6 +56,8 @@ bool ContentReader::Load() {
         if (converter != reinterpret_cast<iconv_t>(-1)) converters_[name] = converter;
     }
     xmlInitParser();
+    Exiv2::LogMsg::setLevel(Exiv2::LogMsg::mute);
+    Exiv2::enableBMFF(true);  // HEIC and AVIF photos
     return true;
 }
 
@@ -133,6 +90,10 @@ Reply ContentReader::Read(int fd, const Request& request) {
     const std::string head = ReadUpTo(fd, std::min<size_t>(kMaxRead, std::max<size_t>(request.maxText * 4, 64 * 1024)));
     const char* mime = magic_buffer(magic_, head.data(), head.size());
     reply.mime = mime != nullptr ? mime : "application/octet-stream";
+    if (reply.mime == "application/zip") {
+        const std::string document = OfficeDocumentMime(fd);
+        if (!document.empty()) reply.mime = document;
+    }
     reply.type = KindOf(reply.mime);
     if (reply.mime == "text/html") {
         std::string title;
@@ -145,8 +106,29 @@ Reply ContentReader::Read(int fd, const Request& request) {
         std::string text = tools::ValidUtf8(ToUtf8(head, charset != nullptr ? charset : ""), " ");
         if (StartsWith(text, "\xEF\xBB\xBF")) text.erase(0, 3);  // a byte order mark is no text
         reply.text = Cut(std::move(text), request.maxText);
+    } else if (reply.mime == "application/pdf" || reply.type == "photo") {
+        if (static_cast<size_t>(st.st_size) > kMaxWhole) {
+            reply.problem = "larger than 128 MiB";
+        } else if (reply.type == "photo") {
+            ReadPhoto(ReadUpTo(fd, kMaxWhole), reply);
+        } else {
+            ReadPdf(ReadUpTo(fd, kMaxWhole), request.maxText, reply);
+        }
+    } else if (StartsWith(reply.mime, "application/vnd.openxmlformats-officedocument.") ||
+               StartsWith(reply.mime, "application/vnd.oasis.opendocument.") || reply.mime == "application/epub+zip") {
+        ReadOfficeDocument(fd, request.maxText, reply);
+    } else if (reply.type == "audio") {
+        ReadAudio(fd, reply);
     }
     return reply;
+}
+
+std::string Cut(std::string text, size_t limit) {
+    if (text.size() <= limit) return text;
+    size_t end = limit;
+    while (end > 0 && (static_cast<unsigned char>(text[end]) & 0xC0) == 0x80) --end;
+    text.resize(end);
+    return text;
 }
 
 std::string KindOf(const std::string& mime) {
@@ -159,24 +141,6 @@ std::string KindOf(const std::string& mime) {
         if (StartsWith(mime, prefix)) return kind;
     }
     return "";
-}
-
-std::string HtmlText(const std::string& html, std::string& title) {
-    const int options = HTML_PARSE_RECOVER | HTML_PARSE_NOERROR | HTML_PARSE_NOWARNING | HTML_PARSE_NONET | HTML_PARSE_COMPACT;
-    const std::unique_ptr<xmlDoc, decltype(&xmlFreeDoc)> doc(
-        htmlReadMemory(html.data(), static_cast<int>(html.size()), nullptr, nullptr, options), xmlFreeDoc);
-    if (!doc) return "";
-    const xmlNode* root = xmlDocGetRootElement(doc.get());
-    if (root == nullptr) return "";
-    const xmlNode* head = Find(root->children, "head");
-    if (const xmlNode* titleNode = head != nullptr ? Find(head->children, "title") : nullptr) {
-        std::string text;
-        CollectText(titleNode, text);
-        title = Squeezed(text);
-    }
-    std::string text;
-    CollectText(root, text);
-    return Squeezed(text);
 }
 
 }  // namespace extractor

@@ -1,6 +1,7 @@
-// What a file holds, read from a descriptor only: its kind by content (libmagic), and the text of
-// plain text in any common encoding (as UTF-8) and of HTML (tags, scripts and styles left out,
-// the title as a field). Other kinds are typed, and their text and fields left for later readers.
+// What a file holds, read from a descriptor only: its kind by content (libmagic); the text of plain
+// text in any common encoding (as UTF-8), of HTML (tags, scripts and styles left out, the title as
+// a field), of PDF, OOXML, ODF and EPUB documents with their title and author; the tags of songs
+// and the metadata of photos (readers.h). Video is typed only.
 #pragma once
 
 #include <iconv.h>
@@ -37,8 +38,5 @@ private:
 
 // The kind a MIME type is indexed as: "document", "audio", "video", "photo" or "".
 std::string KindOf(const std::string& mime);
-
-// The text of an HTML page and its title (empty when it has none).
-std::string HtmlText(const std::string& html, std::string& title);
 
 }  // namespace extractor

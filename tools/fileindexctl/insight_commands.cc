@@ -273,7 +273,7 @@ void AddInsightCommands(CLI::App& app, Context& ctx) {
     auto watch = std::make_shared<bool>(false);
     auto interval = std::make_shared<double>(1.0);
     auto samples = std::make_shared<int>(0);
-    auto* progress = app.add_subcommand("progress", "Pending records per share and folder, drain rate and time left");
+    auto* progress = app.add_subcommand("progress", "Files left per share and folder, drain rate and time left");
     progress->add_flag("--watch", *watch, "Refresh until interrupted (a JSON line per sample when not on a terminal)");
     progress->add_option("--interval", *interval, "Seconds between samples")->check(CLI::Range(0.05, 3600.0));
     progress->add_option("--samples", *samples, "With --watch: stop after this many samples (0 = never)")

@@ -12,6 +12,7 @@
 #include "file_types.h"
 #include "fileindex/entry_rules.h"
 #include "fileindex/fileidx.h"
+#include "fileindex/json.h"
 #include "fileindex/status_mgr.h"
 #include "fileindex/utils.h"
 #include "text_safety.h"
@@ -25,6 +26,9 @@ constexpr unsigned kCreated = 1;
 constexpr unsigned kWritten = 2;
 constexpr unsigned kMoved = 256;
 constexpr unsigned kReindex = 0x10000;
+// The fields whose words a search finds as it finds the text's.
+const char* const kSearchedFields[] = {"title", "author", "artist", "album", "album_artist", "genre",
+                                       "camera_make", "camera_model", "lens"};
 // How long one batch may take in the index before it is given up.
 constexpr std::chrono::seconds kBatchBudget{30};
 constexpr int kDirFlags = O_RDONLY | O_DIRECTORY;
@@ -229,6 +233,7 @@ extractor::Reply ShareIndexer::Extract(int dirFd, const std::string& name, const
     const tools::Fd fd(openat(dirFd, name.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
     struct stat st;
     extractor::Reply reply;
+    reply.fields = Json::Value(Json::objectValue);
     if (!fd.Valid() || fstat(fd.Get(), &st) != 0 || !S_ISREG(st.st_mode)) {
         reply.problem = "not a regular file reached without a link";
     } else {
@@ -240,31 +245,28 @@ extractor::Reply ShareIndexer::Extract(int dirFd, const std::string& name, const
     return reply;
 }
 
-// A file whose name tells its kind is indexed as that kind, its text read when it is a document;
-// one whose name does not is typed by what it holds. Unchanged files are not read again, so that
-// a file that failed is not retried until it changes.
+// A file is indexed as the kind its content tells (its name's when the content tells none), with
+// its text and fields; the words of its text fields are searched with its text. Unchanged files
+// in the index are not read again, so that a file that failed is not retried until it changes.
 void ShareIndexer::IndexFile(int dirFd, const std::string& name, const std::string& fullPath, const struct stat& st,
                              const Json::Value& governing, bool force, const Stored& stored, std::set<std::string>& seen) {
-    const auto on = [&governing](const std::string& type) { return !type.empty() && governing.get(type, false).asBool(); };
-    std::string type = tools::FileTypeOf(name);
-    if (!type.empty() && !on(type)) return;  // unseen: removed when stored
     const std::string sharePath = SharePathOf(fullPath);
     const auto found = stored.find(sharePath);
-    const std::pair<long long, long long> stamp(st.st_size, st.st_mtime);
-    if (!force && found != stored.end() && found->second == stamp) {
-        seen.insert(sharePath);
+    if (!force && found != stored.end() && found->second.size == st.st_size && found->second.mtime == st.st_mtime) {
+        if (governing.get(found->second.type, false).asBool()) seen.insert(sharePath);  // else unseen: removed
         return;
     }
-    tools::IndexedFile file{sharePath, type, st.st_size, st.st_mtime, "", ""};
-    if (type.empty() || type == "document") {
-        extractor::Reply reply = Extract(dirFd, name, sharePath);
-        if (type.empty()) file.type = reply.type;
-        file.text = std::move(reply.text);
-        file.problem = std::move(reply.problem);
-    }
-    if (!on(file.type)) return;
+    extractor::Reply reply = Extract(dirFd, name, sharePath);
+    const std::string type = reply.type.empty() ? tools::FileTypeOf(name) : reply.type;
+    if (type.empty() || !governing.get(type, false).asBool()) return;  // unseen: removed when stored
     seen.insert(sharePath);
-    index_->Put(file);
+    std::string text = std::move(reply.text);
+    const Json::Value& fields = reply.fields;
+    for (const char* field : kSearchedFields) {
+        if (fields[field].isString()) text += "\n" + fields[field].asString();
+    }
+    index_->Put({sharePath, type, st.st_size, st.st_mtime, std::move(text), std::move(reply.problem),
+                 QIRA::FILEINDEX::toString(reply.fields)});
 }
 
 }  // namespace fileindexd_ref

@@ -30,7 +30,7 @@ namespace fileindexd_ref {
 // Text of documents is indexed up to this many bytes.
 constexpr size_t kTextCap = 256 * 1024;
 
-using Stored = std::map<std::string, std::pair<long long, long long>>;  // share path -> size, mtime
+using Stored = std::map<std::string, tools::StoredFile>;  // by share path
 
 class ShareIndexer {
 public:

@@ -1,0 +1,127 @@
+#include "media_fixtures.h"
+
+#include <archive.h>
+#include <archive_entry.h>
+
+#include <stdexcept>
+#include <utility>
+#include <vector>
+
+#include <exiv2/exiv2.hpp>
+#include <taglib/mpegfile.h>
+#include <taglib/tag.h>
+
+#include "sandbox.h"
+
+namespace testkit {
+namespace {
+
+std::string Zip(const std::vector<std::pair<std::string, std::string>>& parts) {
+    archive* zip = archive_write_new();
+    archive_write_set_format_zip(zip);
+    archive_write_set_options(zip, "zip:compression=store");  // an ODF's "mimetype" must be stored
+    std::vector<char> buffer(1 << 20);
+    size_t used = 0;
+    if (archive_write_open_memory(zip, buffer.data(), buffer.size(), &used) != ARCHIVE_OK) throw std::runtime_error("zip");
+    for (const auto& [name, content] : parts) {
+        archive_entry* entry = archive_entry_new();
+        archive_entry_set_pathname(entry, name.c_str());
+        archive_entry_set_size(entry, static_cast<la_int64_t>(content.size()));
+        archive_entry_set_filetype(entry, AE_IFREG);
+        archive_entry_set_perm(entry, 0644);
+        archive_write_header(zip, entry);
+        archive_write_data(zip, content.data(), content.size());
+        archive_entry_free(entry);
+    }
+    archive_write_close(zip);
+    archive_write_free(zip);
+    return std::string(buffer.data(), used);
+}
+
+}  // namespace
+
+std::string MakePdf(const std::string& title, const std::string& author, const std::string& sentence) {
+    const std::string stream = "BT /F1 12 Tf 20 50 Td (" + sentence + ") Tj ET";
+    const std::vector<std::string> objects = {
+        "<< /Type /Catalog /Pages 2 0 R >>",
+        "<< /Type /Pages /Kids [3 0 R] /Count 1 >>",
+        "<< /Type /Page /Parent 2 0 R /MediaBox [0 0 600 100] /Contents 4 0 R /Resources << /Font << /F1 5 0 R >> >> >>",
+        "<< /Length " + std::to_string(stream.size()) + " >>\nstream\n" + stream + "\nendstream",
+        "<< /Type /Font /Subtype /Type1 /BaseFont /Helvetica >>",
+        "<< /Title (" + title + ") /Author (" + author + ") >>",
+    };
+    std::string pdf = "%PDF-1.4\n";
+    std::vector<size_t> offsets;
+    for (size_t i = 0; i < objects.size(); ++i) {
+        offsets.push_back(pdf.size());
+        pdf += std::to_string(i + 1) + " 0 obj\n" + objects[i] + "\nendobj\n";
+    }
+    const size_t xref = pdf.size();
+    pdf += "xref\n0 " + std::to_string(objects.size() + 1) + "\n0000000000 65535 f \n";
+    for (const size_t offset : offsets) {
+        char line[24];
+        snprintf(line, sizeof line, "%010zu 00000 n \n", offset);
+        pdf += line;
+    }
+    pdf += "trailer\n<< /Size " + std::to_string(objects.size() + 1) + " /Root 1 0 R /Info 6 0 R >>\nstartxref\n" +
+           std::to_string(xref) + "\n%%EOF\n";
+    return pdf;
+}
+
+std::string MakeOfficeDocument(bool odt, const std::string& title, const std::string& author, const std::string& text) {
+    const std::string dc = R"(xmlns:dc="http://purl.org/dc/elements/1.1/")";
+    if (odt) {
+        return Zip({{"mimetype", "application/vnd.oasis.opendocument.text"},
+                    {"content.xml", R"(<office:document-content xmlns:office="urn:oasis:names:tc:opendocument:xmlns:office:1.0" )"
+                                    R"(xmlns:text="urn:oasis:names:tc:opendocument:xmlns:text:1.0"><office:body><office:text>)"
+                                    "<text:p>" + text + "</text:p></office:text></office:body></office:document-content>"},
+                    {"meta.xml", "<office:document-meta xmlns:office=\"urn:oasis:names:tc:opendocument:xmlns:office:1.0\" " + dc +
+                                     "><office:meta><dc:title>" + title + "</dc:title><dc:creator>" + author +
+                                     "</dc:creator></office:meta></office:document-meta>"}});
+    }
+    const std::string w = R"(xmlns:w="http://schemas.openxmlformats.org/wordprocessingml/2006/main")";
+    return Zip({{"[Content_Types].xml", R"(<Types xmlns="http://schemas.openxmlformats.org/package/2006/content-types">)"
+                                        R"(<Override PartName="/word/document.xml" ContentType="application/)"
+                                        R"(vnd.openxmlformats-officedocument.wordprocessingml.document.main+xml"/></Types>)"},
+                {"_rels/.rels", R"(<Relationships xmlns="http://schemas.openxmlformats.org/package/2006/relationships"/>)"},
+                {"word/document.xml", "<w:document " + w + "><w:body><w:p><w:r><w:t>" + text + "</w:t></w:r></w:p></w:body></w:document>"},
+                {"docProps/core.xml", "<cp:coreProperties xmlns:cp=\"http://schemas.openxmlformats.org/package/2006/metadata/core-properties\" " +
+                                          dc + "><dc:title>" + title + "</dc:title><dc:creator>" + author + "</dc:creator></cp:coreProperties>"}});
+}
+
+void WriteMp3(const std::string& path, const std::string& title, const std::string& artist, const std::string& album,
+              unsigned year) {
+    std::string frames;
+    for (int i = 0; i < 40; ++i) frames += std::string("\xFF\xFB\x90\x64", 4) + std::string(413, '\0');  // 128 kbit/s, 44.1 kHz
+    WriteFile(path, frames);
+    TagLib::MPEG::File file(path.c_str());
+    file.tag()->setTitle(TagLib::String(title, TagLib::String::UTF8));
+    file.tag()->setArtist(TagLib::String(artist, TagLib::String::UTF8));
+    file.tag()->setAlbum(TagLib::String(album, TagLib::String::UTF8));
+    file.tag()->setYear(year);
+    if (!file.save(TagLib::MPEG::File::ID3v2)) throw std::runtime_error("mp3");
+}
+
+void WriteJpeg(const std::string& path, const std::string& taken, const std::string& make, const std::string& model) {
+    const unsigned char jpeg[] = {
+        0xFF, 0xD8,                                                                            // start
+        0xFF, 0xE0, 0x00, 0x10, 'J', 'F', 'I', 'F', 0x00, 0x01, 0x01, 0x00, 0x00, 0x01, 0x00, 0x01, 0x00, 0x00,
+        0xFF, 0xDB, 0x00, 0x43, 0x00, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1,
+        1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1,
+        1, 1, 1, 1, 1,                                                                         // quantisation table
+        0xFF, 0xC0, 0x00, 0x0B, 0x08, 0x00, 0x01, 0x00, 0x01, 0x01, 0x01, 0x11, 0x00,         // 1 x 1, one component
+        0xFF, 0xC4, 0x00, 0x14, 0x00, 0x01, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0x00,  // DC table
+        0xFF, 0xC4, 0x00, 0x14, 0x10, 0x01, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0x00,  // AC table
+        0xFF, 0xDA, 0x00, 0x08, 0x01, 0x01, 0x00, 0x00, 0x3F, 0x00, 0x00,                     // scan
+        0xFF, 0xD9};                                                                           // end
+    WriteFile(path, std::string(reinterpret_cast<const char*>(jpeg), sizeof jpeg));
+    const auto image = Exiv2::ImageFactory::open(path);
+    Exiv2::ExifData exif;
+    exif["Exif.Photo.DateTimeOriginal"] = taken;
+    exif["Exif.Image.Make"] = make;
+    exif["Exif.Image.Model"] = model;
+    image->setExifData(exif);
+    image->writeMetadata();
+}
+
+}  // namespace testkit

@@ -1,0 +1,24 @@
+// Small files of each kind the extractor reads, made here with the same libraries or by hand, so
+// that every test knows exactly what they hold.
+#pragma once
+
+#include <string>
+
+namespace testkit {
+
+// A one-page PDF whose information holds `title` and `author` and whose page shows `sentence`
+// (printable ASCII, no parentheses or backslashes).
+std::string MakePdf(const std::string& title, const std::string& author, const std::string& sentence);
+
+// A docx or an odt (`odt`) whose body is `text` and whose properties hold `title` and `author`.
+std::string MakeOfficeDocument(bool odt, const std::string& title, const std::string& author, const std::string& text);
+
+// Writes an MPEG audio file of a second or so with these ID3v2 tags to `path`.
+void WriteMp3(const std::string& path, const std::string& title, const std::string& artist, const std::string& album,
+              unsigned year);
+
+// Writes a 1 x 1 JPEG to `path` whose EXIF says when it was taken ("YYYY:MM:DD HH:MM:SS"), and the
+// camera's make and model.
+void WriteJpeg(const std::string& path, const std::string& taken, const std::string& make, const std::string& model);
+
+}  // namespace testkit
