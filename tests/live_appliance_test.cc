@@ -251,6 +251,15 @@ TEST_F(LiveApplianceTest, WhatFilesHoldIsFoundAndADamagedFileCostsOnlyItsContent
     EXPECT_TRUE(Finds("broken", Paths{"/music/a/broken.pdf"}));
     EXPECT_TRUE(Logged(daemonLog_, "share music: /music/a/broken.pdf: indexed by name only: the PDF cannot be read\n"));
     EXPECT_EQ(Search({"davis", "--type", "audio"}), Paths{"/music/a/track01"});
+    // Filters, the fields of each kind, and the counts per type and camera.
+    EXPECT_EQ(Search({"taken:2019-06", "camera:fuji"}), Paths{"/music/a/IMG_0001"});
+    EXPECT_EQ(Search({"artist:davis", "year:1959"}), Paths{"/music/a/track01"});
+    const std::string text = testkit::Run({FILEINDEXCTL, "search", "type:audio", "--facets"}).out;
+    EXPECT_NE(text.find("So What, Miles Davis, Kind of Blue, 1959, 0:01"), std::string::npos) << text;
+    EXPECT_NE(text.find("\ntype: audio 1\nyear: 1959 1\nartist: Miles Davis 1\n"), std::string::npos) << text;
+    const auto bad = testkit::Run({FILEINDEXCTL, "search", "year:19x9"});
+    EXPECT_EQ(bad.status, 2);
+    EXPECT_NE(bad.err.find("BAD_QUERY: \"year:19x9\": give a whole number"), std::string::npos) << bad.err;
 }
 
 // Words are prefixes, accents and case do not matter, a name ranks above a text, and a search

@@ -1,4 +1,5 @@
 #include "search_index.h"
+#include "search_query.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -15,8 +16,10 @@
 #include <set>
 #include <sstream>
 #include <tuple>
+#include <variant>
 
 #include "beneath.h"
+#include "fileindex/json.h"
 
 namespace tools {
 namespace {
@@ -28,7 +31,10 @@ const char kInMemoryTemp[] = "PRAGMA temp_store=MEMORY;";
 const char kSchema[] =
     "CREATE TABLE IF NOT EXISTS files(id INTEGER PRIMARY KEY, path TEXT NOT NULL UNIQUE, type TEXT NOT NULL,"
     " size INTEGER NOT NULL, mtime INTEGER NOT NULL, problem TEXT NOT NULL DEFAULT '',"
-    " fields TEXT NOT NULL DEFAULT '{}');"
+    " fields TEXT NOT NULL DEFAULT '{}', name TEXT NOT NULL DEFAULT '',"
+    // The fields again as typed columns, for filters, ranges, sorting and facets.
+    " title TEXT, author TEXT, artist TEXT, album TEXT, genre TEXT, year INTEGER, pages INTEGER, duration INTEGER,"
+    " taken TEXT, camera TEXT);"
     "CREATE VIRTUAL TABLE IF NOT EXISTS search USING fts5(name, path, body,"
     " tokenize = 'unicode61 remove_diacritics 2', prefix = '2 3');";
 
@@ -119,6 +125,13 @@ public:
     bool Ok() const { return statement_ != nullptr; }
     Statement& Bind(int index, const std::string& text) {
         sqlite3_bind_text(statement_, index, text.data(), static_cast<int>(text.size()), SQLITE_TRANSIENT);
+        return *this;
+    }
+    // Null, a whole number or a text, as the value is.
+    Statement& Bind(int index, const Json::Value& value) {
+        if (value.isIntegral()) return Bind(index, static_cast<long long>(value.asLargestInt()));
+        if (value.isString()) return Bind(index, value.asString());
+        sqlite3_bind_null(statement_, index);
         return *this;
     }
     Statement& Bind(int index, long long number) {
@@ -229,18 +242,34 @@ bool IndexFileStat(const std::string& shareDir, bool writing, struct stat& st, b
     return true;
 }
 
+Statement& BindQuery(Statement& statement, const SearchQuery& query, const std::string& type) {
+    statement.Bind(1, query.match).Bind(2, type);
+    int next = 4;
+    for (const auto& param : query.params) {
+        if (const auto* text = std::get_if<std::string>(&param)) statement.Bind(next++, *text);
+        else statement.Bind(next++, std::get<long long>(param));
+    }
+    return statement;
+}
+
+// " FROM ... WHERE ..." of a parsed query: ?1 the words, ?2 the type ("" for any), the
+// parameters of its filters from ?4 on.
+std::string From(const SearchQuery& query) {
+    std::string where;
+    int next = 4;
+    for (const char c : query.where) where += c == '?' ? "?" + std::to_string(next++) : std::string(1, c);
+    return std::string(query.match.empty() ? " FROM files f WHERE" : " FROM search JOIN files f ON f.id = search.rowid WHERE"
+                                                                     " search MATCH ?1 AND") +
+           " (?2 = '' OR f.type = ?2) AND (" + where + ")";
+}
+
 }  // namespace
 
 std::string QueryError(const std::string& query) {
-    if (query.size() > kMaxQueryBytes) {
-        return "the query is longer than " + std::to_string(kMaxQueryBytes) + " bytes";
-    }
-    std::istringstream in(query);
-    size_t words = 0;
-    for (std::string word; in >> word;) ++words;
-    if (words > kMaxQueryWords) return "the query has more than " + std::to_string(kMaxQueryWords) + " words";
-    if (MatchExpression(query).empty()) return "the query holds no word";
-    return "";
+    SearchQuery parsed;
+    std::string error;
+    ParseSearchQuery(query, parsed, error);
+    return error;
 }
 
 std::string MatchExpression(const std::string& words) {
@@ -381,15 +410,40 @@ void SearchIndex::Rollback() {
     if (sqlite3_get_autocommit(db_) == 0) sqlite3_exec(db_, "ROLLBACK", nullptr, nullptr, nullptr);
 }
 
+// "make model", either alone when the other is missing.
+std::string CameraOf(const Json::Value& fields) {
+    const auto text = [&fields](const char* name) { return fields[name].isString() ? fields[name].asString() : std::string(); };
+    const std::string make = text("camera_make");
+    const std::string model = text("camera_model");
+    return make.empty() || model.empty() ? make + model : make + " " + model;
+}
+
+// The columns a file's fields fill, each from the field of its name.
+const char* const kFieldColumns[] = {"title", "author", "artist", "album", "genre", "year", "pages", "duration", "taken"};
+
 bool SearchIndex::Put(const IndexedFile& file) {
-    Statement upsert(db_,
-                     "INSERT INTO files(path, type, size, mtime, problem, fields) VALUES(?1, ?2, ?3, ?4, ?5, ?6) ON CONFLICT(path)"
-                     " DO UPDATE SET type = excluded.type, size = excluded.size, mtime = excluded.mtime,"
-                     " problem = excluded.problem, fields = excluded.fields RETURNING id");
-    if (!upsert.Ok() || !upsert.Bind(1, file.path).Bind(2, file.type).Bind(3, file.size).Bind(4, file.mtime)
-                             .Bind(5, file.problem).Bind(6, file.fields).Step()) {
-        return Check(SQLITE_ERROR);
+    std::string columns, values, updates;
+    int next = 9;
+    for (const char* column : kFieldColumns) {
+        columns += std::string(", ") + column;
+        values += ", ?" + std::to_string(next++);
+        updates += std::string(", ") + column + " = excluded." + column;
     }
+    Statement upsert(db_, "INSERT INTO files(path, type, size, mtime, problem, fields, name, camera" + columns +
+                              ") VALUES(?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8" + values + ") ON CONFLICT(path) DO UPDATE SET"
+                              " type = excluded.type, size = excluded.size, mtime = excluded.mtime, problem = excluded.problem,"
+                              " fields = excluded.fields, name = excluded.name, camera = excluded.camera" + updates +
+                              " RETURNING id");
+    const Json::Value fields = file.fields.isObject() ? file.fields : Json::Value(Json::objectValue);
+    const std::string camera = CameraOf(fields);
+    if (upsert.Ok()) {
+        upsert.Bind(1, file.path).Bind(2, file.type).Bind(3, file.size).Bind(4, file.mtime).Bind(5, file.problem)
+            .Bind(6, QIRA::FILEINDEX::toString(fields)).Bind(7, NameOf(file.path))
+            .Bind(8, camera.empty() ? Json::Value() : Json::Value(camera));
+        next = 9;
+        for (const char* column : kFieldColumns) upsert.Bind(next++, fields[column]);
+    }
+    if (!upsert.Ok() || !upsert.Step()) return Check(SQLITE_ERROR);
     const long long id = upsert.Number(0);
     // Finished before the next statement: a RETURNING statement left open and finalized later,
     // after other writes, rolls the whole transaction back in defensive mode.
@@ -449,17 +503,20 @@ long long SearchIndex::CountUnder(const std::string& path) {
 }
 
 bool SearchIndex::Search(const std::string& query, const std::string& type, int limit, std::vector<SearchHit>& hits,
-                         std::string& error) {
-    error = QueryError(query);
-    if (!error.empty()) return false;
-    Statement rows(db_,
-                   "SELECT f.path, f.type, f.size, f.mtime, bm25(search, 10.0, 2.0, 1.0) AS rank,"
-                   " snippet(search, -1, char(2), char(3), '…', 12) FROM search JOIN files f ON f.id = search.rowid"
-                   " WHERE search MATCH ?1 AND (?2 = '' OR f.type = ?2) ORDER BY rank, f.path LIMIT ?3");
+                         std::string& error, const std::string& sort) {
+    SearchQuery parsed;
+    if (!ParseSearchQuery(query, parsed, error)) return false;
+    const bool words = !parsed.match.empty();
+    const std::string order = sort == "date" ? "f.mtime DESC, f.path" : sort == "name" ? "f.name, f.path" : words ? "rank, f.path" : "f.path";
+    Statement rows(db_, std::string("SELECT f.path, f.type, f.size, f.mtime, ") +
+                            (words ? "bm25(search, 10.0, 2.0, 1.0) AS rank, snippet(search, -1, char(2), char(3), '…', 12)"
+                                   : "0 AS rank, ''") +
+                            ", f.fields" + From(parsed) + " ORDER BY " + order + " LIMIT ?3");
     if (rows.Ok()) {
-        rows.Bind(1, MatchExpression(query)).Bind(2, type).Bind(3, static_cast<long long>(limit));
+        BindQuery(rows, parsed, type).Bind(3, static_cast<long long>(limit));
         while (rows.Step()) {
-            hits.push_back({rows.Text(0), rows.Text(1), rows.Number(2), rows.Number(3), rows.Real(4), SnippetPieces(rows.Text(5))});
+            hits.push_back({rows.Text(0), rows.Text(1), rows.Number(2), rows.Number(3), rows.Real(4), SnippetPieces(rows.Text(5)),
+                            rows.Text(6)});
         }
         if (rows.Done()) return true;
     }
@@ -468,17 +525,37 @@ bool SearchIndex::Search(const std::string& query, const std::string& type, int 
 }
 
 bool SearchIndex::CountHits(const std::string& query, const std::string& type, long long& count, std::string& error) {
-    error = QueryError(query);
-    if (!error.empty()) return false;
-    Statement counted(db_,
-                      "SELECT count(*) FROM search JOIN files f ON f.id = search.rowid"
-                      " WHERE search MATCH ?1 AND (?2 = '' OR f.type = ?2)");
-    if (counted.Ok() && counted.Bind(1, MatchExpression(query)).Bind(2, type).Step()) {
+    SearchQuery parsed;
+    if (!ParseSearchQuery(query, parsed, error)) return false;
+    Statement counted(db_, "SELECT count(*)" + From(parsed));
+    if (counted.Ok() && BindQuery(counted, parsed, type).Step()) {
         count = counted.Number(0);
         return true;
     }
     error = SearchError();
     return false;
+}
+
+bool SearchIndex::Facets(const std::string& query, const std::string& type, Json::Value& facets, std::string& error) {
+    SearchQuery parsed;
+    if (!ParseSearchQuery(query, parsed, error)) return false;
+    facets = Json::Value(Json::objectValue);
+    const std::pair<const char*, const char*> kinds[] = {
+        {"type", "f.type"}, {"year", "f.year"}, {"artist", "f.artist"}, {"camera", "nullif(f.camera, '')"}};
+    for (const auto& [name, column] : kinds) {
+        Statement rows(db_, std::string("SELECT ") + column + ", count(*) AS n" + From(parsed) + " AND " + column +
+                                " IS NOT NULL GROUP BY 1 ORDER BY n DESC, 1 LIMIT " + std::to_string(kMaxFacetValues));
+        if (rows.Ok()) {
+            BindQuery(rows, parsed, type);
+            facets[name] = Json::Value(Json::objectValue);
+            while (rows.Step()) facets[name][rows.Text(0)] = static_cast<Json::Int64>(rows.Number(1));
+        }
+        if (!rows.Ok() || !rows.Done()) {
+            error = SearchError();
+            return false;
+        }
+    }
+    return true;
 }
 
 std::string SearchIndex::SearchError() {

@@ -21,6 +21,8 @@
 #include <utility>
 #include <vector>
 
+#include <json/value.h>
+
 struct sqlite3;
 
 namespace tools {
@@ -32,7 +34,7 @@ struct IndexedFile {
     long long mtime = 0;
     std::string text;  // the text of a plain-text document, valid UTF-8; empty otherwise
     std::string problem;  // why its content could not be read (indexed by name only); "" when none
-    std::string fields = "{}";  // what was read besides the text, a JSON object
+    Json::Value fields = Json::Value(Json::objectValue);  // what was read besides the text
 };
 
 // What the index holds of a file, to tell whether it changed.
@@ -49,6 +51,7 @@ struct SearchHit {
     long long mtime = 0;
     double rank = 0;  // lower is better
     std::vector<std::pair<std::string, bool>> snippet;  // pieces of text, true for the matched ones
+    std::string fields;  // what was read of the file besides its text, a JSON object
 };
 
 // Why an index could not be opened or used.
@@ -63,6 +66,8 @@ enum class IndexProblem {
 // A query is refused beyond these bounds, with an error naming the bound.
 constexpr size_t kMaxQueryBytes = 1024;
 constexpr size_t kMaxQueryWords = 32;
+// Facets count at most this many values each, the commonest first.
+constexpr int kMaxFacetValues = 10;
 
 class SearchIndex {
 public:
@@ -104,12 +109,17 @@ public:
     // Stored paths at or beneath `path`; -1 on failure.
     long long CountUnder(const std::string& path);
 
-    // The best hits for `query` (words, each a prefix, all required), of one type when `type` is
-    // not empty; hits ranked alike in path order, so that pages follow each other. False, with `error` set, when the query fails QueryError or the statement fails.
+    // The first hits for `query` (search_query.h), of one type when `type` is not empty, in the
+    // order of `sort`: "relevance" (best first; path order without words), "date" (newest first)
+    // or "name"; hits alike in path order, so that pages follow each other. False, with `error`
+    // set, when the query fails QueryError or the statement fails.
     bool Search(const std::string& query, const std::string& type, int limit, std::vector<SearchHit>& hits,
-                std::string& error);
+                std::string& error, const std::string& sort = "relevance");
     // How many files Search would find without a limit; false as Search.
     bool CountHits(const std::string& query, const std::string& type, long long& count, std::string& error);
+    // Over every hit: {"type", "year", "artist", "camera"}, each {value: hits}, at most
+    // kMaxFacetValues values, the commonest first; false as Search.
+    bool Facets(const std::string& query, const std::string& type, Json::Value& facets, std::string& error);
 
 private:
     SearchIndex(sqlite3* db, std::string shareDir, dev_t dev, ino_t ino)
@@ -133,8 +143,7 @@ private:
 // is no word (punctuation alone is none).
 std::string MatchExpression(const std::string& words);
 
-// Why `query` cannot be searched ("" when it can): longer than kMaxQueryBytes, more than
-// kMaxQueryWords words, or no word at all.
+// Why `query` cannot be searched ("" when it can): ParseSearchQuery's error (search_query.h).
 std::string QueryError(const std::string& query);
 
 }  // namespace tools

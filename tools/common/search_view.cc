@@ -4,7 +4,9 @@
 #include <chrono>
 
 #include "fileindex/fileindex.h"
+#include "fileindex/json.h"
 #include "search_index.h"
+#include "search_query.h"
 #include "service_view.h"
 #include "share_index.h"
 #include "text_safety.h"
@@ -46,7 +48,42 @@ Json::Value HitJson(const std::string& share, const SearchHit& hit) {
     entry["mtime"] = static_cast<Json::Int64>(hit.mtime);
     entry["mtime_utc"] = FormatUtc(hit.mtime);
     entry["snippet"] = SnippetJson(hit.snippet);
+    Json::Value fields;
+    entry["fields"] = QIRA::FILEINDEX::fromString(fields, hit.fields) && fields.isObject() ? fields : Json::Value(Json::objectValue);
     return entry;
+}
+
+// The order of hits from several shares, as each share sorted its own.
+bool Before(const std::string& sort, const SearchHit& a, const SearchHit& b) {
+    if (sort == "date") return a.mtime != b.mtime ? a.mtime > b.mtime : a.path < b.path;
+    if (sort == "name") {
+        const std::string nameA = a.path.substr(a.path.rfind('/') + 1), nameB = b.path.substr(b.path.rfind('/') + 1);
+        return nameA != nameB ? nameA < nameB : a.path < b.path;
+    }
+    return a.rank < b.rank;
+}
+
+// Adds one share's facets to the sum, then keeps the commonest values of each.
+void AddFacets(Json::Value& sum, const Json::Value& facets) {
+    for (const auto& name : facets.getMemberNames()) {
+        for (const auto& value : facets[name].getMemberNames()) {
+            sum[name][value] = static_cast<Json::Int64>(sum[name][value].asInt64() + facets[name][value].asInt64());
+        }
+    }
+}
+
+Json::Value TopFacets(const Json::Value& sum) {
+    Json::Value top(Json::objectValue);
+    for (const auto& name : {"type", "year", "artist", "camera"}) {
+        std::vector<std::pair<long long, std::string>> counts;
+        for (const auto& value : sum[name].getMemberNames()) counts.emplace_back(-sum[name][value].asInt64(), value);
+        std::sort(counts.begin(), counts.end());
+        top[name] = Json::Value(Json::objectValue);
+        for (size_t i = 0; i < counts.size() && i < static_cast<size_t>(kMaxFacetValues); ++i) {
+            top[name][counts[i].second] = static_cast<Json::Int64>(-counts[i].first);
+        }
+    }
+    return top;
 }
 
 Json::Value CauseJson(const std::string& share, const Cause& cause) {
@@ -60,13 +97,14 @@ Json::Value CauseJson(const std::string& share, const Cause& cause) {
 // One share's best hits up to the end of the page asked for, and how many it has in all; false
 // with `cause` when its index cannot be read.
 bool SearchOne(const SearchRequest& request, const SearchTarget& target, std::vector<SearchHit>& hits, long long& total,
-               Cause& cause) {
+               Json::Value& facets, Cause& cause) {
     IndexProblem problem = IndexProblem::None;
     const auto index = OpenShareIndex(target.share, target.shareDir, kSearchBudget, problem, cause);
     if (!index) return false;
     std::string error;
-    if (index->Search(request.query, request.type, request.offset + request.limit, hits, error) &&
-        index->CountHits(request.query, request.type, total, error)) {
+    if (index->Search(request.query, request.type, request.offset + request.limit, hits, error, request.sort) &&
+        index->CountHits(request.query, request.type, total, error) &&
+        (!request.facets || index->Facets(request.query, request.type, facets, error))) {
         return true;
     }
     cause = IndexCause(index->LastProblem(), target.share, error);
@@ -76,7 +114,7 @@ bool SearchOne(const SearchRequest& request, const SearchTarget& target, std::ve
 }  // namespace
 
 bool IsSearchType(const std::string& type) {
-    return type.empty() || type == "document" || type == "audio" || type == "video" || type == "photo";
+    return type.empty() || IsSearchTypeName(type);
 }
 
 bool SearchTargets(const SearchRequest& request, std::vector<SearchTarget>& targets, Cause& cause) {
@@ -87,6 +125,9 @@ bool SearchTargets(const SearchRequest& request, std::vector<SearchTarget>& targ
     std::string error = QueryError(request.query);
     if (error.empty() && (request.offset < 0 || request.offset > kMaxSearchOffset)) {
         error = "the offset must be 0 to " + std::to_string(kMaxSearchOffset);
+    }
+    if (error.empty() && request.sort != "relevance" && request.sort != "date" && request.sort != "name") {
+        error = "unknown sort \"" + request.sort + "\"; use relevance, date or name";
     }
     if (!error.empty()) {
         cause = {"BAD_QUERY", 0, error, 400};
@@ -105,20 +146,23 @@ bool SearchIndexes(const SearchRequest& request, const std::vector<SearchTarget>
                    Cause& cause) {
     std::vector<std::pair<std::string, SearchHit>> hits;
     long long total = 0;
+    Json::Value facetSum(Json::objectValue);
     out = Json::Value(Json::objectValue);
     out["incomplete"] = Json::Value(Json::arrayValue);
     bool searched = false;
     for (const auto& target : targets) {
         std::vector<SearchHit> found;
         long long count = 0;
+        Json::Value facets(Json::objectValue);
         Cause failed;
-        if (!SearchOne(request, target, found, count, failed)) {
+        if (!SearchOne(request, target, found, count, facets, failed)) {
             if (out["incomplete"].empty()) cause = failed;
             out["incomplete"].append(CauseJson(target.share, failed));
             continue;
         }
         searched = true;
         total += count;
+        AddFacets(facetSum, facets);
         if (target.rebuilding) {
             out["incomplete"].append(CauseJson(target.share, {"INDEX_REBUILDING", 0,
                                                               "the index of share " + target.share +
@@ -128,13 +172,15 @@ bool SearchIndexes(const SearchRequest& request, const std::vector<SearchTarget>
         for (auto& hit : found) hits.emplace_back(target.share, std::move(hit));
     }
     if (!searched && !targets.empty()) return false;
-    std::stable_sort(hits.begin(), hits.end(), [](const auto& a, const auto& b) { return a.second.rank < b.second.rank; });
+    std::stable_sort(hits.begin(), hits.end(),
+                     [&request](const auto& a, const auto& b) { return Before(request.sort, a.second, b.second); });
     hits.erase(hits.begin(), hits.begin() + std::min(hits.size(), static_cast<size_t>(request.offset)));
     if (hits.size() > static_cast<size_t>(request.limit)) hits.resize(static_cast<size_t>(request.limit));
     out["total"] = static_cast<Json::Int64>(total);
     out["offset"] = request.offset;
     out["hits"] = Json::Value(Json::arrayValue);
     for (const auto& [share, hit] : hits) out["hits"].append(HitJson(share, hit));
+    if (request.facets) out["facets"] = TopFacets(facetSum);
     return true;
 }
 

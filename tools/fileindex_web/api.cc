@@ -253,6 +253,8 @@ void AddApiRoutes(HttpServer& server, const Token& token) {
         request.share = Param(req, "share");
         request.limit = static_cast<int>(std::min<unsigned long>(Number(req, "limit", 20), 200));
         request.offset = static_cast<int>(std::min<unsigned long>(Number(req, "offset", 0), tools::kMaxSearchOffset + 1UL));
+        if (!Param(req, "sort").empty()) request.sort = Param(req, "sort");
+        request.facets = Param(req, "facets") == "1";
         std::vector<tools::SearchTarget> targets;
         tools::Cause cause;
         bool found = false;

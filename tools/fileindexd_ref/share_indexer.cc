@@ -265,8 +265,7 @@ void ShareIndexer::IndexFile(int dirFd, const std::string& name, const std::stri
     for (const char* field : kSearchedFields) {
         if (fields[field].isString()) text += "\n" + fields[field].asString();
     }
-    index_->Put({sharePath, type, st.st_size, st.st_mtime, std::move(text), std::move(reply.problem),
-                 QIRA::FILEINDEX::toString(reply.fields)});
+    index_->Put({sharePath, type, st.st_size, st.st_mtime, std::move(text), std::move(reply.problem), reply.fields});
 }
 
 }  // namespace fileindexd_ref
