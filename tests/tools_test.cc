@@ -268,6 +268,7 @@ TEST_F(ToolTest, BashCompletionOffersCommandsOptionsAndIndexedFolders) {
         {"fileindexctl sh", 1, "share\n"},
         {"fileindexctl st", 1, "status\n"},
         {"fileindexctl search --o", 2, "--offset\n"},
+        {"fileindexctl search --sort d", 3, "date\n"},
         {"fileindexctl share re", 2, "remove rename resume revive\n"},
         {"fileindexctl share revive m", 3, "music\n"},
         {"fileindexctl is ro", 2, "roomy\n"},

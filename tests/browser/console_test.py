@@ -206,6 +206,10 @@ class ConsoleTest(unittest.TestCase):
         marks = [m.text for m in b.find_elements(By.CSS_SELECTOR, "#search-hits mark")]
         self.assertEqual(marks, ["manuscript", "Crète"])
         self.assertEqual(self.text("search-total"), "1 found.")
+        # A facet's chip adds its filter to the query and searches again.
+        self.click('#search-facets button[aria-label="Only type document, 1 found"]')
+        self.wait.until(lambda _: query.get_attribute("value") == "manus cret type:document")
+        self.wait_text("search-total", "1 found.")
         self.click("#search-clear")  # the results can be cleared
         self.assertEqual(self.text("search-hits"), "")
         query.clear()

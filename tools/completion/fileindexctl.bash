@@ -9,9 +9,9 @@ _fileindexctl_shares() {
 }
 
 _fileindexctl() {
-    local cur=${COMP_WORDS[COMP_CWORD]}
+    local cur=${COMP_WORDS[COMP_CWORD]} prev=${COMP_WORDS[COMP_CWORD - 1]}
     local global="--root --json -q --quiet -v --verbose --lock-wait --help --version"
-    local valued=" --root --lock-wait --offset --limit --sort --additional --name --request --hours --interval --samples --timeout "
+    local valued=" --root --lock-wait --offset --limit --sort --type --share --additional --name --request --hours --interval --samples --timeout "
     local command="" sub="" i word
     for ((i = 1; i < COMP_CWORD; i++)); do
         word=${COMP_WORDS[i]}
@@ -56,7 +56,13 @@ _fileindexctl() {
             options="--rules"
             words=$(_fileindexctl_indexed_paths)
             ;;
-        search) options="--type --share --limit --offset" ;;
+        search)
+            options="--type --share --limit --offset --sort --facets"
+            case $prev in
+                --sort) words="relevance date name" ;;
+                --type) words="document audio video photo" ;;
+            esac
+            ;;
         progress) options="--watch --interval --samples" ;;
         wait) options="--timeout" ;;
     esac

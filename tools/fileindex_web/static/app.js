@@ -391,9 +391,44 @@ const SEARCH_PAGE = 20;
 
 function clearSearch() {
   $('search-hits').replaceChildren();
+  $('search-facets').replaceChildren();
   $('search-total').textContent = '';
   $('search-more').hidden = true;
   $('search-clear').hidden = true;
+}
+
+// What a hit is about, from the fields of its kind.
+function aboutText(fields) {
+  const parts = ['title', 'artist', 'album', 'year'].filter((name) => fields[name] !== undefined).map((name) => String(fields[name]));
+  if (Number.isInteger(fields.duration)) parts.push(Math.floor(fields.duration / 60) + ':' + String(fields.duration % 60).padStart(2, '0'));
+  const camera = [fields.camera_make, fields.camera_model].filter((part) => typeof part === 'string').join(' ');
+  if (camera) parts.push(camera);
+  if (typeof fields.taken === 'string') parts.push('taken ' + fields.taken);
+  if (typeof fields.author === 'string') parts.push(fields.author);
+  if (Number.isInteger(fields.pages)) parts.push(fields.pages + ' pages');
+  return parts.join(', ');
+}
+
+// A chip per value of each facet: pressing one adds its filter to the query and searches again.
+function renderFacets(facets) {
+  const target = $('search-facets');
+  target.replaceChildren();
+  for (const [name, values] of Object.entries(facets || {})) {
+    const entries = Object.entries(values);
+    if (entries.length < 1) continue;
+    const group = document.createElement('p');
+    group.className = 'facet';
+    group.append(name + ': ');
+    for (const [value, count] of entries.sort((a, b) => b[1] - a[1])) {
+      const filter = name + ':' + (/\s/.test(value) ? '"' + value + '"' : value);
+      const chip = button(group, value + ' (' + count + ')', () => {
+        $('search-query').value = ($('search-query').value.trim() + ' ' + filter).trim();
+        search();
+      }, 'Only ' + name + ' ' + value + ', ' + count + ' found');
+      chip.className = 'chip';
+    }
+    target.appendChild(group);
+  }
 }
 
 // One page of hits, best first, from `offset` on; the total says how many there are in all.
@@ -402,7 +437,8 @@ async function search(offset = 0) {
   clearSearch();
   await act('Search for ' + query, async () => {
     const result = await api('GET', '/api/search?' +
-      new URLSearchParams({ q: query, type: $('search-type').value, offset, limit: SEARCH_PAGE }));
+      new URLSearchParams({ q: query, type: $('search-type').value, sort: $('search-sort').value, facets: '1', offset,
+        limit: SEARCH_PAGE }));
     const list = $('search-hits');
     list.start = offset + 1;
     const shown = result.hits.length;
@@ -412,6 +448,7 @@ async function search(offset = 0) {
     $('search-more').hidden = offset + shown >= result.total;
     $('search-more').onclick = () => search(offset + shown);
     $('search-clear').hidden = false;
+    renderFacets(result.facets);
     for (const hit of result.hits) {
       const item = document.createElement('li');
       const path = document.createElement('strong');
@@ -419,6 +456,9 @@ async function search(offset = 0) {
       const facts = document.createElement('span');
       facts.className = 'facts';
       facts.textContent = ' ' + hit.type + ', ' + sizeText(hit.size) + ', ' + new Date(hit.mtime * 1000).toLocaleString();
+      const about = document.createElement('div');
+      about.className = 'about';
+      about.textContent = aboutText(hit.fields);
       const snippet = document.createElement('div');
       snippet.className = 'snippet';
       for (const piece of hit.snippet) {
@@ -426,7 +466,7 @@ async function search(offset = 0) {
         part.textContent = piece.text;
         snippet.appendChild(part);
       }
-      item.append(path, facts, snippet);
+      item.append(path, facts, ...(about.textContent ? [about] : []), snippet);
       list.appendChild(item);
     }
   });
