@@ -11,7 +11,7 @@ cmake --build build-fuzz -j "$(nproc)" >/dev/null
 work=$(mktemp -d /tmp/fileindex-fuzz-run-XXXXXX)
 trap 'rm -rf "$work"' EXIT
 export TMPDIR="$work"  # the targets' scratch roots go here, removed with it
-for target in folder_conf status_conf queue_scan requests queue_line folder_conf_reading queue_incremental record_applier; do
+for target in folder_conf status_conf queue_scan requests queue_line folder_conf_reading queue_incremental record_applier extractor_channel; do
   mkdir -p "$work/$target"
   cp fuzz/corpus/"$target"/* "$work/$target/"
   echo "fuzz_$target: ${seconds}s"
