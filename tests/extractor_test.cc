@@ -55,6 +55,8 @@ TEST_F(ExtractorTest, EachKindGivesItsTextAndFields) {
     const std::string song = Path("/song"), photo = Path("/photo");
     testkit::WriteMp3(song, "So What", "Miles Davis", "Kind of Blue", 1959);
     testkit::WriteJpeg(photo, "2019:06:14 10:20:30", "FUJIFILM", "X-T3");
+    const std::string video = Path("/video");
+    testkit::WriteVideo(video, 3, "Beach");
     const std::vector<std::tuple<std::string, std::string, std::string, std::string, std::string>> cases = {
         // name, content, type, text, fields
         {"report.txt", testkit::MakePdf("Quarterly Report", "Ann Smith", "Revenue grew in the third quarter"), "document",
@@ -67,6 +69,8 @@ TEST_F(ExtractorTest, EachKindGivesItsTextAndFields) {
          R"({"title": "So What", "artist": "Miles Davis", "album": "Kind of Blue", "year": 1959, "duration": 1})"},
         {"IMG_0001", testkit::ReadFile(photo), "photo", "",
          R"({"taken": "2019-06-14 10:20:30", "camera_make": "FUJIFILM", "camera_model": "X-T3", "width": 1, "height": 1})"},
+        {"clip.txt", testkit::ReadFile(video), "video", "",
+         R"({"duration": 3, "width": 4, "height": 2, "codecs": ["rawvideo"], "title": "Beach"})"},
     };
     for (const auto& [name, content, type, text, fields] : cases) {
         const extractor::Reply reply = Extract(name, content);

@@ -244,7 +244,8 @@ TEST_F(LiveApplianceTest, WhatFilesHoldIsFoundAndADamagedFileCostsOnlyItsContent
     testkit::WriteFile(music_ + "/a/report.txt", testkit::MakePdf("Quarterly", "Ann", "Revenue grew in the third quarter"));
     testkit::WriteJpeg(music_ + "/a/IMG_0001", "2019:06:14 10:20:30", "FUJIFILM", "X-T3");
     testkit::WriteFile(music_ + "/a/broken.pdf", testkit::MakePdf("T", "A", "never read").substr(0, 40));
-    Index("/music/a", R"("document": true, "audio": true, "photo": true)");
+    testkit::WriteVideo(music_ + "/a/clip.bin", 3, "Beach");
+    Index("/music/a", R"("document": true, "audio": true, "photo": true, "video": true)");
     EXPECT_TRUE(Finds("davis kind", Paths{"/music/a/track01"}));
     EXPECT_TRUE(Finds("revenue third quarter", Paths{"/music/a/report.txt"}));
     EXPECT_TRUE(Finds("fujifilm", Paths{"/music/a/IMG_0001"}));
@@ -254,6 +255,7 @@ TEST_F(LiveApplianceTest, WhatFilesHoldIsFoundAndADamagedFileCostsOnlyItsContent
     // Filters, the fields of each kind, and the counts per type and camera.
     EXPECT_EQ(Search({"taken:2019-06", "camera:fuji"}), Paths{"/music/a/IMG_0001"});
     EXPECT_EQ(Search({"artist:davis", "year:1959"}), Paths{"/music/a/track01"});
+    EXPECT_EQ(Search({"beach", "duration:2..3"}), Paths{"/music/a/clip.bin"});
     const std::string text = testkit::Run({FILEINDEXCTL, "search", "type:audio", "--facets"}).out;
     EXPECT_NE(text.find("So What, Miles Davis, Kind of Blue, 1959, 0:01"), std::string::npos) << text;
     EXPECT_NE(text.find("\ntype: audio 1\nyear: 1959 1\nartist: Miles Davis 1\n"), std::string::npos) << text;

@@ -7,7 +7,12 @@
 #include <utility>
 #include <vector>
 
+#include <cstring>
+
 #include <exiv2/exiv2.hpp>
+extern "C" {
+#include <libavformat/avformat.h>
+}
 #include <taglib/mpegfile.h>
 #include <taglib/tag.h>
 
@@ -122,6 +127,33 @@ void WriteJpeg(const std::string& path, const std::string& taken, const std::str
     exif["Exif.Image.Model"] = model;
     image->setExifData(exif);
     image->writeMetadata();
+}
+
+void WriteVideo(const std::string& path, int seconds, const std::string& title) {
+    AVFormatContext* out = nullptr;
+    if (avformat_alloc_output_context2(&out, nullptr, "avi", path.c_str()) < 0) throw std::runtime_error("video");
+    AVStream* stream = avformat_new_stream(out, nullptr);
+    stream->codecpar->codec_type = AVMEDIA_TYPE_VIDEO;
+    stream->codecpar->codec_id = AV_CODEC_ID_RAWVIDEO;
+    stream->codecpar->width = 4;
+    stream->codecpar->height = 2;
+    stream->codecpar->format = AV_PIX_FMT_GRAY8;
+    stream->time_base = {1, 1};
+    av_dict_set(&out->metadata, "title", title.c_str(), 0);
+    if (avio_open(&out->pb, path.c_str(), AVIO_FLAG_WRITE) < 0 || avformat_write_header(out, nullptr) < 0) throw std::runtime_error("video");
+    for (int i = 0; i < seconds; ++i) {
+        AVPacket* packet = av_packet_alloc();
+        av_new_packet(packet, 8);
+        std::memset(packet->data, 0x80, 8);
+        packet->pts = packet->dts = i;
+        packet->duration = 1;
+        av_packet_rescale_ts(packet, {1, 1}, stream->time_base);
+        av_interleaved_write_frame(out, packet);
+        av_packet_free(&packet);
+    }
+    av_write_trailer(out);
+    avio_closep(&out->pb);
+    avformat_free_context(out);
 }
 
 }  // namespace testkit

@@ -119,6 +119,8 @@ Reply ContentReader::Read(int fd, const Request& request) {
         ReadOfficeDocument(fd, request.maxText, reply);
     } else if (reply.type == "audio") {
         ReadAudio(fd, reply);
+    } else if (reply.type == "video") {
+        ReadVideo(fd, reply);
     }
     return reply;
 }

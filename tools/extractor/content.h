@@ -1,7 +1,7 @@
 // What a file holds, read from a descriptor only: its kind by content (libmagic); the text of plain
 // text in any common encoding (as UTF-8), of HTML (tags, scripts and styles left out, the title as
 // a field), of PDF, OOXML, ODF and EPUB documents with their title and author; the tags of songs
-// and the metadata of photos (readers.h). Video is typed only.
+// and the metadata of photos and videos (readers.h).
 #pragma once
 
 #include <iconv.h>

@@ -4,7 +4,8 @@
 //   documents: "title", "author", "pages";
 //   audio: "title", "artist", "album", "album_artist", "genre", "year", "track", "duration" (s);
 //   photos: "taken" ("YYYY-MM-DD HH:MM:SS"), "camera_make", "camera_model", "lens",
-//           "orientation", "width", "height", "latitude", "longitude".
+//           "orientation", "width", "height", "latitude", "longitude";
+//   video: "duration" (s), "width", "height", "codecs" (one name per stream), "created", "title".
 #pragma once
 
 #include <string>
@@ -21,6 +22,7 @@ void ReadOfficeDocument(int fd, size_t maxText, Reply& reply);
 std::string OfficeDocumentMime(int fd);
 void ReadAudio(int fd, Reply& reply);
 void ReadPhoto(const std::string& bytes, Reply& reply);
+void ReadVideo(int fd, Reply& reply);
 
 // At most `limit` bytes of valid UTF-8 text, cut at a character's start.
 std::string Cut(std::string text, size_t limit);
