@@ -259,6 +259,14 @@ TEST_F(LiveApplianceTest, WhatFilesHoldIsFoundAndADamagedFileCostsOnlyItsContent
     const std::string text = testkit::Run({FILEINDEXCTL, "search", "type:audio", "--facets"}).out;
     EXPECT_NE(text.find("So What, Miles Davis, Kind of Blue, 1959, 0:01"), std::string::npos) << text;
     EXPECT_NE(text.find("\ntype: audio 1\nyear: 1959 1\nartist: Miles Davis 1\n"), std::string::npos) << text;
+    // Explain tells the kind the content gave, what was read, and why no more was.
+    const Json::Value song = testkit::ParseJson(testkit::Run({FILEINDEXCTL, "--json", "explain", "/music/a/track01"}).out)["result"];
+    EXPECT_EQ(song["verdict"], "in the index");
+    EXPECT_EQ(song["file"]["type"], "audio");
+    EXPECT_EQ(song["file"]["fields"]["artist"], "Miles Davis");
+    EXPECT_TRUE(song["file"]["extraction_problem"].isNull());
+    const std::string broken = testkit::Run({FILEINDEXCTL, "explain", "/music/a/broken.pdf"}).out;
+    EXPECT_NE(broken.find("in the index: yes\nindexed by name only: the PDF cannot be read\n"), std::string::npos) << broken;
     const auto bad = testkit::Run({FILEINDEXCTL, "search", "year:19x9"});
     EXPECT_EQ(bad.status, 2);
     EXPECT_NE(bad.err.find("BAD_QUERY: \"year:19x9\": give a whole number"), std::string::npos) << bad.err;

@@ -130,21 +130,26 @@ void WriteJpeg(const std::string& path, const std::string& taken, const std::str
 }
 
 void WriteVideo(const std::string& path, int seconds, const std::string& title) {
+    av_log_set_level(AV_LOG_QUIET);  // raw frames in Matroska draw a warning; they are read back all the same
     AVFormatContext* out = nullptr;
-    if (avformat_alloc_output_context2(&out, nullptr, "avi", path.c_str()) < 0) throw std::runtime_error("video");
+    if (avformat_alloc_output_context2(&out, nullptr, "matroska", path.c_str()) < 0) throw std::runtime_error("video");
     AVStream* stream = avformat_new_stream(out, nullptr);
     stream->codecpar->codec_type = AVMEDIA_TYPE_VIDEO;
     stream->codecpar->codec_id = AV_CODEC_ID_RAWVIDEO;
     stream->codecpar->width = 4;
     stream->codecpar->height = 2;
-    stream->codecpar->format = AV_PIX_FMT_GRAY8;
+    stream->codecpar->format = AV_PIX_FMT_BGR24;
     stream->time_base = {1, 1};
     av_dict_set(&out->metadata, "title", title.c_str(), 0);
-    if (avio_open(&out->pb, path.c_str(), AVIO_FLAG_WRITE) < 0 || avformat_write_header(out, nullptr) < 0) throw std::runtime_error("video");
+    AVDictionary* options = nullptr;
+    av_dict_set(&options, "allow_raw_vfw", "1", 0);  // raw frames: nothing to encode
+    const bool opened = avio_open(&out->pb, path.c_str(), AVIO_FLAG_WRITE) >= 0 && avformat_write_header(out, &options) >= 0;
+    av_dict_free(&options);
+    if (!opened) throw std::runtime_error("video");
     for (int i = 0; i < seconds; ++i) {
         AVPacket* packet = av_packet_alloc();
-        av_new_packet(packet, 8);
-        std::memset(packet->data, 0x80, 8);
+        av_new_packet(packet, 4 * 2 * 3);
+        std::memset(packet->data, 0x80, 4 * 2 * 3);
         packet->pts = packet->dts = i;
         packet->duration = 1;
         av_packet_rescale_ts(packet, {1, 1}, stream->time_base);

@@ -21,7 +21,7 @@ void WriteMp3(const std::string& path, const std::string& title, const std::stri
 // camera's make and model.
 void WriteJpeg(const std::string& path, const std::string& taken, const std::string& make, const std::string& model);
 
-// Writes an AVI video of `seconds` one-second frames of 4 x 2 grey pixels, titled `title`.
+// Writes a Matroska video of `seconds` one-second frames of 4 x 2 grey pixels, titled `title`.
 void WriteVideo(const std::string& path, int seconds, const std::string& title);
 
 }  // namespace testkit

@@ -23,14 +23,17 @@ std::string KindOf(const Json::Value& fullPath) {
 }
 
 // Entries of the share's index at or beneath the share path, none while the share has no index
-// yet; false with `problem` when the index cannot be read.
-bool IndexedEntries(const std::string& share, const std::string& path, long long& count, std::string& problem) {
+// yet, and the path's own entry when it has one (`found`); false with `problem` when the index
+// cannot be read.
+bool IndexedEntries(const std::string& share, const std::string& path, long long& count, IndexedFile& entry, bool& found,
+                    std::string& problem) {
     std::string shareDir;
     if (!QIRA::FILEINDEX::GetFullPath(shareDir, "/" + share)) shareDir.clear();
     IndexProblem kind = IndexProblem::None;
     Cause cause;
     const auto index = OpenShareIndex(share, shareDir, kIndexBudget, kind, cause);
     count = index ? index->CountUnder(path) : kind == IndexProblem::Missing ? 0 : -1;
+    found = count > 0 && index->Entry(path, entry);
     if (count >= 0) return true;
     problem = index ? "the index of share " + share + " could not be read in time or is damaged" : cause.text;
     return false;
@@ -39,16 +42,21 @@ bool IndexedEntries(const std::string& share, const std::string& path, long long
 Json::Value FileFacts(const Json::Value& e) {
     Json::Value file(Json::objectValue);
     file["kind"] = KindOf(e["full_path"]);
-    const std::string type = file["kind"] == "directory" ? "" : FileTypeOf(e["path"].asString());
+    long long count = 0;
+    IndexedFile entry;
+    bool found = false;
+    std::string problem;
+    const bool read = IndexedEntries(e["share"].asString(), e["path"].asString(), count, entry, found, problem);
+    // The kind the index gave it by its content, else the one its name tells.
+    const std::string type = file["kind"] == "directory" ? "" : found ? entry.type : FileTypeOf(e["path"].asString());
     file["type"] = type.empty() ? Json::Value() : Json::Value(type);
     const Json::Value& folder = e["governing_folder"];
     file["type_switched_on"] = type.empty() || folder.isNull() ? Json::Value() : folder[type];
-    long long count = 0;
-    std::string problem;
-    const bool read = IndexedEntries(e["share"].asString(), e["path"].asString(), count, problem);
     file["in_index"] = read ? Json::Value(count > 0) : Json::Value();
     file["indexed_files"] = static_cast<Json::Int64>(std::max(count, 0LL));
     file["index_problem"] = read ? Json::Value() : Json::Value(problem);
+    file["fields"] = found ? entry.fields : Json::Value();
+    file["extraction_problem"] = found && !entry.problem.empty() ? Json::Value(entry.problem) : Json::Value();
     return file;
 }
 

@@ -490,6 +490,15 @@ bool SearchIndex::Under(const std::string& path, std::map<std::string, StoredFil
     return rows.Done() || Check(SQLITE_ERROR);
 }
 
+bool SearchIndex::Entry(const std::string& path, IndexedFile& file) {
+    Statement row(db_, "SELECT type, size, mtime, problem, fields FROM files WHERE path = ?1");
+    if (!row.Ok() || !row.Bind(1, path).Step()) return false;
+    Json::Value fields;
+    file = {path, row.Text(0), row.Number(1), row.Number(2), "", row.Text(3),
+            QIRA::FILEINDEX::fromString(fields, row.Text(4)) && fields.isObject() ? fields : Json::Value(Json::objectValue)};
+    return true;
+}
+
 long long SearchIndex::Count() {
     Statement count(db_, "SELECT count(*) FROM files");
     return count.Ok() && count.Step() ? count.Number(0) : -1;

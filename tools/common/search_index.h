@@ -106,6 +106,8 @@ public:
     // Every stored path at or beneath `path`, with its size, modification time and type; false on failure.
     bool Under(const std::string& path, std::map<std::string, StoredFile>& stored);
     long long Count();
+    // The stored file at exactly `path` (its text left out); false when there is none or on failure.
+    bool Entry(const std::string& path, IndexedFile& file);
     // Stored paths at or beneath `path`; -1 on failure.
     long long CountUnder(const std::string& path);
 

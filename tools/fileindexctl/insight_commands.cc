@@ -14,6 +14,7 @@
 #include "fileindex/fileindex.h"
 #include "pause.h"
 #include "service_view.h"
+#include "text_safety.h"
 #include "time_text.h"
 
 namespace fileindexctl {
@@ -45,6 +46,17 @@ std::string Switches(const Json::Value& folder) {
            YesNo(folder["video"].asBool()) + ", photo " + YesNo(folder["photo"].asBool());
 }
 
+// "artist Miles Davis, year 1959": the fields read from a file, as the index holds them.
+std::string FieldsText(const Json::Value& fields) {
+    std::string text;
+    for (const auto& name : fields.getMemberNames()) {
+        const Json::Value& value = fields[name];
+        const std::string shown = value.isString() ? value.asString() : QIRA::FILEINDEX::toString(value);
+        text += (text.empty() ? "" : ", ") + tools::EscapeForTerminal(name) + " " + tools::EscapeForTerminal(shown);
+    }
+    return text;
+}
+
 // The verdict first, then the facts behind it; the rules that passed only with `allRules`.
 void PrintExplanation(const Json::Value& e, bool allRules) {
     std::cout << e["path"].asString() << ": " << e["verdict"].asString()
@@ -67,6 +79,10 @@ void PrintExplanation(const Json::Value& e, bool allRules) {
                                              : file["kind"] == "directory" ? std::to_string(file["indexed_files"].asUInt64()) + " files"
                                                                            : YesNo(file["in_index"].asBool()))
               << "\n";
+    if (file["fields"].isObject() && !file["fields"].empty()) std::cout << "read from it: " << FieldsText(file["fields"]) << "\n";
+    if (file["extraction_problem"].isString()) {
+        std::cout << "indexed by name only: " << tools::EscapeForTerminal(file["extraction_problem"].asString()) << "\n";
+    }
     const Json::Value& service = e["service"];
     std::cout << "service: " << service["status"].asString() << (service["paused"].asBool() ? ", paused" : "")
               << (service["daemon_answers"].asBool() ? "" : ", the indexing daemon does not answer")

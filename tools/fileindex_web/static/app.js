@@ -335,6 +335,9 @@ function explainFacts(e) {
     'Governing folder: ' + (folder ? folder.path + (folder.name ? ' (' + folder.name + ')' : '') + '; ' + switchesText(folder) : 'none'),
     'Type: ' + (file.type === null ? 'none' : file.type + (file.type_switched_on === false ? ' (switched off in that folder)' : '')) +
       '; in the index: ' + inIndex,
+    ...(file.fields && Object.keys(file.fields).length
+      ? ['Read from it: ' + Object.entries(file.fields).map(([name, value]) => name.replace(/_/g, ' ') + ' ' + factText(value)).join(', ')] : []),
+    ...(file.extraction_problem ? ['Indexed by name only: ' + file.extraction_problem] : []),
     'Service: ' + service.status + (service.paused ? ', paused' : '') +
       (service.daemon_answers ? '' : ', the indexing daemon does not answer') + '; ' +
       (e.pending.queue + e.pending.companion) + ' changes pending for the path',
