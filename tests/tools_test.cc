@@ -441,7 +441,7 @@ TEST_F(ToolTest, ExplainTellsWhetherAFileIsInTheIndexAndWhatKeepsItOut) {
     EXPECT_EQ(testkit::ParseJson(Ctl({"--json", "explain", "/music/a/link.mp3"}).out)["result"]["file"]["kind"], "other");
     const Json::Value folder = testkit::ParseJson(Ctl({"--json", "explain", "/music/a"}).out)["result"];
     EXPECT_EQ(folder["file"], J(R"({"kind": "directory", "type": null, "type_switched_on": null, "in_index": true,
-                                     "indexed_files": 1, "index_problem": null})"));
+                                     "indexed_files": 1, "index_problem": null, "fields": null, "extraction_problem": null})"));
     EXPECT_EQ(folder["service"], J(R"({"status": "processing", "paused": false, "daemon_answers": false})"));
     const std::string text = Ctl({"explain", "/music/a/notes.txt"}).out;
     EXPECT_EQ(text.rfind("/music/a/notes.txt: not indexed: folder /music/a does not index document files\n", 0), 0u) << text;
