@@ -143,16 +143,17 @@ TEST(ExtractorSandboxTest, OnlyWhatWasHandedOverCanBeReached) {
 // that died: the next file is read by a new worker.
 TEST_F(ExtractorTest, AWorkerThatHangsOrDiesIsReplaced) {
     ASSERT_EQ(Extract("first", "first words\n").text, "first words\n");
-    ExtractorClient quick({FILEINDEX_EXTRACTOR, {}, std::chrono::milliseconds(200)});
+    ExtractorClient quick({FILEINDEX_EXTRACTOR, {}, std::chrono::seconds(2)});
     const std::string path = Path("/first");
     const tools::Fd fd(open(path.c_str(), O_RDONLY | O_CLOEXEC));
-    ASSERT_EQ(quick.Extract(fd.Get(), "first", 100).problem, "");
+    // A worker that answers: on a loaded machine a first start may run past the deadline.
+    ASSERT_TRUE(testkit::WaitFor([&] { return quick.Extract(fd.Get(), "first", 100).problem.empty(); }));
     const pid_t hung = quick.Worker();
     ASSERT_EQ(kill(hung, SIGSTOP), 0);
-    EXPECT_EQ(quick.Extract(fd.Get(), "first", 100).problem, "the extractor took longer than 200 ms");
+    EXPECT_EQ(quick.Extract(fd.Get(), "first", 100).problem, "the extractor took longer than 2000 ms");
     EXPECT_EQ(quick.Worker(), 0);
     EXPECT_NE(kill(hung, 0), 0);  // killed and reaped
-    EXPECT_EQ(quick.Extract(fd.Get(), "first", 100).text, "first words\n");
+    EXPECT_TRUE(testkit::WaitFor([&] { return quick.Extract(fd.Get(), "first", 100).text == "first words\n"; }));
     const std::vector<std::pair<int, std::string>> deaths = {
         {SIGKILL, "the extractor was stopped by signal 9"},
         {SIGSYS, "the extractor tried a system call its sandbox forbids"},
