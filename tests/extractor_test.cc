@@ -85,6 +85,7 @@ TEST_F(ExtractorTest, EachKindGivesItsTextAndFields) {
         {testkit::MakePdf("T", "A", "cut short").substr(0, 40), "document", "the PDF cannot be read"},
         {mp3, "audio", "the audio file cannot be read"},
         {std::string("\xFF\xD8\xFF\xE1\x00\x08Exif", 10), "photo", "the photo's metadata cannot be read"},
+        {testkit::MakeZipBomb(), "document", "a part of the document is larger than 16 MiB, or all of them together than 64 MiB"},
     };
     for (const auto& [content, type, problem] : damaged) {
         const extractor::Reply reply = Extract("damaged", content);

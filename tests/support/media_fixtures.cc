@@ -21,10 +21,11 @@ extern "C" {
 namespace testkit {
 namespace {
 
-std::string Zip(const std::vector<std::pair<std::string, std::string>>& parts) {
+std::string Zip(const std::vector<std::pair<std::string, std::string>>& parts, bool deflate = false) {
     archive* zip = archive_write_new();
     archive_write_set_format_zip(zip);
-    archive_write_set_options(zip, "zip:compression=store");  // an ODF's "mimetype" must be stored
+    // An ODF's "mimetype" must be stored.
+    archive_write_set_options(zip, deflate ? "zip:compression=deflate" : "zip:compression=store");
     std::vector<char> buffer(1 << 20);
     size_t used = 0;
     if (archive_write_open_memory(zip, buffer.data(), buffer.size(), &used) != ARCHIVE_OK) throw std::runtime_error("zip");
@@ -92,6 +93,11 @@ std::string MakeOfficeDocument(bool odt, const std::string& title, const std::st
                 {"word/document.xml", "<w:document " + w + "><w:body><w:p><w:r><w:t>" + text + "</w:t></w:r></w:p></w:body></w:document>"},
                 {"docProps/core.xml", "<cp:coreProperties xmlns:cp=\"http://schemas.openxmlformats.org/package/2006/metadata/core-properties\" " +
                                           dc + "><dc:title>" + title + "</dc:title><dc:creator>" + author + "</dc:creator></cp:coreProperties>"}});
+}
+
+std::string MakeZipBomb() {
+    const std::string body = "<w:document><w:body>" + std::string(17 << 20, ' ') + "</w:body></w:document>";
+    return Zip({{"[Content_Types].xml", "<Types/>"}, {"word/document.xml", body}}, true);
 }
 
 void WriteMp3(const std::string& path, const std::string& title, const std::string& artist, const std::string& album,

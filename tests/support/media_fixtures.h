@@ -13,6 +13,9 @@ std::string MakePdf(const std::string& title, const std::string& author, const s
 // A docx or an odt (`odt`) whose body is `text` and whose properties hold `title` and `author`.
 std::string MakeOfficeDocument(bool odt, const std::string& title, const std::string& author, const std::string& text);
 
+// A docx whose body expands from a few KiB to 17 MiB: a zip bomb.
+std::string MakeZipBomb();
+
 // Writes an MPEG audio file of a second or so with these ID3v2 tags to `path`.
 void WriteMp3(const std::string& path, const std::string& title, const std::string& artist, const std::string& album,
               unsigned year);
