@@ -270,6 +270,11 @@ TEST_F(LiveApplianceTest, WhatFilesHoldIsFoundAndADamagedFileCostsOnlyItsContent
     const auto bad = testkit::Run({FILEINDEXCTL, "search", "year:19x9"});
     EXPECT_EQ(bad.status, 2);
     EXPECT_NE(bad.err.find("BAD_QUERY: \"year:19x9\": give a whole number"), std::string::npos) << bad.err;
+    // A kind switched off leaves the index, though the name told no kind; switched on, it comes back.
+    ASSERT_TRUE(IndexMgr::Upsert(J(R"([{"path": "/music/a", "audio": false}])")));
+    EXPECT_TRUE(Finds("davis", Paths{}));
+    ASSERT_TRUE(IndexMgr::Upsert(J(R"([{"path": "/music/a", "audio": true}])")));
+    EXPECT_TRUE(Finds("davis", Paths{"/music/a/track01"}));
 }
 
 // Words are prefixes, accents and case do not matter, a name ranks above a text, and a search
