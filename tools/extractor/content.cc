@@ -41,6 +41,19 @@ std::string ReadUpTo(int fd, size_t limit) {
     return bytes;
 }
 
+// The kind a MIME type is indexed as: "document", "audio", "video", "photo" or "".
+std::string KindOf(const std::string& mime) {
+    static const std::pair<const char*, const char*> kinds[] = {
+        {"text/", "document"}, {"application/pdf", "document"}, {"application/msword", "document"},
+        {"application/vnd.openxmlformats-officedocument.", "document"}, {"application/vnd.oasis.opendocument.", "document"},
+        {"application/epub+zip", "document"}, {"application/rtf", "document"}, {"audio/", "audio"},
+        {"video/", "video"}, {"image/", "photo"}};
+    for (const auto& [prefix, kind] : kinds) {
+        if (StartsWith(mime, prefix)) return kind;
+    }
+    return "";
+}
+
 }  // namespace
 
 ContentReader::~ContentReader() {
@@ -133,16 +146,5 @@ std::string Cut(std::string text, size_t limit) {
     return text;
 }
 
-std::string KindOf(const std::string& mime) {
-    static const std::pair<const char*, const char*> kinds[] = {
-        {"text/", "document"}, {"application/pdf", "document"}, {"application/msword", "document"},
-        {"application/vnd.openxmlformats-officedocument.", "document"}, {"application/vnd.oasis.opendocument.", "document"},
-        {"application/epub+zip", "document"}, {"application/rtf", "document"}, {"audio/", "audio"},
-        {"video/", "video"}, {"image/", "photo"}};
-    for (const auto& [prefix, kind] : kinds) {
-        if (StartsWith(mime, prefix)) return kind;
-    }
-    return "";
-}
 
 }  // namespace extractor

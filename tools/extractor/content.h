@@ -36,7 +36,4 @@ private:
     std::map<std::string, iconv_t> converters_;  // libmagic's charset name -> to UTF-8
 };
 
-// The kind a MIME type is indexed as: "document", "audio", "video", "photo" or "".
-std::string KindOf(const std::string& mime);
-
 }  // namespace extractor
