@@ -62,7 +62,12 @@ class ConsoleTest(unittest.TestCase):
         return self.rows()[0].find_elements(By.TAG_NAME, "td")[column].text
 
     def click(self, selector):
-        self.browser.find_element(By.CSS_SELECTOR, selector).click()
+        """Clicks it, found again should a poll redraw the page between finding and clicking."""
+        def clicked(_):
+            self.browser.find_element(By.CSS_SELECTOR, selector).click()
+            return True
+
+        self.wait.until(clicked)
 
     def text(self, element_id):
         return self.browser.find_element(By.ID, element_id).text
