@@ -179,7 +179,7 @@ void MakeSlowIndex(const std::string& root, int files) {
     index->Begin();
     for (int i = 0; i < files; ++i) {
         index->Put({"/music/common-" + std::to_string(i) + ".txt", "document", 100, 0,
-                    "common words of a common file, number " + std::to_string(i)});
+                    "common words of a common file, number " + std::to_string(i), "", Json::Value(Json::objectValue)});
     }
     index->Commit();
 }
