@@ -7,19 +7,13 @@
 #include <cstring>
 
 #include "fileindex/json.h"
+#include "search_query.h"
 #include "text_safety.h"
 
 namespace extractor {
 namespace {
 
-const char* const kTypes[] = {"", "document", "audio", "video", "photo"};
-
-bool KnownType(const std::string& type) {
-    for (const char* known : kTypes) {
-        if (type == known) return true;
-    }
-    return false;
-}
+bool KnownType(const std::string& type) { return type.empty() || tools::IsSearchTypeName(type); }
 
 // Closes every descriptor of a control message but the first, which it hands back.
 int TakeDescriptors(msghdr& message) {
