@@ -3,6 +3,7 @@
 #include <archive.h>
 #include <archive_entry.h>
 
+#include <fstream>
 #include <stdexcept>
 #include <utility>
 #include <vector>
@@ -16,10 +17,10 @@ extern "C" {
 #include <taglib/mpegfile.h>
 #include <taglib/tag.h>
 
-#include "sandbox.h"
-
 namespace testkit {
 namespace {
+
+void WriteBytes(const std::string& path, const std::string& bytes) { std::ofstream(path, std::ios::trunc | std::ios::binary) << bytes; }
 
 std::string Zip(const std::vector<std::pair<std::string, std::string>>& parts, bool deflate = false) {
     archive* zip = archive_write_new();
@@ -104,7 +105,7 @@ void WriteMp3(const std::string& path, const std::string& title, const std::stri
               unsigned year) {
     std::string frames;
     for (int i = 0; i < 40; ++i) frames += std::string("\xFF\xFB\x90\x64", 4) + std::string(413, '\0');  // 128 kbit/s, 44.1 kHz
-    WriteFile(path, frames);
+    WriteBytes(path, frames);
     TagLib::MPEG::File file(path.c_str());
     file.tag()->setTitle(TagLib::String(title, TagLib::String::UTF8));
     file.tag()->setArtist(TagLib::String(artist, TagLib::String::UTF8));
@@ -125,7 +126,7 @@ void WriteJpeg(const std::string& path, const std::string& taken, const std::str
         0xFF, 0xC4, 0x00, 0x14, 0x10, 0x01, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0x00,  // AC table
         0xFF, 0xDA, 0x00, 0x08, 0x01, 0x01, 0x00, 0x00, 0x3F, 0x00, 0x00,                     // scan
         0xFF, 0xD9};                                                                           // end
-    WriteFile(path, std::string(reinterpret_cast<const char*>(jpeg), sizeof jpeg));
+    WriteBytes(path, std::string(reinterpret_cast<const char*>(jpeg), sizeof jpeg));
     const auto image = Exiv2::ImageFactory::open(path);
     Exiv2::ExifData exif;
     exif["Exif.Photo.DateTimeOriginal"] = taken;

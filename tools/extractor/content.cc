@@ -19,7 +19,9 @@
 namespace extractor {
 namespace {
 
-// Bytes read at most: text wants a little more than it keeps (encodings, markup).
+// What libmagic is given to tell a file's kind.
+constexpr size_t kTypingBytes = 256 << 10;
+// Bytes of text read at most: text wants a little more than it keeps (encodings, markup).
 constexpr size_t kMaxRead = 8 << 20;
 // A PDF or a photo is read whole, up to this size.
 constexpr size_t kMaxWhole = 128 << 20;
@@ -29,7 +31,9 @@ const std::pair<const char*, const char*> kCharsets[] = {
 
 bool StartsWith(const std::string& text, const char* prefix) { return text.compare(0, std::strlen(prefix), prefix) == 0; }
 
-std::string ReadUpTo(int fd, size_t limit) {
+// The first `limit` bytes of a file of `size` bytes (fewer should it shrink meanwhile).
+std::string ReadUpTo(int fd, size_t limit, off_t size) {
+    limit = std::min(limit, static_cast<size_t>(size));
     std::string bytes(limit, '\0');
     size_t done = 0;
     while (done < limit) {
@@ -100,7 +104,7 @@ Reply ContentReader::Read(int fd, const Request& request) {
         reply.problem = "not a regular file";
         return reply;
     }
-    const std::string head = ReadUpTo(fd, std::min<size_t>(kMaxRead, std::max<size_t>(request.maxText * 4, 64 * 1024)));
+    std::string head = ReadUpTo(fd, kTypingBytes, st.st_size);
     const char* mime = magic_buffer(magic_, head.data(), head.size());
     reply.mime = mime != nullptr ? mime : "application/octet-stream";
     if (reply.mime == "application/zip") {
@@ -108,6 +112,9 @@ Reply ContentReader::Read(int fd, const Request& request) {
         if (!document.empty()) reply.mime = document;
     }
     reply.type = KindOf(reply.mime);
+    if (StartsWith(reply.mime, "text/") && head.size() < static_cast<size_t>(st.st_size)) {
+        head = ReadUpTo(fd, std::min(kMaxRead, std::max(request.maxText * 4, kTypingBytes)), st.st_size);
+    }
     if (reply.mime == "text/html") {
         std::string title;
         reply.text = Cut(HtmlText(head, title), request.maxText);
@@ -123,9 +130,9 @@ Reply ContentReader::Read(int fd, const Request& request) {
         if (static_cast<size_t>(st.st_size) > kMaxWhole) {
             reply.problem = "larger than 128 MiB";
         } else if (reply.type == "photo") {
-            ReadPhoto(ReadUpTo(fd, kMaxWhole), reply);
+            ReadPhoto(ReadUpTo(fd, kMaxWhole, st.st_size), reply);
         } else {
-            ReadPdf(ReadUpTo(fd, kMaxWhole), request.maxText, reply);
+            ReadPdf(ReadUpTo(fd, kMaxWhole, st.st_size), request.maxText, reply);
         }
     } else if (StartsWith(reply.mime, "application/vnd.openxmlformats-officedocument.") ||
                StartsWith(reply.mime, "application/vnd.oasis.opendocument.") || reply.mime == "application/epub+zip") {
