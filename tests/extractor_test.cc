@@ -86,10 +86,12 @@ TEST_F(ExtractorTest, EachKindGivesItsTextAndFields) {
         {mp3, "audio", "the audio file cannot be read"},
         {std::string("\xFF\xD8\xFF\xE1\x00\x08Exif", 10), "photo", "the photo's metadata cannot be read"},
         {testkit::MakeZipBomb(), "document", "a part of the document is larger than 16 MiB, or all of them together than 64 MiB"},
+
     };
     for (const auto& [content, type, problem] : damaged) {
         const extractor::Reply reply = Extract("damaged", content);
         EXPECT_EQ(reply.type + ": " + reply.problem, type + ": " + problem);
+        EXPECT_EQ(reply.fields, Json::Value(Json::objectValue)) << problem;
     }
 }
 
@@ -168,6 +170,12 @@ TEST_F(ExtractorTest, AWorkerThatHangsOrDiesIsReplaced) {
         EXPECT_EQ(Extract("again", "more words\n").text, "more words\n");
         EXPECT_NE(client_.Worker(), worker);
     }
+    // A file that keeps the worker busy without end: the CPU limit ends it well before the deadline.
+    ExtractorClient bounded({FILEINDEX_EXTRACTOR, {512, 1}, std::chrono::minutes(10)});
+    testkit::WriteFile(Path("/endless.pdf"), testkit::MakeEndlessPdf());
+    const tools::Fd endless(open(Path("/endless.pdf").c_str(), O_RDONLY | O_CLOEXEC));
+    EXPECT_EQ(bounded.Extract(endless.Get(), "endless.pdf", 100).problem, "the extractor ran past its CPU time limit");
+    EXPECT_EQ(bounded.Extract(fd.Get(), "first", 100).text, "first words\n");
     ExtractorClient missing({Path("/no-such-program"), {}, std::chrono::seconds(1)});
     EXPECT_EQ(missing.Extract(fd.Get(), "first", 100).problem, "the extractor cannot be started");
 }

@@ -61,7 +61,8 @@ protected:
         NotifierTest::SetUp();
         daemon_.reset();
         daemonLog_ = Path("/daemon.log");
-        indexer_ = testkit::Start({FILEINDEXD_REF, "--interval", "20"}, daemonLog_);
+        // A file that keeps the worker busy ends at the CPU limit, however slow the machine.
+        indexer_ = testkit::Start({FILEINDEXD_REF, "--interval", "20", "--extract-cpu", "1", "--extract-deadline", "600000"}, daemonLog_);
         ASSERT_TRUE(testkit::WaitFor([&] { return Logged(daemonLog_, "listening on"); }));
     }
     void TearDown() override {
@@ -244,13 +245,21 @@ TEST_F(LiveApplianceTest, WhatFilesHoldIsFoundAndADamagedFileCostsOnlyItsContent
     testkit::WriteFile(music_ + "/a/report.txt", testkit::MakePdf("Quarterly", "Ann", "Revenue grew in the third quarter"));
     testkit::WriteJpeg(music_ + "/a/IMG_0001", "2019:06:14 10:20:30", "FUJIFILM", "X-T3");
     testkit::WriteFile(music_ + "/a/broken.pdf", testkit::MakePdf("T", "A", "never read").substr(0, 40));
+    testkit::WriteFile(music_ + "/a/endless.pdf", testkit::MakeEndlessPdf());
+    testkit::WriteFile(music_ + "/a/exif.jpg", testkit::MakeJpegWithHugeExif());
     testkit::WriteVideo(music_ + "/a/clip.bin", 3, "Beach");
     Index("/music/a", R"("document": true, "audio": true, "photo": true, "video": true)");
     EXPECT_TRUE(Finds("davis kind", Paths{"/music/a/track01"}));
     EXPECT_TRUE(Finds("revenue third quarter", Paths{"/music/a/report.txt"}));
     EXPECT_TRUE(Finds("fujifilm", Paths{"/music/a/IMG_0001"}));
     EXPECT_TRUE(Finds("broken", Paths{"/music/a/broken.pdf"}));
-    EXPECT_TRUE(Logged(daemonLog_, "share music: /music/a/broken.pdf: indexed by name only: the PDF cannot be read\n"));
+    for (const std::string problem : {"broken.pdf: indexed by name only: the PDF cannot be read",
+                                      "endless.pdf: indexed by name only: the extractor ran past its CPU time limit",
+                                      "exif.jpg: indexed by name only: the photo's metadata cannot be read"}) {
+        EXPECT_TRUE(Logged(daemonLog_, "share music: /music/a/" + problem + "\n")) << problem << testkit::ReadFile(daemonLog_);
+    }
+    EXPECT_EQ(Search({"endless"}), Paths{"/music/a/endless.pdf"});
+    EXPECT_EQ(Search({"exif", "type:photo"}), Paths{"/music/a/exif.jpg"});
     EXPECT_EQ(Search({"davis", "--type", "audio"}), Paths{"/music/a/track01"});
     // Filters, the fields of each kind, and the counts per type and camera.
     EXPECT_EQ(Search({"taken:2019-06", "camera:fuji"}), Paths{"/music/a/IMG_0001"});

@@ -8,6 +8,8 @@
 #include <utility>
 #include <vector>
 
+#include <cstdint>
+#include <cstdio>
 #include <cstring>
 
 #include <exiv2/exiv2.hpp>
@@ -45,18 +47,24 @@ std::string Zip(const std::vector<std::pair<std::string, std::string>>& parts, b
     return std::string(buffer.data(), used);
 }
 
-}  // namespace
+// A 1 x 1 grey JPEG without metadata.
+std::string BareJpeg() {
+    const unsigned char jpeg[] = {
+        0xFF, 0xD8,                                                                            // start
+        0xFF, 0xE0, 0x00, 0x10, 'J', 'F', 'I', 'F', 0x00, 0x01, 0x01, 0x00, 0x00, 0x01, 0x00, 0x01, 0x00, 0x00,
+        0xFF, 0xDB, 0x00, 0x43, 0x00, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1,
+        1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1,
+        1, 1, 1, 1, 1,                                                                         // quantisation table
+        0xFF, 0xC0, 0x00, 0x0B, 0x08, 0x00, 0x01, 0x00, 0x01, 0x01, 0x01, 0x11, 0x00,         // 1 x 1, one component
+        0xFF, 0xC4, 0x00, 0x14, 0x00, 0x01, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0x00,  // DC table
+        0xFF, 0xC4, 0x00, 0x14, 0x10, 0x01, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0x00,  // AC table
+        0xFF, 0xDA, 0x00, 0x08, 0x01, 0x01, 0x00, 0x00, 0x3F, 0x00, 0x00,                     // scan
+        0xFF, 0xD9};                                                                           // end
+    return std::string(reinterpret_cast<const char*>(jpeg), sizeof jpeg);
+}
 
-std::string MakePdf(const std::string& title, const std::string& author, const std::string& sentence) {
-    const std::string stream = "BT /F1 12 Tf 20 50 Td (" + sentence + ") Tj ET";
-    const std::vector<std::string> objects = {
-        "<< /Type /Catalog /Pages 2 0 R >>",
-        "<< /Type /Pages /Kids [3 0 R] /Count 1 >>",
-        "<< /Type /Page /Parent 2 0 R /MediaBox [0 0 600 100] /Contents 4 0 R /Resources << /Font << /F1 5 0 R >> >> >>",
-        "<< /Length " + std::to_string(stream.size()) + " >>\nstream\n" + stream + "\nendstream",
-        "<< /Type /Font /Subtype /Type1 /BaseFont /Helvetica >>",
-        "<< /Title (" + title + ") /Author (" + author + ") >>",
-    };
+// A PDF of these objects, numbered from 1, the first the catalog and the last the information.
+std::string PdfOf(const std::vector<std::string>& objects) {
     std::string pdf = "%PDF-1.4\n";
     std::vector<size_t> offsets;
     for (size_t i = 0; i < objects.size(); ++i) {
@@ -70,9 +78,65 @@ std::string MakePdf(const std::string& title, const std::string& author, const s
         snprintf(line, sizeof line, "%010zu 00000 n \n", offset);
         pdf += line;
     }
-    pdf += "trailer\n<< /Size " + std::to_string(objects.size() + 1) + " /Root 1 0 R /Info 6 0 R >>\nstartxref\n" +
-           std::to_string(xref) + "\n%%EOF\n";
-    return pdf;
+    return pdf + "trailer\n<< /Size " + std::to_string(objects.size() + 1) + " /Root 1 0 R /Info " +
+           std::to_string(objects.size()) + " 0 R >>\nstartxref\n" + std::to_string(xref) + "\n%%EOF\n";
+}
+
+std::string Stream(const std::string& dictionary, const std::string& content) {
+    return "<< " + dictionary + " /Length " + std::to_string(content.size()) + " >>\nstream\n" + content + "\nendstream";
+}
+
+}  // namespace
+
+std::string MakePdf(const std::string& title, const std::string& author, const std::string& sentence) {
+    return PdfOf({
+        "<< /Type /Catalog /Pages 2 0 R >>",
+        "<< /Type /Pages /Kids [3 0 R] /Count 1 >>",
+        "<< /Type /Page /Parent 2 0 R /MediaBox [0 0 600 100] /Contents 4 0 R /Resources << /Font << /F1 5 0 R >> >> >>",
+        Stream("", "BT /F1 12 Tf 20 50 Td (" + sentence + ") Tj ET"),
+        "<< /Type /Font /Subtype /Type1 /BaseFont /Helvetica >>",
+        "<< /Title (" + title + ") /Author (" + author + ") >>",
+    });
+}
+
+std::string MakeEndlessPdf() {
+    std::vector<std::string> objects = {
+        "<< /Type /Catalog /Pages 2 0 R >>",
+        "<< /Type /Pages /Kids [3 0 R] /Count 1 >>",
+        "<< /Type /Page /Parent 2 0 R /MediaBox [0 0 10 10] /Contents 4 0 R /Resources << /XObject << /X 5 0 R >> >> >>",
+        Stream("", "/X Do"),
+    };
+    // Forms 5 to 13, each drawing the next ten times; the last saves and restores the state.
+    for (int form = 5; form <= 13; ++form) {
+        const std::string next = std::to_string(form + 1) + " 0 R";
+        std::string draws;
+        for (int i = 0; i < 10; ++i) draws += "/X Do\n";
+        objects.push_back(form < 13 ? Stream("/Type /XObject /Subtype /Form /BBox [0 0 10 10] /Resources << /XObject << /X " + next + " >> >>", draws)
+                                    : Stream("/Type /XObject /Subtype /Form /BBox [0 0 10 10]", "q Q"));
+    }
+    objects.push_back("<< /Title (Endless) >>");
+    return PdfOf(objects);
+}
+
+std::string MakeJpegWithHugeExif() {
+    const auto le = [](uint32_t value, int bytes) {
+        std::string out;
+        for (int i = 0; i < bytes; ++i) out += static_cast<char>(value >> (8 * i) & 0xFF);
+        return out;
+    };
+    // A little-endian TIFF header and one IFD of 5,000 user comments, each claiming 4 GiB at an
+    // offset inside the block, then the date (DateTime): most of a segment's 64 KiB.
+    constexpr uint32_t kComments = 5000;
+    const std::string taken = std::string("2020:02:29 23:59:59") + '\0';
+    std::string tiff = std::string("II*\0\x08\0\0\0", 8) + le(kComments + 1, 2);
+    for (uint32_t i = 0; i < kComments; ++i) tiff += le(0x9286, 2) + le(7, 2) + le(0xFFFFFFFF, 4) + le(8, 4);
+    const uint32_t takenAt = static_cast<uint32_t>(tiff.size()) + 12 + 4;
+    tiff += le(0x0132, 2) + le(2, 2) + le(static_cast<uint32_t>(taken.size()), 4) + le(takenAt, 4) + le(0, 4) + taken;
+    const std::string exif = "Exif" + std::string(2, '\0') + tiff;
+    const size_t length = exif.size() + 2;  // big-endian, counting itself
+    const std::string segment = "\xFF\xE1" + std::string(1, static_cast<char>(length >> 8)) + std::string(1, static_cast<char>(length & 0xFF)) + exif;
+    const std::string bare = BareJpeg();
+    return bare.substr(0, 2) + segment + bare.substr(2);
 }
 
 std::string MakeOfficeDocument(bool odt, const std::string& title, const std::string& author, const std::string& text) {
@@ -115,18 +179,7 @@ void WriteMp3(const std::string& path, const std::string& title, const std::stri
 }
 
 void WriteJpeg(const std::string& path, const std::string& taken, const std::string& make, const std::string& model) {
-    const unsigned char jpeg[] = {
-        0xFF, 0xD8,                                                                            // start
-        0xFF, 0xE0, 0x00, 0x10, 'J', 'F', 'I', 'F', 0x00, 0x01, 0x01, 0x00, 0x00, 0x01, 0x00, 0x01, 0x00, 0x00,
-        0xFF, 0xDB, 0x00, 0x43, 0x00, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1,
-        1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1,
-        1, 1, 1, 1, 1,                                                                         // quantisation table
-        0xFF, 0xC0, 0x00, 0x0B, 0x08, 0x00, 0x01, 0x00, 0x01, 0x01, 0x01, 0x11, 0x00,         // 1 x 1, one component
-        0xFF, 0xC4, 0x00, 0x14, 0x00, 0x01, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0x00,  // DC table
-        0xFF, 0xC4, 0x00, 0x14, 0x10, 0x01, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0x00,  // AC table
-        0xFF, 0xDA, 0x00, 0x08, 0x01, 0x01, 0x00, 0x00, 0x3F, 0x00, 0x00,                     // scan
-        0xFF, 0xD9};                                                                           // end
-    WriteBytes(path, std::string(reinterpret_cast<const char*>(jpeg), sizeof jpeg));
+    WriteBytes(path, BareJpeg());
     const auto image = Exiv2::ImageFactory::open(path);
     Exiv2::ExifData exif;
     exif["Exif.Photo.DateTimeOriginal"] = taken;

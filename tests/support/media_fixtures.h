@@ -10,6 +10,14 @@ namespace testkit {
 // (printable ASCII, no parentheses or backslashes).
 std::string MakePdf(const std::string& title, const std::string& author, const std::string& sentence);
 
+// A PDF of a few KiB whose page draws a form that draws the next form ten times, nine deep: a
+// billion drawings for whoever reads its text.
+std::string MakeEndlessPdf();
+
+// A JPEG whose EXIF segment (most of its 64 KiB) lists 5,000 entries, each claiming 4 GiB of data,
+// and then the date it was taken, 2020:02:29 23:59:59.
+std::string MakeJpegWithHugeExif();
+
 // A docx or an odt (`odt`) whose body is `text` and whose properties hold `title` and `author`.
 std::string MakeOfficeDocument(bool odt, const std::string& title, const std::string& author, const std::string& text);
 

@@ -73,7 +73,6 @@ bool ContentReader::Load() {
         if (converter != reinterpret_cast<iconv_t>(-1)) converters_[name] = converter;
     }
     xmlInitParser();
-    Exiv2::LogMsg::setLevel(Exiv2::LogMsg::mute);
     Exiv2::enableBMFF(true);  // HEIC and AVIF photos
     return true;
 }

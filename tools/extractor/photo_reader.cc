@@ -1,4 +1,5 @@
 #include <cstdio>
+#include <stdexcept>
 
 #include <exiv2/exiv2.hpp>
 
@@ -49,12 +50,24 @@ void PutDate(Reply& reply, const Exiv2::ExifData& exif) {
     }
 }
 
+// Whether exiv2 reported an error (it reports nothing less) since this was last cleared. Its
+// messages are kept from the worker's output: a hostile file could otherwise fill the daemon's log.
+bool g_metadataDamaged = false;
+
+void NoteError(int, const char*) { g_metadataDamaged = true; }
+
 }  // namespace
 
 void ReadPhoto(const std::string& bytes, Reply& reply) {
+    Exiv2::LogMsg::setLevel(Exiv2::LogMsg::error);
+    Exiv2::LogMsg::setHandler(NoteError);
+    g_metadataDamaged = false;
     try {
         const auto image = Exiv2::ImageFactory::open(reinterpret_cast<const Exiv2::byte*>(bytes.data()), static_cast<long>(bytes.size()));
         image->readMetadata();
+        // What exiv2 skipped as damaged (a directory of too many entries, an offset out of
+        // bounds) makes the rest untrustworthy too.
+        if (g_metadataDamaged) throw std::runtime_error("damaged");
         if (image->pixelWidth() > 0) reply.fields["width"] = image->pixelWidth();
         if (image->pixelHeight() > 0) reply.fields["height"] = image->pixelHeight();
         const Exiv2::ExifData& exif = image->exifData();
@@ -68,6 +81,7 @@ void ReadPhoto(const std::string& bytes, Reply& reply) {
         PutCoordinate(reply, "latitude", exif, "Exif.GPSInfo.GPSLatitude", "Exif.GPSInfo.GPSLatitudeRef", 'S');
         PutCoordinate(reply, "longitude", exif, "Exif.GPSInfo.GPSLongitude", "Exif.GPSInfo.GPSLongitudeRef", 'W');
     } catch (const std::exception&) {
+        reply.fields = Json::Value(Json::objectValue);
         reply.problem = "the photo's metadata cannot be read";
     }
 }
