@@ -98,6 +98,16 @@ TEST_F(SearchQueryTest, HitsComeInTheOrderAskedAndFacetsCountThemAll) {
         "artist": {"John Coltrane": 1, "Miles Davis": 1}, "camera": {}})"));
     ASSERT_TRUE(index_->Facets("type:photo", "", facets, error)) << error;
     EXPECT_EQ(facets["camera"], testkit::ParseJson(R"({"FUJIFILM X-T3": 1, "Canon EOS R5": 1, "FUJIFILM X100V": 1})"));
+    // Ten values at most: the commonest, then ties by value, numbers by their value before texts.
+    ASSERT_TRUE(index_->Begin());
+    int n = 0;
+    for (const char* year : {"1010", "1010", "999", "1000", "1001", "1002", "1003", "1004", "1005", "1006", "1007", "1008", "\"x\""}) {
+        ASSERT_TRUE(index_->Put({"/s/y" + std::to_string(n++), "audio", 1, 1, "capped", "", testkit::ParseJson(std::string("{\"year\": ") + year + "}")}));
+    }
+    ASSERT_TRUE(index_->Commit());
+    ASSERT_TRUE(index_->Facets("capped", "", facets, error)) << error;
+    EXPECT_EQ(facets["year"], testkit::ParseJson(R"({"1010": 2, "999": 1, "1000": 1, "1001": 1, "1002": 1, "1003": 1, "1004": 1,
+        "1005": 1, "1006": 1, "1007": 1})"));
 }
 
 TEST(SearchQueryErrors, ABadQueryNamesItsBadPart) {

@@ -155,6 +155,11 @@ public:
                     : std::string();
     }
     long long Number(int column) const { return sqlite3_column_int64(statement_, column); }
+    bool IsNull(int column) const { return sqlite3_column_type(statement_, column) == SQLITE_NULL; }
+    bool IsNumber(int column) const {
+        const int type = sqlite3_column_type(statement_, column);
+        return type == SQLITE_INTEGER || type == SQLITE_FLOAT;
+    }
     double Real(int column) const { return sqlite3_column_double(statement_, column); }
 
 private:
@@ -250,6 +255,17 @@ Statement& BindQuery(Statement& statement, const SearchQuery& query, const std::
         else statement.Bind(next++, std::get<long long>(param));
     }
     return statement;
+}
+
+// A facet's value, ordered as SQLite orders values: numbers by their value before texts.
+using FacetValue = std::tuple<bool, long long, std::string>;  // is a text, number, as text
+
+// At most kMaxFacetValues of `counts`, the commonest first, alike in the order of their values.
+std::vector<std::pair<FacetValue, long long>> Commonest(const std::map<FacetValue, long long>& counts) {
+    std::vector<std::pair<FacetValue, long long>> values(counts.begin(), counts.end());
+    std::stable_sort(values.begin(), values.end(), [](const auto& a, const auto& b) { return a.second > b.second; });
+    values.resize(std::min(values.size(), static_cast<size_t>(kMaxFacetValues)));
+    return values;
 }
 
 // " FROM ... WHERE ..." of a parsed query: ?1 the words, ?2 the type ("" for any), the
@@ -548,20 +564,27 @@ bool SearchIndex::CountHits(const std::string& query, const std::string& type, l
 bool SearchIndex::Facets(const std::string& query, const std::string& type, Json::Value& facets, std::string& error) {
     SearchQuery parsed;
     if (!ParseSearchQuery(query, parsed, error)) return false;
-    facets = Json::Value(Json::objectValue);
-    const std::pair<const char*, const char*> kinds[] = {
-        {"type", "f.type"}, {"year", "f.year"}, {"artist", "f.artist"}, {"camera", "nullif(f.camera, '')"}};
-    for (const auto& [name, column] : kinds) {
-        Statement rows(db_, std::string("SELECT ") + column + ", count(*) AS n" + From(parsed) + " AND " + column +
-                                " IS NOT NULL GROUP BY 1 ORDER BY n DESC, 1 LIMIT " + std::to_string(kMaxFacetValues));
-        if (rows.Ok()) {
-            BindQuery(rows, parsed, type);
-            facets[name] = Json::Value(Json::objectValue);
-            while (rows.Step()) facets[name][rows.Text(0)] = static_cast<Json::Int64>(rows.Number(1));
+    // One pass over the hits counts all four; the commonest values of each are kept.
+    const char* const kinds[] = {"type", "year", "artist", "camera"};
+    std::map<FacetValue, long long> counts[4];
+    Statement rows(db_, "SELECT f.type, f.year, f.artist, nullif(f.camera, '')" + From(parsed));
+    if (rows.Ok()) {
+        BindQuery(rows, parsed, type);
+        while (rows.Step()) {
+            for (int kind = 0; kind < 4; ++kind) {
+                if (!rows.IsNull(kind)) ++counts[kind][{!rows.IsNumber(kind), rows.Number(kind), rows.Text(kind)}];
+            }
         }
-        if (!rows.Ok() || !rows.Done()) {
-            error = SearchError();
-            return false;
+    }
+    if (!rows.Ok() || !rows.Done()) {
+        error = SearchError();
+        return false;
+    }
+    facets = Json::Value(Json::objectValue);
+    for (int kind = 0; kind < 4; ++kind) {
+        facets[kinds[kind]] = Json::Value(Json::objectValue);
+        for (const auto& [value, count] : Commonest(counts[kind])) {
+            facets[kinds[kind]][std::get<std::string>(value)] = static_cast<Json::Int64>(count);
         }
     }
     return true;
