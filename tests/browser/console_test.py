@@ -26,6 +26,17 @@ def ctl(*args):
     subprocess.run([os.path.join(TOOLS, "fileindexctl"), *args], check=True, capture_output=True)
 
 
+def write_song(path, title, artist, album, year):
+    """An MPEG audio file of about a second with these ID3v2.3 tags."""
+    frames = b""
+    for frame_id, text in (("TIT2", title), ("TPE1", artist), ("TALB", album), ("TYER", str(year))):
+        data = b"\x00" + text.encode("latin-1")
+        frames += frame_id.encode() + len(data).to_bytes(4, "big") + b"\x00\x00" + data
+    size = bytes((len(frames) >> shift) & 0x7F for shift in (21, 14, 7, 0))  # seven bits a byte
+    with open(path, "wb") as file:
+        file.write(b"ID3\x03\x00\x00" + size + frames + (b"\xff\xfb\x90\x64" + bytes(413)) * 40)
+
+
 def write(path, text="some text"):
     with open(path, "w", encoding="utf-8") as file:
         file.write(text)
@@ -215,6 +226,20 @@ class ConsoleTest(unittest.TestCase):
         # A facet's chip adds its filter to the query and searches again.
         self.click('#search-facets button[aria-label="Only type document, 1 found"]')
         self.wait.until(lambda _: query.get_attribute("value") == "manus cret type:document")
+        self.wait_text("search-total", "1 found.")
+        # A song, typed by its content, shows what it is about; its artist's chip keeps to it.
+        write_song(os.path.join(os.environ["QIRA_ROOT"], "volume1/music/f03/track01"), "So What", "Miles Davis", "Kind of Blue", 1959)
+        ctl("folder", "set", "/music/f03", "--document", "--audio")
+        for _ in range(100):
+            query.clear()
+            query.send_keys("artist:davis")
+            self.click("#search-form button")
+            self.wait_text("message", "Search for artist:davis: done.")
+            if "/music/f03/track01" in self.text("search-hits"):
+                break
+        self.assertIn("So What, Miles Davis, Kind of Blue, 1959, 0:01", self.text("search-hits"))
+        self.click('#search-facets button[aria-label="Only artist Miles Davis, 1 found"]')
+        self.wait.until(lambda _: query.get_attribute("value") == 'artist:davis artist:"Miles Davis"')
         self.wait_text("search-total", "1 found.")
         self.click("#search-clear")  # the results can be cleared
         self.assertEqual(self.text("search-hits"), "")

@@ -189,6 +189,37 @@ void WriteJpeg(const std::string& path, const std::string& taken, const std::str
     image->writeMetadata();
 }
 
+std::string MakeHeic(const std::string& taken, const std::string& make, const std::string& model, unsigned width,
+                     unsigned height) {
+    const auto be = [](uint32_t value, int bytes) {
+        std::string out;
+        for (int i = bytes - 1; i >= 0; --i) out += static_cast<char>(value >> (8 * i) & 0xFF);
+        return out;
+    };
+    const auto box = [&be](const std::string& type, const std::string& content) { return be(static_cast<uint32_t>(8 + content.size()), 4) + type + content; };
+    const std::string fullBox = std::string(4, '\0');  // version 0, no flags
+    Exiv2::ExifData exif;
+    exif["Exif.Photo.DateTimeOriginal"] = taken;
+    exif["Exif.Image.Make"] = make;
+    exif["Exif.Image.Model"] = model;
+    Exiv2::Blob tiff;
+    Exiv2::ExifParser::encode(tiff, Exiv2::littleEndian, exif);
+    // The Exif item: the offset of the TIFF header past "Exif\0\0", then both.
+    const std::string item = be(6, 4) + "Exif" + std::string(2, '\0') + std::string(tiff.begin(), tiff.end());
+    const std::string ftyp = box("ftyp", "heic" + be(0, 4) + "mif1heic");
+    const std::string infe = box("infe", std::string("\x02\0\0\0", 4) + be(1, 2) + be(0, 2) + "Exif" + '\0');
+    const std::string properties = box("iprp", box("ipco", box("ispe", fullBox + be(width, 4) + be(height, 4))));
+    // The item's place: one item, one extent of 4-byte offset and length, found once the sizes
+    // before it are known.
+    const auto meta = [&](uint32_t itemAt) {
+        const std::string iloc = box("iloc", fullBox + "\x44" + '\0' + be(1, 2) + be(1, 2) + be(0, 2) + be(1, 2) + be(itemAt, 4) +
+                                                 be(static_cast<uint32_t>(item.size()), 4));
+        return box("meta", fullBox + box("iinf", fullBox + be(1, 2) + infe) + iloc + properties);
+    };
+    const uint32_t itemAt = static_cast<uint32_t>(ftyp.size() + meta(0).size() + 8);
+    return ftyp + meta(itemAt) + box("mdat", item);
+}
+
 void WriteVideo(const std::string& path, int seconds, const std::string& title) {
     av_log_set_level(AV_LOG_QUIET);  // raw frames in Matroska draw a warning; they are read back all the same
     AVFormatContext* out = nullptr;

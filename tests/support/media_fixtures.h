@@ -32,6 +32,11 @@ void WriteMp3(const std::string& path, const std::string& title, const std::stri
 // camera's make and model.
 void WriteJpeg(const std::string& path, const std::string& taken, const std::string& make, const std::string& model);
 
+// A HEIC photo (its image left out) whose EXIF says when it was taken and with which camera, and
+// whose properties give its size.
+std::string MakeHeic(const std::string& taken, const std::string& make, const std::string& model, unsigned width,
+                     unsigned height);
+
 // Writes a Matroska video of `seconds` one-second frames of 4 x 2 grey pixels, titled `title`.
 void WriteVideo(const std::string& path, int seconds, const std::string& title);
 
