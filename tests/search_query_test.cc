@@ -1,5 +1,7 @@
 // Words and filters over an index of known files: each filter on both sides of its bounds, the
 // orders, the facets, and the errors that name the part of a query that is wrong.
+#include <sqlite3.h>
+
 #include "search_index.h"
 #include "testkit.h"
 
@@ -108,6 +110,34 @@ TEST_F(SearchQueryTest, HitsComeInTheOrderAskedAndFacetsCountThemAll) {
     ASSERT_TRUE(index_->Facets("capped", "", facets, error)) << error;
     EXPECT_EQ(facets["year"], testkit::ParseJson(R"({"1010": 2, "999": 1, "1000": 1, "1001": 1, "1002": 1, "1003": 1, "1004": 1,
         "1005": 1, "1006": 1, "1007": 1})"));
+}
+
+// An index without the indexes of its columns (made before they were, or dropped) is searched as
+// it is, and the daemon's next open makes them again.
+TEST_F(SearchQueryTest, AnIndexWithoutItsColumnIndexesIsStillOurs) {
+    index_.reset();
+    const std::string file = dir_ + "/@eaDir/QIRA@.fileindexdb/index.sqlite";
+    const auto indexes = [&file](const char* change) {
+        sqlite3* db = nullptr;
+        sqlite3_open(file.c_str(), &db);
+        sqlite3_exec(db, change, nullptr, nullptr, nullptr);
+        sqlite3_stmt* count = nullptr;
+        sqlite3_prepare_v2(db, "SELECT count(*) FROM sqlite_schema WHERE name LIKE 'files_%'", -1, &count, nullptr);
+        sqlite3_step(count);
+        const int found = sqlite3_column_int(count, 0);
+        sqlite3_finalize(count);
+        sqlite3_close(db);
+        return found;
+    };
+    ASSERT_EQ(indexes("DROP INDEX files_type; DROP INDEX files_taken;"), 4);
+    tools::IndexProblem problem;
+    std::string error;
+    index_ = tools::SearchIndex::Open(dir_, false, problem, error);
+    ASSERT_TRUE(index_) << error;
+    EXPECT_EQ(Find("type:photo taken:2019-06..2019-08"), (Paths{"IMG_1.jpg", "IMG_2.jpg"}));
+    index_ = tools::SearchIndex::Open(dir_, true, problem, error);
+    ASSERT_TRUE(index_) << error;
+    EXPECT_EQ(indexes(""), 6);
 }
 
 TEST(SearchQueryErrors, ABadQueryNamesItsBadPart) {

@@ -35,6 +35,13 @@ const char kSchema[] =
     // The fields again as typed columns, for filters, ranges, sorting and facets.
     " title TEXT, author TEXT, artist TEXT, album TEXT, genre TEXT, year INTEGER, pages INTEGER, duration INTEGER,"
     " taken TEXT, camera TEXT);"
+    // The columns filters compare with an order: a filter that keeps few files reads only those.
+    "CREATE INDEX IF NOT EXISTS files_type ON files(type);"
+    "CREATE INDEX IF NOT EXISTS files_size ON files(size);"
+    "CREATE INDEX IF NOT EXISTS files_mtime ON files(mtime);"
+    "CREATE INDEX IF NOT EXISTS files_year ON files(year);"
+    "CREATE INDEX IF NOT EXISTS files_duration ON files(duration);"
+    "CREATE INDEX IF NOT EXISTS files_taken ON files(taken);"
     "CREATE VIRTUAL TABLE IF NOT EXISTS search USING fts5(name, path, body,"
     " tokenize = 'unicode61 remove_diacritics 2', prefix = '2 3');";
 
@@ -193,6 +200,16 @@ const SchemaRows& OurSchema() {
     return schema;
 }
 
+// The rows less the indexes of ours among them: an index that is missing (made before it was
+// ours, or dropped) costs speed only, and the daemon's next open makes it again.
+SchemaRows WithoutOurIndexes(SchemaRows rows) {
+    const SchemaRows& ours = OurSchema();
+    rows.erase(std::remove_if(rows.begin(), rows.end(),
+                              [&ours](const auto& row) { return std::get<0>(row) == "index" && std::binary_search(ours.begin(), ours.end(), row); }),
+               rows.end());
+    return rows;
+}
+
 IndexProblem ProblemOf(int rc) {
     switch (rc & 0xff) {
         case SQLITE_CORRUPT:
@@ -274,7 +291,9 @@ std::string From(const SearchQuery& query) {
     std::string where;
     int next = 4;
     for (const char c : query.where) where += c == '?' ? "?" + std::to_string(next++) : std::string(1, c);
-    return std::string(query.match.empty() ? " FROM files f WHERE" : " FROM search JOIN files f ON f.id = search.rowid WHERE"
+    // With words, the words' matches lead: CROSS JOIN keeps SQLite from looking each file of a
+    // filter's index up in the text index instead.
+    return std::string(query.match.empty() ? " FROM files f WHERE" : " FROM search CROSS JOIN files f ON f.id = search.rowid WHERE"
                                                                      " search MATCH ?1 AND") +
            " (?2 = '' OR f.type = ?2) AND (" + where + ")";
 }
@@ -342,16 +361,19 @@ std::unique_ptr<SearchIndex> SearchIndex::Open(const std::string& shareDir, bool
     sqlite3_busy_timeout(db, 1000);
     index->SetDeadline(std::chrono::steady_clock::now() + kOpenBudget);
     const bool made = index->Exec(kInMemoryTemp) && (!create || (index->Exec(kPragmas) && index->Exec(kSchema)));
+    // A statement of the schema that fails outright met an object of its name that is not ours
+    // (a view where a table belongs, a table without the column to index).
+    const bool clash = !made && sqlite3_errcode(db) == SQLITE_ERROR;
     bool listed = false;
-    const bool ours = made && SchemaOf(db, listed) == OurSchema();
+    const bool ours = made && WithoutOurIndexes(SchemaOf(db, listed)) == WithoutOurIndexes(OurSchema());
     struct stat after{};
     const bool same = IndexFileStat(real, create, after, acceptable) && acceptable &&
                       (!existed || (after.st_dev == before.st_dev && after.st_ino == before.st_ino));
     if (!ours || !same) {
-        problem = !made || !listed ? (index->problem_ == IndexProblem::None ? ProblemOf(sqlite3_extended_errcode(db))
-                                                                            : index->problem_)
-                                   : IndexProblem::Damaged;
-        error = !made || !listed ? sqlite3_errmsg(db) : "the index's schema is not this service's";
+        const bool failed = (!made || !listed) && !clash;
+        problem = failed ? (index->problem_ == IndexProblem::None ? ProblemOf(sqlite3_extended_errcode(db)) : index->problem_)
+                         : IndexProblem::Damaged;
+        error = failed ? sqlite3_errmsg(db) : "the index's schema is not this service's";
         return nullptr;
     }
     index->dev_ = after.st_dev;
@@ -532,11 +554,16 @@ bool SearchIndex::Search(const std::string& query, const std::string& type, int 
     SearchQuery parsed;
     if (!ParseSearchQuery(query, parsed, error)) return false;
     const bool words = !parsed.match.empty();
-    const std::string order = sort == "date" ? "f.mtime DESC, f.path" : sort == "name" ? "f.name, f.path" : words ? "rank, f.path" : "f.path";
-    Statement rows(db_, std::string("SELECT f.path, f.type, f.size, f.mtime, ") +
-                            (words ? "bm25(search, 10.0, 2.0, 1.0) AS rank, snippet(search, -1, char(2), char(3), '…', 12)"
-                                   : "0 AS rank, ''") +
-                            ", f.fields" + From(parsed) + " ORDER BY " + order + " LIMIT ?3");
+    // "+" keeps SQLite from walking a whole index in the order asked for: the hits are few, or
+    // sorting them costs less than that walk.
+    const std::string order = sort == "date" ? "+f.mtime DESC, +f.path" : sort == "name" ? "+f.name, +f.path" : words ? "rank, +f.path" : "+f.path";
+    // With words, the best hits are chosen first and only theirs get a snippet.
+    const std::string sql =
+        words ? "WITH top AS (SELECT f.id AS id, bm25(search, 10.0, 2.0, 1.0) AS rank" + From(parsed) + " ORDER BY " + order +
+                    " LIMIT ?3) SELECT f.path, f.type, f.size, f.mtime, top.rank AS rank, snippet(search, -1, char(2), char(3), '…', 12),"
+                    " f.fields FROM top JOIN search ON search.rowid = top.id JOIN files f ON f.id = top.id WHERE search MATCH ?1 ORDER BY " + order
+              : "SELECT f.path, f.type, f.size, f.mtime, 0, '', f.fields" + From(parsed) + " ORDER BY " + order + " LIMIT ?3";
+    Statement rows(db_, sql);
     if (rows.Ok()) {
         BindQuery(rows, parsed, type).Bind(3, static_cast<long long>(limit));
         while (rows.Step()) {
