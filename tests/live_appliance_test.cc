@@ -243,7 +243,7 @@ TEST_F(LiveApplianceTest, AnOverflowLeadsToReindexRecordsAndACompleteIndexAgain)
 TEST_F(LiveApplianceTest, WhatFilesHoldIsFoundAndADamagedFileCostsOnlyItsContent) {
     testkit::WriteMp3(music_ + "/a/track01", "So What", "Miles Davis", "Kind of Blue", 1959);
     testkit::WriteFile(music_ + "/a/report.txt", testkit::MakePdf("Quarterly", "Ann", "Revenue grew in the third quarter"));
-    testkit::WriteJpeg(music_ + "/a/IMG_0001", "2019:06:14 10:20:30", "FUJIFILM", "X-T3");
+    testkit::WriteJpeg(music_ + "/a/IMG_0001.mp3", "2019:06:14 10:20:30", "FUJIFILM", "X-T3");  // its content decides
     testkit::WriteFile(music_ + "/a/broken.pdf", testkit::MakePdf("T", "A", "never read").substr(0, 40));
     testkit::WriteFile(music_ + "/a/endless.pdf", testkit::MakeEndlessPdf());
     testkit::WriteFile(music_ + "/a/exif.jpg", testkit::MakeJpegWithHugeExif());
@@ -251,7 +251,7 @@ TEST_F(LiveApplianceTest, WhatFilesHoldIsFoundAndADamagedFileCostsOnlyItsContent
     Index("/music/a", R"("document": true, "audio": true, "photo": true, "video": true)");
     EXPECT_TRUE(Finds("davis kind", Paths{"/music/a/track01"}));
     EXPECT_TRUE(Finds("revenue third quarter", Paths{"/music/a/report.txt"}));
-    EXPECT_TRUE(Finds("fujifilm", Paths{"/music/a/IMG_0001"}));
+    EXPECT_TRUE(Finds("fujifilm", Paths{"/music/a/IMG_0001.mp3"}));
     EXPECT_TRUE(Finds("broken", Paths{"/music/a/broken.pdf"}));
     for (const std::string problem : {"broken.pdf: indexed by name only: the PDF cannot be read",
                                       "endless.pdf: indexed by name only: the extractor ran past its CPU time limit",
@@ -262,7 +262,7 @@ TEST_F(LiveApplianceTest, WhatFilesHoldIsFoundAndADamagedFileCostsOnlyItsContent
     EXPECT_EQ(Search({"exif", "type:photo"}), Paths{"/music/a/exif.jpg"});
     EXPECT_EQ(Search({"davis", "--type", "audio"}), Paths{"/music/a/track01"});
     // Filters, the fields of each kind, and the counts per type and camera.
-    EXPECT_EQ(Search({"taken:2019-06", "camera:fuji"}), Paths{"/music/a/IMG_0001"});
+    EXPECT_EQ(Search({"taken:2019-06", "camera:fuji", "type:photo"}), Paths{"/music/a/IMG_0001.mp3"});
     EXPECT_EQ(Search({"artist:davis", "year:1959"}), Paths{"/music/a/track01"});
     EXPECT_EQ(Search({"beach", "duration:2..3"}), Paths{"/music/a/clip.bin"});
     const std::string text = testkit::Run({FILEINDEXCTL, "search", "type:audio", "--facets"}).out;
@@ -274,6 +274,9 @@ TEST_F(LiveApplianceTest, WhatFilesHoldIsFoundAndADamagedFileCostsOnlyItsContent
     EXPECT_EQ(song["file"]["type"], "audio");
     EXPECT_EQ(song["file"]["fields"]["artist"], "Miles Davis");
     EXPECT_TRUE(song["file"]["extraction_problem"].isNull());
+    EXPECT_NE(testkit::Run({FILEINDEXCTL, "explain", "/music/a/track01"}).out.find(
+                  "\nread from it: album Kind of Blue, artist Miles Davis, duration 1, title So What, year 1959\n"),
+              std::string::npos);
     const std::string broken = testkit::Run({FILEINDEXCTL, "explain", "/music/a/broken.pdf"}).out;
     EXPECT_NE(broken.find("in the index: yes\nindexed by name only: the PDF cannot be read\n"), std::string::npos) << broken;
     const auto bad = testkit::Run({FILEINDEXCTL, "search", "year:19x9"});
@@ -293,6 +296,13 @@ TEST_F(LiveApplianceTest, SearchFindsPrefixesWithoutAccentsBestFirst) {
     testkit::WriteFile(music_ + "/a/journal.txt", "a week in crete");
     testkit::WriteFile(music_ + "/a/crete.mp3", "");
     testkit::WriteFile(photo_ + "/a/crete.jpg", "");
+    // Distinct times, the newest in the other share: the order by date runs across the shares.
+    time_t when = 1600000000;
+    for (const std::string& file : {music_ + "/a/crete.mp3", music_ + "/a/Crète.txt", music_ + "/a/journal.txt", photo_ + "/a/crete.jpg"}) {
+        const timespec times[2] = {{when, 0}, {when, 0}};
+        ASSERT_EQ(utimensat(AT_FDCWD, file.c_str(), times, 0), 0);
+        when += 100;
+    }
     Index("/music/a", R"("document": true, "audio": true)");
     Index("/photo/a", R"("photo": true)");
     ASSERT_TRUE(testkit::WaitFor([&] { return Search({"CRE"}).size() == 4; }));
@@ -307,6 +317,8 @@ TEST_F(LiveApplianceTest, SearchFindsPrefixesWithoutAccentsBestFirst) {
     EXPECT_EQ(Search({"cret", "--type", "document"}), (Paths{"/music/a/Crète.txt", "/music/a/journal.txt"}));
     EXPECT_EQ(Search({"cret", "--share", "photo"}), Paths{"/photo/a/crete.jpg"});
     EXPECT_EQ(Search({"week", "cre"}), Paths{"/music/a/journal.txt"});
+    const Paths newestFirst = {"/photo/a/crete.jpg", "/music/a/journal.txt", "/music/a/Crète.txt", "/music/a/crete.mp3"};
+    EXPECT_EQ(Search({"cre", "--sort", "date"}), newestFirst);
     const auto text = testkit::Run({FILEINDEXCTL, "search", "week"});
     EXPECT_NE(text.out.find("/music/a/journal.txt  document  15"), std::string::npos) << text.out;
     EXPECT_NE(text.out.find("a [week] in crete\n(1 found)"), std::string::npos) << text.out;
@@ -326,6 +338,11 @@ TEST_F(LiveApplianceTest, SearchFindsPrefixesWithoutAccentsBestFirst) {
     EXPECT_EQ(hit["snippet"], J(R"([{"text": "a ", "match": false}, {"text": "week", "match": true},
                                     {"text": " in crete", "match": false}])"));
     EXPECT_EQ(client.Get("/api/search?q=", token)->status, 400);
+    EXPECT_EQ(client.Get("/api/search?q=cre&sort=size", token)->status, 400);
+    const Json::Value dated = testkit::ParseJson(client.Get("/api/search?q=cre&sort=date", token)->body)["result"]["hits"];
+    Paths byDate;
+    for (const auto& hit : dated) byDate.push_back(hit["path"].asString());
+    EXPECT_EQ(byDate, newestFirst);
     EXPECT_EQ(client.Get("/api/search?q=crete&share=nosuch", token)->status, 404);
     for (int i = 0; i < 201; ++i) testkit::WriteFile(photo_ + "/a/many" + std::to_string(i) + ".jpg", "");
     ASSERT_TRUE(testkit::WaitFor([&] { return Search({"many", "--limit", "1000"}).size() == 201; }));

@@ -64,6 +64,7 @@ TEST_F(SearchQueryTest, EachFilterKeepsToItsBoundsOnBothSides) {
         {"album:blue", {"song1.mp3", "song2.flac"}},
         {"blue type:audio year:1959", {"song1.mp3"}},
         {"year:1958..1959", {"song1.mp3", "song2.flac"}},
+        {"year:1958..1958", {"song2.flac"}},
         {"year:>1958", {"song1.mp3"}},
         {"year:<1959", {"song2.flac"}},
         {"duration:1h", {"song2.flac"}},
