@@ -213,6 +213,8 @@ IndexedTree& IndexTree() {
     const std::string dir = tree.appliance.share() + "/tree";
     bench::MakeApplianceTree(dir, tree.counts);
     std::filesystem::create_directories(tree.recollConf);
+    // recollindex runs its filters by name: Debian's python3 and perl, which have the modules.
+    setenv("PATH", ("/usr/bin:/bin:" + std::string(std::getenv("PATH") ? std::getenv("PATH") : "")).c_str(), 1);
     WriteFile(tree.recollConf + "/recoll.conf", "topdirs = " + dir + "\nloglevel = 1\n");
     const auto recollStart = Clock::now();
     if (Finished(Start({"/usr/bin/recollindex", "-c", tree.recollConf}, tree.recollConf + "/recollindex.log"), &tree.recollPeakMiB)) {
