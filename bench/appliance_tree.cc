@@ -53,8 +53,9 @@ void MakeDocuments(const std::string& dir, size_t count, std::mt19937& random) {
 
 void MakePhotos(const std::string& dir, size_t count) {
     for (size_t i = 0; i < count; ++i) {
-        const unsigned year = 2015 + static_cast<unsigned>(i % 10);
-        const unsigned month = 1 + static_cast<unsigned>(i / 10 % 12);
+        // Every camera in every year and month.
+        const unsigned year = 2015 + static_cast<unsigned>(i / 5 % 10);
+        const unsigned month = 1 + static_cast<unsigned>(i / 50 % 12);
         const std::string folder = Dir(dir + "/Photos/" + std::to_string(year) + "/" + Padded(month, 2));
         const auto& [make, model] = kCameras[i % kCameras.size()];
         const std::string taken = std::to_string(year) + ":" + Padded(month, 2) + ":" + Padded(1 + i % 28, 2) + " 12:00:00";
@@ -68,7 +69,8 @@ void MakeSongs(const std::string& dir, size_t count, std::mt19937& random) {
         const std::string album = "Album " + std::to_string(i / kArtists.size() % 40);
         const std::string folder = Dir(dir + "/Music/" + artist + "/" + album);
         const std::string title = Words(random, 2);
-        testkit::WriteMp3(folder + "/" + Padded(i, 5) + " " + title + ".mp3", title, artist, album, 1955 + static_cast<unsigned>(i % 60));
+        const unsigned year = 1955 + static_cast<unsigned>(i / kArtists.size() % 60);  // every artist in every year
+        testkit::WriteMp3(folder + "/" + Padded(i, 5) + " " + title + ".mp3", title, artist, album, year);
     }
 }
 

@@ -456,6 +456,19 @@ std::string CameraOf(const Json::Value& fields) {
     return make.empty() || model.empty() ? make + model : make + " " + model;
 }
 
+// The fields whose words a search finds as it finds the text's (and a filter on a text field
+// looks for first).
+const char* const kSearchedFields[] = {"title", "author", "artist", "album", "album_artist", "genre", "camera_make", "camera_model", "lens"};
+
+// The text searched for a file: its own and its text fields'.
+std::string SearchedText(const IndexedFile& file, const Json::Value& fields) {
+    std::string text = file.text;
+    for (const char* field : kSearchedFields) {
+        if (fields[field].isString()) text += "\n" + fields[field].asString();
+    }
+    return text;
+}
+
 // The columns a file's fields fill, each from the field of its name.
 const char* const kFieldColumns[] = {"title", "author", "artist", "album", "genre", "year", "pages", "duration", "taken"};
 
@@ -489,7 +502,7 @@ bool SearchIndex::Put(const IndexedFile& file) {
     Statement drop(db_, "DELETE FROM search WHERE rowid = ?1");
     Statement add(db_, "INSERT INTO search(rowid, name, path, body) VALUES(?1, ?2, ?3, ?4)");
     return (drop.Ok() && add.Ok() && drop.Bind(1, id).Run() &&
-            add.Bind(1, id).Bind(2, NameOf(file.path)).Bind(3, file.path).Bind(4, file.text).Run()) ||
+            add.Bind(1, id).Bind(2, NameOf(file.path)).Bind(3, file.path).Bind(4, SearchedText(file, fields)).Run()) ||
            Check(SQLITE_ERROR);
 }
 

@@ -32,7 +32,7 @@ struct IndexedFile {
     std::string type;  // "document", "audio", "video" or "photo"
     long long size = 0;
     long long mtime = 0;
-    std::string text;  // the text of a plain-text document, valid UTF-8; empty otherwise
+    std::string text;  // the text read from the file, valid UTF-8; empty when none
     std::string problem;  // why its content could not be read (indexed by name only); "" when none
     Json::Value fields = Json::Value(Json::objectValue);  // what was read besides the text
 };
@@ -98,6 +98,9 @@ public:
     bool Begin();
     bool Commit();
     void Rollback();
+    // Adds or replaces `file`. Its text is searched with the words of its text fields (title,
+    // author, artist, album, album artist, genre, camera make and model, lens), which a filter on
+    // such a field relies on.
     bool Put(const IndexedFile& file);
     // Removes `path` and everything beneath it.
     bool Remove(const std::string& path);

@@ -203,7 +203,13 @@ public:
         for (size_t at = 0; at < value.size();) {
             const size_t space = value.find(' ', at);
             const std::string word = value.substr(at, space == std::string::npos ? std::string::npos : space - at);
-            if (!word.empty()) Add("(' ' || lower(coalesce(" + column + ", '')) || ' ') LIKE ? ESCAPE '\\'", {LikeWord(word)});
+            if (!word.empty()) {
+                // The text index holds the words of the text fields too: it finds the few files
+                // the comparison needs to look at.
+                const std::string match = MatchExpression(word);
+                if (!match.empty()) Add("f.id IN (SELECT rowid FROM search WHERE search MATCH ?)", {match});
+                Add("(' ' || lower(coalesce(" + column + ", '')) || ' ') LIKE ? ESCAPE '\\'", {LikeWord(word)});
+            }
             at = space == std::string::npos ? value.size() : space + 1;
         }
     }

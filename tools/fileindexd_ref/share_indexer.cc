@@ -26,9 +26,6 @@ constexpr unsigned kCreated = 1;
 constexpr unsigned kWritten = 2;
 constexpr unsigned kMoved = 256;
 constexpr unsigned kReindex = 0x10000;
-// The fields whose words a search finds as it finds the text's.
-const char* const kSearchedFields[] = {"title", "author", "artist", "album", "album_artist", "genre",
-                                       "camera_make", "camera_model", "lens"};
 // How long one batch may take in the index before it is given up.
 constexpr std::chrono::seconds kBatchBudget{30};
 constexpr int kDirFlags = O_RDONLY | O_DIRECTORY;
@@ -246,7 +243,7 @@ extractor::Reply ShareIndexer::Extract(int dirFd, const std::string& name, const
 }
 
 // A file is indexed as the kind its content tells (its name's when the content tells none), with
-// its text and fields; the words of its text fields are searched with its text. Unchanged files
+// its text and fields. Unchanged files
 // in the index are not read again, so that a file that failed is not retried until it changes.
 void ShareIndexer::IndexFile(int dirFd, const std::string& name, const std::string& fullPath, const struct stat& st,
                              const Json::Value& governing, bool force, const Stored& stored, std::set<std::string>& seen) {
@@ -260,12 +257,7 @@ void ShareIndexer::IndexFile(int dirFd, const std::string& name, const std::stri
     const std::string type = reply.type.empty() ? tools::FileTypeOf(name) : reply.type;
     if (type.empty() || !governing.get(type, false).asBool()) return;  // unseen: removed when stored
     seen.insert(sharePath);
-    std::string text = std::move(reply.text);
-    const Json::Value& fields = reply.fields;
-    for (const char* field : kSearchedFields) {
-        if (fields[field].isString()) text += "\n" + fields[field].asString();
-    }
-    index_->Put({sharePath, type, st.st_size, st.st_mtime, std::move(text), std::move(reply.problem), reply.fields});
+    index_->Put({sharePath, type, st.st_size, st.st_mtime, std::move(reply.text), std::move(reply.problem), reply.fields});
 }
 
 }  // namespace fileindexd_ref
