@@ -220,6 +220,7 @@ IndexedTree& IndexTree() {
     if (Finished(Start({"/usr/bin/recollindex", "-c", tree.recollConf}, tree.recollConf + "/recollindex.log"), &tree.recollPeakMiB)) {
         tree.recollSeconds = Since(recollStart);
     }
+    sync();  // recollindex's database written out, not while the daemon runs
     const auto start = Clock::now();
     tree.appliance.Index("/music/tree");
     while (tree.appliance.Index().Count() < static_cast<long long>(tree.counts.Total())) {

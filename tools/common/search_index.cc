@@ -592,8 +592,10 @@ bool SearchIndex::Search(const std::string& query, const std::string& type, int 
 bool SearchIndex::CountHits(const std::string& query, const std::string& type, long long& count, std::string& error) {
     SearchQuery parsed;
     if (!ParseSearchQuery(query, parsed, error)) return false;
-    Statement counted(db_, "SELECT count(*)" + From(parsed));
-    if (counted.Ok() && BindQuery(counted, parsed, type).Step()) {
+    // Words alone are counted in the text index: each of its rows is a file's.
+    const bool wordsAlone = !parsed.match.empty() && parsed.where == "1" && type.empty();
+    Statement counted(db_, wordsAlone ? std::string("SELECT count(*) FROM search WHERE search MATCH ?1") : "SELECT count(*)" + From(parsed));
+    if (counted.Ok() && (wordsAlone ? counted.Bind(1, parsed.match) : BindQuery(counted, parsed, type)).Step()) {
         count = counted.Number(0);
         return true;
     }

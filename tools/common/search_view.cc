@@ -102,8 +102,11 @@ bool SearchOne(const SearchRequest& request, const SearchTarget& target, std::ve
     const auto index = OpenShareIndex(target.share, target.shareDir, kSearchBudget, problem, cause);
     if (!index) return false;
     std::string error;
-    if (index->Search(request.query, request.type, request.offset + request.limit, hits, error, request.sort) &&
-        index->CountHits(request.query, request.type, total, error) &&
+    const int wanted = request.offset + request.limit;
+    // Fewer hits than asked for are all there are: no need to count them.
+    if (index->Search(request.query, request.type, wanted, hits, error, request.sort) &&
+        (hits.size() < static_cast<size_t>(wanted) ? (total = static_cast<long long>(hits.size()), true)
+                                                    : index->CountHits(request.query, request.type, total, error)) &&
         (!request.facets || index->Facets(request.query, request.type, facets, error))) {
         return true;
     }
