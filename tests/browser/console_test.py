@@ -80,6 +80,18 @@ class ConsoleTest(unittest.TestCase):
 
         self.wait.until(clicked)
 
+    def search_until(self, words, path):
+        """Searches again until the hits hold `path`: the daemon indexes it meanwhile."""
+        query = self.browser.find_element(By.ID, "search-query")
+        for _ in range(100):
+            query.clear()
+            query.send_keys(words)
+            self.click("#search-form button")
+            self.wait_text("message", "Search for " + words + ": done.")
+            if path in self.text("search-hits"):
+                return
+        self.fail(path + " never found by " + words)
+
     def text(self, element_id):
         return self.browser.find_element(By.ID, element_id).text
 
@@ -212,14 +224,7 @@ class ConsoleTest(unittest.TestCase):
             notes.write("An old manuscript from Crète")
         ctl("reindex", "/music/f03")
         query = b.find_element(By.ID, "search-query")
-        for _ in range(100):
-            query.clear()
-            query.send_keys("manus cret")
-            self.click("#search-form button")
-            self.wait_text("message", "Search for manus cret: done.")
-            if "/music/f03/notes.txt" in self.text("search-hits"):
-                break
-        self.assertIn("/music/f03/notes.txt", self.text("search-hits"))
+        self.search_until("manus cret", "/music/f03/notes.txt")
         marks = [m.text for m in b.find_elements(By.CSS_SELECTOR, "#search-hits mark")]
         self.assertEqual(marks, ["manuscript", "Crète"])
         self.assertEqual(self.text("search-total"), "1 found.")
@@ -230,13 +235,7 @@ class ConsoleTest(unittest.TestCase):
         # A song, typed by its content, shows what it is about; its artist's chip keeps to it.
         write_song(os.path.join(os.environ["QIRA_ROOT"], "volume1/music/f03/track01"), "So What", "Miles Davis", "Kind of Blue", 1959)
         ctl("folder", "set", "/music/f03", "--document", "--audio")
-        for _ in range(100):
-            query.clear()
-            query.send_keys("artist:davis")
-            self.click("#search-form button")
-            self.wait_text("message", "Search for artist:davis: done.")
-            if "/music/f03/track01" in self.text("search-hits"):
-                break
+        self.search_until("artist:davis", "/music/f03/track01")
         self.assertIn("So What, Miles Davis, Kind of Blue, 1959, 0:01", self.text("search-hits"))
         self.click('#search-facets button[aria-label="Only artist Miles Davis, 1 found"]')
         self.wait.until(lambda _: query.get_attribute("value") == 'artist:davis artist:"Miles Davis"')
