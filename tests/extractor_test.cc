@@ -69,6 +69,8 @@ TEST_F(ExtractorTest, EachKindGivesItsTextAndFields) {
          R"({"title": "So What", "artist": "Miles Davis", "album": "Kind of Blue", "year": 1959, "duration": 1})"},
         {"IMG_0001", testkit::ReadFile(photo), "photo", "",
          R"({"taken": "2019-06-14 10:20:30", "camera_make": "FUJIFILM", "camera_model": "X-T3", "width": 1, "height": 1})"},
+        {"quirk.jpg", testkit::MakeJpegWithExif(0, 0xFFFFFF00), "photo", "",  // a damaged part beside what was read
+         R"({"taken": "2020-02-29 23:59:59", "width": 1, "height": 1})"},
         {"IMG_0002", testkit::MakeHeic("2021:12:24 18:00:00", "Apple", "iPhone 12", 4032, 3024), "photo", "",
          R"({"taken": "2021-12-24 18:00:00", "camera_make": "Apple", "camera_model": "iPhone 12", "width": 4032, "height": 3024})"},
         {"clip.txt", testkit::ReadFile(video), "video", "",

@@ -118,20 +118,19 @@ std::string MakeEndlessPdf() {
     return PdfOf(objects);
 }
 
-std::string MakeJpegWithHugeExif() {
+std::string MakeJpegWithExif(uint32_t comments, uint32_t nextDirectory) {
     const auto le = [](uint32_t value, int bytes) {
         std::string out;
         for (int i = 0; i < bytes; ++i) out += static_cast<char>(value >> (8 * i) & 0xFF);
         return out;
     };
-    // A little-endian TIFF header and one IFD of 5,000 user comments, each claiming 4 GiB at an
-    // offset inside the block, then the date (DateTime): most of a segment's 64 KiB.
-    constexpr uint32_t kComments = 5000;
+    // A little-endian TIFF header and one IFD: the user comments, each claiming 4 GiB at an
+    // offset inside the block, then the date (DateTime), then the next IFD's offset.
     const std::string taken = std::string("2020:02:29 23:59:59") + '\0';
-    std::string tiff = std::string("II*\0\x08\0\0\0", 8) + le(kComments + 1, 2);
-    for (uint32_t i = 0; i < kComments; ++i) tiff += le(0x9286, 2) + le(7, 2) + le(0xFFFFFFFF, 4) + le(8, 4);
+    std::string tiff = std::string("II*\0\x08\0\0\0", 8) + le(comments + 1, 2);
+    for (uint32_t i = 0; i < comments; ++i) tiff += le(0x9286, 2) + le(7, 2) + le(0xFFFFFFFF, 4) + le(8, 4);
     const uint32_t takenAt = static_cast<uint32_t>(tiff.size()) + 12 + 4;
-    tiff += le(0x0132, 2) + le(2, 2) + le(static_cast<uint32_t>(taken.size()), 4) + le(takenAt, 4) + le(0, 4) + taken;
+    tiff += le(0x0132, 2) + le(2, 2) + le(static_cast<uint32_t>(taken.size()), 4) + le(takenAt, 4) + le(nextDirectory, 4) + taken;
     const std::string exif = "Exif" + std::string(2, '\0') + tiff;
     const size_t length = exif.size() + 2;  // big-endian, counting itself
     const std::string segment = "\xFF\xE1" + std::string(1, static_cast<char>(length >> 8)) + std::string(1, static_cast<char>(length & 0xFF)) + exif;

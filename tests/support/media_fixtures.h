@@ -2,6 +2,7 @@
 // that every test knows exactly what they hold.
 #pragma once
 
+#include <cstdint>
 #include <string>
 
 namespace testkit {
@@ -14,9 +15,10 @@ std::string MakePdf(const std::string& title, const std::string& author, const s
 // billion drawings for whoever reads its text.
 std::string MakeEndlessPdf();
 
-// A JPEG whose EXIF segment (most of its 64 KiB) lists 5,000 entries, each claiming 4 GiB of data,
-// and then the date it was taken, 2020:02:29 23:59:59.
-std::string MakeJpegWithHugeExif();
+// A JPEG whose EXIF lists `comments` entries, each claiming 4 GiB of data (5,000 fill most of
+// the segment's 64 KiB), then the date, 2020:02:29 23:59:59, then `nextDirectory` as the offset
+// of a next directory (0 for none).
+std::string MakeJpegWithExif(uint32_t comments, uint32_t nextDirectory);
 
 // A docx or an odt (`odt`) whose body is `text` and whose properties hold `title` and `author`.
 std::string MakeOfficeDocument(bool odt, const std::string& title, const std::string& author, const std::string& text);

@@ -65,9 +65,9 @@ void ReadPhoto(const std::string& bytes, Reply& reply) {
     try {
         const auto image = Exiv2::ImageFactory::open(reinterpret_cast<const Exiv2::byte*>(bytes.data()), static_cast<long>(bytes.size()));
         image->readMetadata();
-        // What exiv2 skipped as damaged (a directory of too many entries, an offset out of
-        // bounds) makes the rest untrustworthy too.
-        if (g_metadataDamaged) throw std::runtime_error("damaged");
+        // Metadata exiv2 found damaged and skipped whole (a directory of too many entries) is
+        // a reason to give; a damaged part beside what was read (a maker's note) is not.
+        if (g_metadataDamaged && image->exifData().empty()) throw std::runtime_error("damaged");
         if (image->pixelWidth() > 0) reply.fields["width"] = image->pixelWidth();
         if (image->pixelHeight() > 0) reply.fields["height"] = image->pixelHeight();
         const Exiv2::ExifData& exif = image->exifData();
