@@ -73,7 +73,8 @@ public:
     void Serve(int intervalMs) {
         auto nextDrain = std::chrono::steady_clock::now() + std::chrono::milliseconds(intervalMs);
         while (!g_stop) {
-            const auto wait = std::chrono::duration_cast<std::chrono::milliseconds>(nextDrain - std::chrono::steady_clock::now());
+            // Rounded up: a wait cut to 0 ms would spin through the last millisecond.
+            const auto wait = std::chrono::ceil<std::chrono::milliseconds>(nextDrain - std::chrono::steady_clock::now());
             pollfd pfd{listener_, POLLIN, 0};
             if (poll(&pfd, 1, std::max<int>(0, static_cast<int>(wait.count()))) > 0) Accept();
             if (std::chrono::steady_clock::now() < nextDrain) continue;
