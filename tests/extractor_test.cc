@@ -54,6 +54,8 @@ TEST_F(ExtractorTest, KindAndTextComeFromTheContent) {
 TEST_F(ExtractorTest, EachKindGivesItsTextAndFields) {
     const std::string song = Path("/song"), photo = Path("/photo");
     testkit::WriteMp3(song, "So What", "Miles Davis", "Kind of Blue", 1959);
+    const std::string flac = Path("/flac");
+    testkit::WriteFlac(flac, "Naima", "John Coltrane", "Giant Steps", 1960, 261);
     testkit::WriteJpeg(photo, "2019:06:14 10:20:30", "FUJIFILM", "X-T3");
     const std::string video = Path("/video");
     testkit::WriteVideo(video, 3, "Beach");
@@ -67,6 +69,8 @@ TEST_F(ExtractorTest, EachKindGivesItsTextAndFields) {
          "Birds seen at dawn\n", R"({"title": "Field Notes", "author": "Eve"})"},
         {"track.txt", testkit::ReadFile(song), "audio", "",
          R"({"title": "So What", "artist": "Miles Davis", "album": "Kind of Blue", "year": 1959, "duration": 1})"},
+        {"tune", testkit::ReadFile(flac), "audio", "",
+         R"({"title": "Naima", "artist": "John Coltrane", "album": "Giant Steps", "year": 1960, "duration": 261})"},
         {"IMG_0001", testkit::ReadFile(photo), "photo", "",
          R"({"taken": "2019-06-14 10:20:30", "camera_make": "FUJIFILM", "camera_model": "X-T3", "width": 1, "height": 1})"},
         {"quirk.jpg", testkit::MakeJpegWithExif(0, 0xFFFFFF00), "photo", "",  // a damaged part beside what was read

@@ -30,6 +30,11 @@ std::string MakeZipBomb();
 void WriteMp3(const std::string& path, const std::string& title, const std::string& artist, const std::string& album,
               unsigned year);
 
+// Writes a FLAC file that says it holds `seconds` of audio (it holds no frames), with these
+// Vorbis comments, to `path`.
+void WriteFlac(const std::string& path, const std::string& title, const std::string& artist, const std::string& album,
+               unsigned year, unsigned seconds);
+
 // Writes a 1 x 1 JPEG to `path` whose EXIF says when it was taken ("YYYY:MM:DD HH:MM:SS"), and the
 // camera's make and model.
 void WriteJpeg(const std::string& path, const std::string& taken, const std::string& make, const std::string& model);
