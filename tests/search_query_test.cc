@@ -41,6 +41,14 @@ protected:
         for (const auto& file : files) ASSERT_TRUE(index_->Put(file));
         ASSERT_TRUE(index_->Commit());
     }
+    // Runs `statements` on the index's file, the index closed.
+    void Sql(const std::string& statements) {
+        index_.reset();
+        sqlite3* db = nullptr;
+        ASSERT_EQ(sqlite3_open((dir_ + "/@eaDir/QIRA@.fileindexdb/index.sqlite").c_str(), &db), SQLITE_OK);
+        EXPECT_EQ(sqlite3_exec(db, statements.c_str(), nullptr, nullptr, nullptr), SQLITE_OK) << sqlite3_errmsg(db);
+        sqlite3_close(db);
+    }
     Paths Find(const std::string& query, const std::string& sort = "relevance", bool ordered = false) {
         std::vector<tools::SearchHit> hits;
         std::string error;
@@ -111,6 +119,18 @@ TEST_F(SearchQueryTest, HitsComeInTheOrderAskedAndFacetsCountThemAll) {
     ASSERT_TRUE(index_->Facets("capped", "", facets, error)) << error;
     EXPECT_EQ(facets["year"], testkit::ParseJson(R"({"1010": 2, "999": 1, "1000": 1, "1001": 1, "1002": 1, "1003": 1, "1004": 1,
         "1005": 1, "1006": 1, "1007": 1})"));
+    // Values first met once a facet counts kMaxFacetDistinct are left out, however common.
+    const std::string distinct = std::to_string(tools::kMaxFacetDistinct);
+    Sql("WITH RECURSIVE n(i) AS (SELECT 0 UNION ALL SELECT i + 1 FROM n WHERE i < " + distinct + " + 2)"
+        " INSERT INTO files(path, type, size, mtime, artist) SELECT '/t/' || i, 'audio', 1, 1, CASE WHEN i < " + distinct +
+        " - 1 THEN 'a' || i WHEN i < " + distinct + " + 1 THEN 'last' ELSE 'late' END FROM n;"
+        " INSERT INTO search(rowid, name, path, body) SELECT id, '', path, 'endless' FROM files WHERE path LIKE '/t/%';");
+    tools::IndexProblem problem;
+    index_ = tools::SearchIndex::Open(dir_, false, problem, error);
+    ASSERT_TRUE(index_) << error;
+    ASSERT_TRUE(index_->Facets("endless", "", facets, error)) << error;
+    EXPECT_EQ(facets["artist"]["last"], 2);
+    EXPECT_FALSE(facets["artist"].isMember("late"));
 }
 
 // An index without the indexes of its columns (made before they were, or dropped) is searched as

@@ -614,7 +614,12 @@ bool SearchIndex::Facets(const std::string& query, const std::string& type, Json
         BindQuery(rows, parsed, type);
         while (rows.Step()) {
             for (int kind = 0; kind < 4; ++kind) {
-                if (!rows.IsNull(kind)) ++counts[kind][{!rows.IsNumber(kind), rows.Number(kind), rows.Text(kind)}];
+                if (rows.IsNull(kind)) continue;
+                auto& count = counts[kind];
+                const FacetValue value{!rows.IsNumber(kind), rows.Number(kind), rows.Text(kind)};
+                const auto known = count.find(value);
+                if (known != count.end()) ++known->second;
+                else if (count.size() < kMaxFacetDistinct) count.emplace(value, 1);
             }
         }
     }

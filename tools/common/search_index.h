@@ -68,6 +68,9 @@ constexpr size_t kMaxQueryBytes = 1024;
 constexpr size_t kMaxQueryWords = 32;
 // Facets count at most this many values each, the commonest first.
 constexpr int kMaxFacetValues = 10;
+// A facet keeps counting at most this many distinct values: those first met later are not
+// counted, so that an index of endless distinct values costs a search bounded memory.
+constexpr size_t kMaxFacetDistinct = 10000;
 
 class SearchIndex {
 public:
