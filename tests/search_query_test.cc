@@ -70,6 +70,7 @@ TEST_F(SearchQueryTest, EachFilterKeepsToItsBoundsOnBothSides) {
         {"artist:avis", {}},  // a word's start, not its middle
         {"artist:\"miles davis\"", {"song1.mp3"}},
         {"album:blue", {"song1.mp3", "song2.flac"}},
+        {"artist:blue", {}},  // in the album and the text, not the artist
         {"blue type:audio year:1959", {"song1.mp3"}},
         {"year:1958..1959", {"song1.mp3", "song2.flac"}},
         {"year:1958..1958", {"song2.flac"}},
@@ -107,6 +108,11 @@ TEST_F(SearchQueryTest, HitsComeInTheOrderAskedAndFacetsCountThemAll) {
     ASSERT_TRUE(index_->Facets("blue", "", facets, error)) << error;
     EXPECT_EQ(facets, testkit::ParseJson(R"({"type": {"audio": 2}, "year": {"1958": 1, "1959": 1},
         "artist": {"John Coltrane": 1, "Miles Davis": 1}, "camera": {}})"));
+    long long count = -1;
+    for (const auto& [type, expected] : std::vector<std::pair<std::string, long long>>{{"", 2}, {"document", 2}, {"audio", 0}}) {
+        ASSERT_TRUE(index_->CountHits("invoice", type, count, error)) << error;
+        EXPECT_EQ(count, expected) << type;
+    }
     ASSERT_TRUE(index_->Facets("type:photo", "", facets, error)) << error;
     EXPECT_EQ(facets["camera"], testkit::ParseJson(R"({"FUJIFILM X-T3": 1, "Canon EOS R5": 1, "FUJIFILM X100V": 1})"));
     // Ten values at most: the commonest, then ties by value, numbers by their value before texts.
@@ -159,6 +165,10 @@ TEST_F(SearchQueryTest, AnIndexWithoutItsColumnIndexesIsStillOurs) {
     index_ = tools::SearchIndex::Open(dir_, true, problem, error);
     ASSERT_TRUE(index_) << error;
     EXPECT_EQ(indexes(""), 6);
+    // An index of one of our names is ours only as we make it.
+    Sql("DROP INDEX files_type; CREATE INDEX files_type ON files(size);");
+    EXPECT_FALSE(tools::SearchIndex::Open(dir_, false, problem, error));
+    EXPECT_EQ(problem, tools::IndexProblem::Damaged);
 }
 
 TEST(SearchQueryErrors, ABadQueryNamesItsBadPart) {
