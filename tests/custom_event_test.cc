@@ -1,9 +1,6 @@
 // Appending custom events to a share's queue; duplicates of a pending reindex; the fallback.
 #include "testkit.h"
 
-#include <poll.h>
-#include <sys/inotify.h>
-
 #include <algorithm>
 
 #include "pending_reindex.h"
@@ -59,15 +56,12 @@ TEST_F(CustomEventTest, AHeldQueueIsWaitedForAndGivenUpWhenHeldTooLong) {
     const auto holdQueue = [this] { return flock(open(QueueOf("s").c_str(), O_RDWR), LOCK_EX) == 0; };
     testkit::ChildHolding holder(holdQueue);
     ASSERT_TRUE(holder.Took());
-    const int watch = inotify_init1(IN_CLOEXEC);
-    ASSERT_GE(inotify_add_watch(watch, QueueOf("s").c_str(), IN_CLOSE_WRITE), 0);
+    testkit::OpenWatch watch({QueueOf("s")}, IN_CLOSE_WRITE);
     const pid_t appender = fork();
     if (appender == 0) _exit(IndexMgr::Reindex(J(R"(["/s/a"])")) ? 1 : 0);
     // An attempt that met the lock closes the queue again: release it then.
-    pollfd attempted{watch, POLLIN, 0};
-    ASSERT_EQ(poll(&attempted, 1, 60000), 1);
+    ASSERT_TRUE(testkit::WaitFor([&] { return !watch.Opened().empty(); }));
     holder.Release();
-    close(watch);
     int status = -1;
     ASSERT_EQ(waitpid(appender, &status, 0), appender);
     EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1);

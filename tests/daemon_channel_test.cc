@@ -1,8 +1,6 @@
 // Commands to fileindexd: frames on the wire and the chunked writer.
 #include "testkit.h"
 
-#include <sys/un.h>
-
 #include "daemon_channel.h"
 
 namespace {

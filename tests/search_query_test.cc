@@ -18,10 +18,7 @@ protected:
         Sandbox::SetUp();
         dir_ = Path("/share");
         MakeDir(dir_ + "/@eaDir/QIRA@.fileindexdb");
-        tools::IndexProblem problem;
-        std::string error;
-        index_ = tools::SearchIndex::Open(dir_, true, problem, error);
-        ASSERT_TRUE(index_) << error;
+        ASSERT_TRUE(Reopen(true)) << error_;
         const std::vector<tools::IndexedFile> files = {
             {"/s/song1.mp3", "audio", 3 * kMiB, kNewYear2026 - 1, "So What Miles Davis Kind of Blue", "",
              testkit::ParseJson(R"({"title": "So What", "artist": "Miles Davis", "album": "Kind of Blue", "year": 1959, "duration": 545})")},
@@ -41,13 +38,21 @@ protected:
         for (const auto& file : files) ASSERT_TRUE(index_->Put(file));
         ASSERT_TRUE(index_->Commit());
     }
-    // Runs `statements` on the index's file, the index closed.
-    void Sql(const std::string& statements) {
+    bool Reopen(bool create) {
+        index_ = tools::SearchIndex::Open(dir_, create, problem_, error_);
+        return index_ != nullptr;
+    }
+    // Runs `statements` on the index's file, the index closed: the first column of the last row
+    // they give, -1 when none.
+    int Sql(const std::string& statements) {
         index_.reset();
         sqlite3* db = nullptr;
-        ASSERT_EQ(sqlite3_open((dir_ + "/@eaDir/QIRA@.fileindexdb/index.sqlite").c_str(), &db), SQLITE_OK);
-        EXPECT_EQ(sqlite3_exec(db, statements.c_str(), nullptr, nullptr, nullptr), SQLITE_OK) << sqlite3_errmsg(db);
+        int last = -1;
+        EXPECT_EQ(sqlite3_open((dir_ + "/@eaDir/QIRA@.fileindexdb/index.sqlite").c_str(), &db), SQLITE_OK);
+        const auto keep = [](void* out, int, char** values, char**) { *static_cast<int*>(out) = values[0] ? atoi(values[0]) : -1; return 0; };
+        EXPECT_EQ(sqlite3_exec(db, statements.c_str(), keep, &last, nullptr), SQLITE_OK) << sqlite3_errmsg(db);
         sqlite3_close(db);
+        return last;
     }
     Paths Find(const std::string& query, const std::string& sort = "relevance", bool ordered = false) {
         std::vector<tools::SearchHit> hits;
@@ -60,6 +65,8 @@ protected:
     }
     std::string dir_;
     std::unique_ptr<tools::SearchIndex> index_;
+    tools::IndexProblem problem_;
+    std::string error_;
 };
 
 TEST_F(SearchQueryTest, EachFilterKeepsToItsBoundsOnBothSides) {
@@ -104,16 +111,15 @@ TEST_F(SearchQueryTest, HitsComeInTheOrderAskedAndFacetsCountThemAll) {
     EXPECT_EQ(Find("invoice", "name", true), (Paths{"invoice.pdf", "notes.txt"}));
     EXPECT_EQ(Find("type:photo", "relevance", true), (Paths{"IMG_1.jpg", "IMG_2.jpg", "IMG_3.jpg"}));
     Json::Value facets;
-    std::string error;
-    ASSERT_TRUE(index_->Facets("blue", "", facets, error)) << error;
+    ASSERT_TRUE(index_->Facets("blue", "", facets, error_)) << error_;
     EXPECT_EQ(facets, testkit::ParseJson(R"({"type": {"audio": 2}, "year": {"1958": 1, "1959": 1},
         "artist": {"John Coltrane": 1, "Miles Davis": 1}, "camera": {}})"));
     long long count = -1;
     for (const auto& [type, expected] : std::vector<std::pair<std::string, long long>>{{"", 2}, {"document", 2}, {"audio", 0}}) {
-        ASSERT_TRUE(index_->CountHits("invoice", type, count, error)) << error;
+        ASSERT_TRUE(index_->CountHits("invoice", type, count, error_)) << error_;
         EXPECT_EQ(count, expected) << type;
     }
-    ASSERT_TRUE(index_->Facets("type:photo", "", facets, error)) << error;
+    ASSERT_TRUE(index_->Facets("type:photo", "", facets, error_)) << error_;
     EXPECT_EQ(facets["camera"], testkit::ParseJson(R"({"FUJIFILM X-T3": 1, "Canon EOS R5": 1, "FUJIFILM X100V": 1})"));
     // Ten values at most: the commonest, then ties by value, numbers by their value before texts.
     ASSERT_TRUE(index_->Begin());
@@ -122,7 +128,7 @@ TEST_F(SearchQueryTest, HitsComeInTheOrderAskedAndFacetsCountThemAll) {
         ASSERT_TRUE(index_->Put({"/s/y" + std::to_string(n++), "audio", 1, 1, "capped", "", testkit::ParseJson(std::string("{\"year\": ") + year + "}")}));
     }
     ASSERT_TRUE(index_->Commit());
-    ASSERT_TRUE(index_->Facets("capped", "", facets, error)) << error;
+    ASSERT_TRUE(index_->Facets("capped", "", facets, error_)) << error_;
     EXPECT_EQ(facets["year"], testkit::ParseJson(R"({"1010": 2, "999": 1, "1000": 1, "1001": 1, "1002": 1, "1003": 1, "1004": 1,
         "1005": 1, "1006": 1, "1007": 1})"));
     // Values first met once a facet counts kMaxFacetDistinct are left out, however common.
@@ -131,10 +137,8 @@ TEST_F(SearchQueryTest, HitsComeInTheOrderAskedAndFacetsCountThemAll) {
         " INSERT INTO files(path, type, size, mtime, artist) SELECT '/t/' || i, 'audio', 1, 1, CASE WHEN i < " + distinct +
         " - 1 THEN 'a' || i WHEN i < " + distinct + " + 1 THEN 'last' ELSE 'late' END FROM n;"
         " INSERT INTO search(rowid, name, path, body) SELECT id, '', path, 'endless' FROM files WHERE path LIKE '/t/%';");
-    tools::IndexProblem problem;
-    index_ = tools::SearchIndex::Open(dir_, false, problem, error);
-    ASSERT_TRUE(index_) << error;
-    ASSERT_TRUE(index_->Facets("endless", "", facets, error)) << error;
+    ASSERT_TRUE(Reopen(false)) << error_;
+    ASSERT_TRUE(index_->Facets("endless", "", facets, error_)) << error_;
     EXPECT_EQ(facets["artist"]["last"], 2);
     EXPECT_FALSE(facets["artist"].isMember("late"));
 }
@@ -142,33 +146,16 @@ TEST_F(SearchQueryTest, HitsComeInTheOrderAskedAndFacetsCountThemAll) {
 // An index without the indexes of its columns (made before they were, or dropped) is searched as
 // it is, and the daemon's next open makes them again.
 TEST_F(SearchQueryTest, AnIndexWithoutItsColumnIndexesIsStillOurs) {
-    index_.reset();
-    const std::string file = dir_ + "/@eaDir/QIRA@.fileindexdb/index.sqlite";
-    const auto indexes = [&file](const char* change) {
-        sqlite3* db = nullptr;
-        sqlite3_open(file.c_str(), &db);
-        sqlite3_exec(db, change, nullptr, nullptr, nullptr);
-        sqlite3_stmt* count = nullptr;
-        sqlite3_prepare_v2(db, "SELECT count(*) FROM sqlite_schema WHERE name LIKE 'files_%'", -1, &count, nullptr);
-        sqlite3_step(count);
-        const int found = sqlite3_column_int(count, 0);
-        sqlite3_finalize(count);
-        sqlite3_close(db);
-        return found;
-    };
-    ASSERT_EQ(indexes("DROP INDEX files_type; DROP INDEX files_taken;"), 4);
-    tools::IndexProblem problem;
-    std::string error;
-    index_ = tools::SearchIndex::Open(dir_, false, problem, error);
-    ASSERT_TRUE(index_) << error;
+    const std::string count = " SELECT count(*) FROM sqlite_schema WHERE name LIKE 'files_%';";
+    ASSERT_EQ(Sql("DROP INDEX files_type; DROP INDEX files_taken;" + count), 4);
+    ASSERT_TRUE(Reopen(false)) << error_;
     EXPECT_EQ(Find("type:photo taken:2019-06..2019-08"), (Paths{"IMG_1.jpg", "IMG_2.jpg"}));
-    index_ = tools::SearchIndex::Open(dir_, true, problem, error);
-    ASSERT_TRUE(index_) << error;
-    EXPECT_EQ(indexes(""), 6);
+    ASSERT_TRUE(Reopen(true)) << error_;
+    EXPECT_EQ(Sql(count), 6);
     // An index of one of our names is ours only as we make it.
     Sql("DROP INDEX files_type; CREATE INDEX files_type ON files(size);");
-    EXPECT_FALSE(tools::SearchIndex::Open(dir_, false, problem, error));
-    EXPECT_EQ(problem, tools::IndexProblem::Damaged);
+    EXPECT_FALSE(Reopen(false));
+    EXPECT_EQ(problem_, tools::IndexProblem::Damaged);
 }
 
 TEST(SearchQueryErrors, ABadQueryNamesItsBadPart) {

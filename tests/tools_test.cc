@@ -1,9 +1,6 @@
 // The command-line tool's contract and the reference daemon stand-in working with the library.
 #include "testkit.h"
 
-#include <poll.h>
-#include <sys/inotify.h>
-
 #include "banner.h"
 #include "daemon_progress.h"
 #include "pending_rate.h"
@@ -217,18 +214,15 @@ TEST_F(ToolTest, ArgumentsTheLibraryWouldReadOtherwiseAreRefused) {
 TEST_F(ToolTest, HeldLockIsRetriedUntilItIsReleased) {
     testkit::ChildHolding holder([] { return Folders().Lock(true); });
     ASSERT_TRUE(holder.Took());
-    const int watch = inotify_init1(IN_CLOEXEC);
-    ASSERT_GE(inotify_add_watch(watch, Path("/tmp/fileidx_cfg_folder.lock").c_str(), IN_CLOSE_WRITE), 0);
+    testkit::OpenWatch watch({Path("/tmp/fileidx_cfg_folder.lock")}, IN_CLOSE_WRITE);
     const pid_t tool = testkit::Start({FILEINDEXCTL, "--lock-wait", "60", "folder", "add", "/music/a"}, Path("/ctl.log"));
     // A failed attempt closes the lock file: the tool has met the held lock, so release it.
-    pollfd ready{watch, POLLIN, 0};
-    ASSERT_EQ(poll(&ready, 1, 20000), 1);
+    ASSERT_TRUE(testkit::WaitFor([&] { return !watch.Opened().empty(); }));
     holder.Release();
     int status = -1;
     ASSERT_EQ(waitpid(tool, &status, 0), tool);
     EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0) << testkit::ReadFile(Path("/ctl.log"));
     EXPECT_TRUE(Conf().isMember("/music/a"));
-    close(watch);
 }
 
 // All three tools: usage errors exit 2 with the usage on stderr, --version exits 0.

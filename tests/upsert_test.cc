@@ -1,8 +1,6 @@
 // Folder upsert end to end: folder.conf, platform calls, registrations, frames and events.
 #include "testkit.h"
 
-#include <climits>
-
 namespace {
 
 class UpsertTest : public testkit::IndexFixture {

@@ -1,8 +1,6 @@
 // The console's JSON API over HTTP: a real fileindex-web process on a free loopback port.
 #include "testkit.h"
 
-#include <sys/stat.h>
-
 #include <atomic>
 #include <chrono>
 #include <thread>

@@ -29,6 +29,7 @@
 #include "fileindex/fileindex.h"
 #include "index_fixture.h"
 #include "log_capture.h"
+#include "open_watch.h"
 #include "process.h"
 #include "qira_sim/appliance.h"
 #include "sandbox.h"
