@@ -6,12 +6,6 @@ namespace {
 
 class ExplainTest : public testkit::IndexFixture {
 protected:
-    // "/d/d/.../d", `levels` components.
-    static std::string Deep(int levels) {
-        std::string path;
-        for (int i = 0; i < levels; ++i) path += "/d";
-        return path;
-    }
     // A queue line of the music share: `inside` and, for event 256, `old` beneath the share.
     std::string Record(const std::string& inside, int event = 1, const std::string& old = "") const {
         return "{\"event\":" + std::to_string(event) + ",\"path\":\"" + music_ + inside + "\"" +
@@ -64,8 +58,8 @@ TEST_F(ExplainTest, NamesTheRefusingRuleAndAgreesWithCanPathBeIndexed) {
          "canonical_path", "it is not its own real path, " + music_ + "/a: a symbolic link"},
         {"/music/a/@tmp/x", [this] { MakeDir(music_ + "/a/@tmp/x"); }, "entry", "a component is a system name"},
         {"/music/a/.DS_Store", [this] { MakeDir(music_ + "/a/.DS_Store"); }, "entry", "a component is a system name"},
-        {"/music" + Deep(64), [this] { MakeDir(music_ + Deep(64)); }, Json::Value(), ""},
-        {"/music" + Deep(65), [this] { MakeDir(music_ + Deep(65)); }, "entry", "too deep: more than 64 levels"},
+        {"/music" + testkit::Deep(64), [this] { MakeDir(music_ + testkit::Deep(64)); }, Json::Value(), ""},
+        {"/music" + testkit::Deep(65), [this] { MakeDir(music_ + testkit::Deep(65)); }, "entry", "too deep: more than 64 levels"},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.path);

@@ -187,8 +187,7 @@ TEST_F(HostileShareTest, CorruptionMetLaterSetsTheIndexAsideAndMarksTheShare) {
 // hidden and system names at any level, links on the way, and what lies past the depth bound
 // (logged once).
 TEST_F(HostileShareTest, LiveRecordsAndWalksGiveTheSameIndex) {
-    std::string deep = music_;
-    for (int depth = 1; depth < QIRA::FILEINDEX::MaxEntryDepth(); ++depth) deep += "/d";
+    const std::string deep = music_ + testkit::Deep(QIRA::FILEINDEX::MaxEntryDepth() - 1);
     MakeDir(deep + "/e");
     const std::vector<std::string> files = {"/#recycle/r.txt", "/#snapshot/s.txt", "/a/@tmp/t.txt", "/a/@__thumb/u.txt",
                                             "/a/@eaDir/v.txt", "/a/.DS_Store", "/a/ok.txt"};

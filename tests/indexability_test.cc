@@ -138,8 +138,7 @@ TEST_F(IndexabilityTest, EntryRulesTakeCanonicalPathsBeneathTheShareAndRefuseThe
         const char* refusal = EntryRefusal(dir_, c.path, false);
         EXPECT_EQ(std::string(refusal ? refusal : "-"), std::string(c.refusal ? c.refusal : "-"));
     }
-    std::string deep = dir_;
-    for (int depth = 1; depth <= MaxEntryDepth(); ++depth) deep += "/d";
+    const std::string deep = dir_ + testkit::Deep(MaxEntryDepth());
     EXPECT_EQ(EntryRefusal(dir_, deep, true), nullptr);
     EXPECT_STREQ(EntryRefusal(dir_, deep + "/d", false), "too_deep");
     EXPECT_STREQ(ChildRefusal(dir_ + "/x", "x", MaxEntryDepth() + 1, false), "too_deep");

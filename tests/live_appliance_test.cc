@@ -66,9 +66,7 @@ protected:
         ASSERT_TRUE(testkit::WaitFor([&] { return Logged(daemonLog_, "listening on"); }));
     }
     void TearDown() override {
-        if (indexer_ > 0) {
-            EXPECT_EQ(testkit::Stop(indexer_), 0) << testkit::ReadFile(daemonLog_);
-        }
+        if (indexer_ > 0) { EXPECT_EQ(testkit::Stop(indexer_), 0) << testkit::ReadFile(daemonLog_); }
         NotifierTest::TearDown();
     }
     std::vector<std::string> Search(const std::vector<std::string>& extra) {
@@ -153,8 +151,7 @@ TEST_F(LiveApplianceTest, EaDirOutsideFoldersSwitchedOffKindsAndDeletedFoldersSt
 // The notifier watches as deep as the index reaches and no deeper, and says so once; a file past
 // the bound stays out of the index, one at the bound is found.
 TEST_F(LiveApplianceTest, TreesDeeperThanTheBoundAreNeitherWatchedNorIndexed) {
-    std::string deep = "/a";
-    for (int depth = 2; depth < MaxEntryDepth(); ++depth) deep += "/d";
+    const std::string deep = "/a" + testkit::Deep(MaxEntryDepth() - 2);
     MakeDir(music_ + deep + "/e/f");  // e lies at the bound, f past it
     MakeDir(music_ + deep + "/e2");
     Index("/music/a", R"("document": true)");

@@ -517,12 +517,7 @@ TEST_F(ToolTest, APacedDaemonAppliesAtMostItsPacePerPass) {
     const pid_t daemon = testkit::Start({FILEINDEXD_REF, "--interval", "5", "--pace", "7"}, log);
     const std::shared_ptr<void> stop(nullptr, [daemon](void*) { EXPECT_EQ(testkit::Stop(daemon), 0); });
     ASSERT_TRUE(testkit::WaitFor([&] { return testkit::RecordsApplied(testkit::ReadFile(log), "music") == 50; }));
-    std::vector<unsigned long> slices;
-    for (const std::string& line : Lines(testkit::ReadFile(log))) {
-        const size_t at = line.find("share music: ");
-        if (at != std::string::npos && line.find(" records applied") != std::string::npos) slices.push_back(std::stoul(line.substr(at + 13)));
-    }
-    EXPECT_EQ(slices, (std::vector<unsigned long>{7, 7, 7, 7, 7, 7, 7, 1}));
+    EXPECT_EQ(testkit::AppliedSlices(testkit::ReadFile(log), "music"), (std::vector<size_t>{7, 7, 7, 7, 7, 7, 7, 1}));
 }
 
 // A pause holds the work back; progress --watch shows the backlog shrink once the daemon drains
@@ -546,9 +541,7 @@ TEST_F(ToolTest, TheDaemonStandInHoldsWorkBackWhilePausedAndProgressFollowsTheDr
     const pid_t watch = testkit::Start({FILEINDEXCTL, "progress", "--watch", "--interval", "0.05"}, samples);
     const auto backlogs = [&] {
         std::vector<unsigned> seen;
-        for (const std::string& line : Lines(testkit::ReadFile(samples))) {
-            seen.push_back(testkit::ParseJson(line)["shares"][0]["files_left"].asUInt());
-        }
+        for (const auto& sample : testkit::ReadJsonLines(samples)) seen.push_back(sample["shares"][0]["files_left"].asUInt());
         return seen;
     };
     ASSERT_TRUE(testkit::WaitFor([&] { return !backlogs().empty(); }));

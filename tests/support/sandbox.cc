@@ -8,6 +8,7 @@
 #include <cstring>
 #include <filesystem>
 #include <fstream>
+#include <numeric>
 #include <sstream>
 
 #include "fileindex/json.h"
@@ -116,15 +117,20 @@ std::vector<std::string> JournalOps() {
     return ops;
 }
 
-size_t RecordsApplied(const std::string& daemonLog, const std::string& share) {
+std::vector<size_t> AppliedSlices(const std::string& daemonLog, const std::string& share) {
     const std::string marker = "fileindexd-ref: share " + share + ": ";
-    size_t applied = 0;
+    std::vector<size_t> slices;
     for (size_t at = daemonLog.find(marker); at != std::string::npos; at = daemonLog.find(marker, at + 1)) {
         char* end = nullptr;
         const unsigned long count = std::strtoul(daemonLog.c_str() + at + marker.size(), &end, 10);
-        if (std::strncmp(end, " records applied", 16) == 0) applied += count;  // not "records not applied"
+        if (std::strncmp(end, " records applied", 16) == 0) slices.push_back(count);  // not "records not applied"
     }
-    return applied;
+    return slices;
+}
+
+size_t RecordsApplied(const std::string& daemonLog, const std::string& share) {
+    const std::vector<size_t> slices = AppliedSlices(daemonLog, share);
+    return std::accumulate(slices.begin(), slices.end(), size_t{0});
 }
 
 }  // namespace testkit

@@ -48,10 +48,15 @@ mode_t ModeOf(const std::string& path);
 // Descriptors this process has open now.
 size_t OpenDescriptors();
 
+// "/d/d/.../d", `levels` components.
+inline std::string Deep(int levels) { std::string path; while (levels-- > 0) path += "/d"; return path; }
+
 // How often `needle` occurs in `text`.
 size_t CountOf(const std::string& text, const std::string& needle);
 
-// The records the daemon stand-in's log says it applied to the share's index, in all.
+// The records the daemon stand-in's log says it applied to the share's index, slice by slice
+// and in all.
+std::vector<size_t> AppliedSlices(const std::string& daemonLog, const std::string& share);
 size_t RecordsApplied(const std::string& daemonLog, const std::string& share);
 
 // Journal entries as "op" or "op arg1 arg2 ..." strings.
