@@ -8,6 +8,9 @@ run it on a clone before and after, and compare.
 --faults takes the faults from FILE instead, a JSON list of [file, text, replacement] triples:
 faults written by someone who has not read the tests.
 
+--every runs the whole suite for each fault and names every test that failed, not only the
+first: which tests catch a fault that no other test catches, before a test is dropped.
+
 The checkout is changed and restored file by file; use a clone, not the tree you work in.
 """
 import argparse
@@ -134,11 +137,17 @@ def first_failure(ctest_output):
     return ""
 
 
+def every_failure(ctest_output):
+    listed = ctest_output.split("The following tests FAILED:", 1)[-1] if "tests FAILED:" in ctest_output else ""
+    return ",".join(line.split(" - ", 1)[1].split(" (")[0] for line in listed.splitlines() if " - " in line)
+
+
 def main():
     parser = argparse.ArgumentParser(description=__doc__.splitlines()[0])
     parser.add_argument("checkout", type=pathlib.Path)
     parser.add_argument("--only", help="comma-separated fault numbers (1-based)")
     parser.add_argument("--faults", type=pathlib.Path, help="a JSON list of [file, text, replacement]")
+    parser.add_argument("--every", action="store_true", help="run every test and name each that failed")
     args = parser.parse_args()
     faults = [tuple(fault) for fault in json.loads(args.faults.read_text())] if args.faults else FAULTS
     tree = args.checkout.resolve()
@@ -162,9 +171,10 @@ def main():
             if run(["cmake", "--build", str(build), "-j2"], tree).returncode != 0:
                 verdict, detail = "build-error", ""
             else:
-                tests = run(["ctest", "--timeout", "60", "--stop-on-failure", "-j2"], build)
+                ctest = ["ctest", "--timeout", "120", "-j4"] if args.every else ["ctest", "--timeout", "60", "--stop-on-failure", "-j2"]
+                tests = run(ctest, build)
                 verdict = "caught" if tests.returncode != 0 else "missed"
-                detail = first_failure(tests.stdout)
+                detail = every_failure(tests.stdout) if args.every else first_failure(tests.stdout)
                 planted += 1
                 caught += verdict == "caught"
         finally:
