@@ -45,6 +45,7 @@ TEST_F(StatusReportTest, WordsFollowTheQueuesThePauseAndTheNoSpaceFlag) {
         {R"({"resume_time": 0})", music, Record(music_ + "/a/song.mp3"), "/music/a", "paused"},
         {R"({"resume_time": 0, "no_space": {"music": true}})", music, Record(music_ + "/a/x"), "/music/a", "err_no_space"},
         {R"({"resume_time": 0, "no_space": {"music": true}})", music, Record(music_ + "/a/x"), "/photo/a", "finished"},
+        {R"({"no_space": {"music": true}})", "", "", "/music/a", "err_no_space"},  // decided before the queues
         {"", "", "", "/music/missing", "paused"},
         {"", "", "", "/nosuch/a", "paused"},
         {"", music, Record(music_ + "/ab/x"), "/music/ab", "processing"},

@@ -20,6 +20,10 @@ TEST_F(StoragePathsTest, PathsLieInTheSharesEaDirAndTheDatabaseIsCreated) {
     EXPECT_FALSE(testkit::Exists(queue));
     EXPECT_EQ(FILEIDXDBPathGet("music", buffer, sizeof buffer), static_cast<int>(db.size()));  // exists: no log
     EXPECT_TRUE(testkit::LogLines().empty());
+    // A buffer one byte short of the path truncates it, and no directory is made of what is left.
+    std::vector<char> exact(db.size());
+    EXPECT_EQ(FILEIDXDBPathGet("music", exact.data(), static_cast<int>(exact.size())), static_cast<int>(db.size()) - 1);
+    EXPECT_FALSE(testkit::Exists(db.substr(0, db.size() - 1)));
 }
 
 TEST_F(StoragePathsTest, BadArgumentsFailBeforeAnyLookup) {
