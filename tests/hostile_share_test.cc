@@ -265,13 +265,16 @@ TEST_F(HostileShareTest, QueueTakeNeverFollowsLinksSetsAsideWrongKindsAndLosesNo
     EXPECT_NE(testing::internal::GetCapturedStdout().find("1000 records not applied"), std::string::npos);
     EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
     std::vector<std::string> first;
-    for (const auto& [expected, applied] : {std::pair{1000u, 1000u}, {1000u, 2000u}, {500u, 0u}}) {
+    for (const auto& [expected, applied] : {std::pair{1000u, 1000u}, {1000u, 2000u}, {501u, 0u}}) {
         EXPECT_EQ(music.ApplyNext(1000, [&](const Batch& batch) {
             if (first.empty()) first.push_back(batch.front().path);
             return true;
         }), expected);
         EXPECT_EQ(music.HasMore(), expected == 1000u);
         EXPECT_EQ(music.Applied(), applied);  // of the companion being read
+        if (applied != 1000u) continue;
+        testkit::WriteFile(QueueOf("music"), line(music_ + "/a/late.txt"));  // taken behind what is left
+        music.Take();
     }
     EXPECT_EQ(first, std::vector<std::string>{music_ + "/a/0.txt"});  // the failed batch came again
     EXPECT_FALSE(testkit::Exists(QueueOf("music") + ".tmp"));
@@ -326,6 +329,12 @@ TEST_F(HostileShareTest, MovesAndRemovalsKeepToTheirPathAndRenameTheText) {
     ASSERT_TRUE(indexer.Apply({Record(8, music_ + "/a/gone"), Record(1, music_ + "/a/live.txt.bak")}, folders_));
     // ".bak" tells no type: the file is typed by what it holds, text.
     EXPECT_EQ(Found("music"), (Paths{"/music/a/live-2023/y.txt", "/music/a/live.txt", "/music/a/live.txt.bak"}));
+    // A file moved in from a place the index does not keep is indexed at its new path.
+    MakeDir(music_ + "/a/@tmp");
+    testkit::WriteFile(music_ + "/a/@tmp/draft.txt", "drafted");
+    ASSERT_EQ(rename((music_ + "/a/@tmp/draft.txt").c_str(), (music_ + "/a/final.txt").c_str()), 0);
+    ASSERT_TRUE(indexer.Apply({Record(256, music_ + "/a/final.txt", music_ + "/a/@tmp/draft.txt")}, folders_));
+    EXPECT_EQ(Found("music", "drafted"), Paths{"/music/a/final.txt"});
 }
 
 // Names are shown as their bytes, never acted on: the table escapes them as ls does, JSON carries

@@ -30,15 +30,18 @@ TEST_F(ToolTest, FoldersRoundTripThroughJsonOutput) {
     EXPECT_EQ(listing["folder"][0], J(R"({"path": "/music/b", "name": "Songs", "document": false, "audio": true,
                                          "video": false, "photo": false,
                                          "additional": {"status": "processing", "is_valid": true}})"));
+    // A change sets what it names and keeps the other switches.
+    ASSERT_EQ(Ctl({"folder", "set", "/music/a", "--name", "Other"}).status, 0);
     result = Ctl({"--json", "folder", "get", "/music/a"});
-    EXPECT_EQ(testkit::ParseJson(result.out)["result"]["name"].asString(), "Songs");
+    EXPECT_EQ(testkit::ParseJson(result.out)["result"],
+              J(R"({"path": "/music/a", "name": "Other", "document": false, "audio": true, "video": false, "photo": false})"));
 }
 
 // A request comes from standard input; --root stands in for the environment, in both tools.
 TEST_F(ToolTest, RequestsComeFromStandardInputAndTheRootFromTheOption) {
     const std::string root = Path("");
     unsetenv("QIRA_ROOT");
-    const auto result = Ctl({"--root", root, "folder", "set", "--request", "-"}, R"([{"path": "/photo/a", "photo": true}])");
+    const auto result = Ctl({"--root", root, "folder", "set", "--request", "-"}, "[{\"path\": \"/photo/a\",\n  \"photo\": true}]\n");
     const auto shares = testkit::Run({QIRA_SIM, "--root", root, "--json", "share", "list"});
     setenv("QIRA_ROOT", root.c_str(), 1);
     ASSERT_EQ(result.status, 0) << result.err;
@@ -518,6 +521,20 @@ TEST_F(ToolTest, APacedDaemonAppliesAtMostItsPacePerPass) {
     const std::shared_ptr<void> stop(nullptr, [daemon](void*) { EXPECT_EQ(testkit::Stop(daemon), 0); });
     ASSERT_TRUE(testkit::WaitFor([&] { return testkit::RecordsApplied(testkit::ReadFile(log), "music") == 50; }));
     EXPECT_EQ(testkit::AppliedSlices(testkit::ReadFile(log), "music"), (std::vector<size_t>{7, 7, 7, 7, 7, 7, 7, 1}));
+}
+
+// A share marked need-reindex is walked on the daemon stand-in's next pass, and the mark cleared.
+TEST_F(ToolTest, TheDaemonStandInWalksAMarkedShareAndClearsTheMark) {
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {"document": true}})");
+    testkit::WriteFile(music_ + "/a/notes.txt", "walked");
+    ASSERT_TRUE(StatusMgr::ShareSetNeedReindex("music", true));
+    daemon_.reset();
+    const std::string log = Path("/daemon.log");
+    const pid_t daemon = testkit::Start({FILEINDEXD_REF, "--interval", "5"}, log);
+    const std::shared_ptr<void> stop(nullptr, [daemon](void*) { EXPECT_EQ(testkit::Stop(daemon), 0); });
+    ASSERT_TRUE(testkit::WaitFor([&] { return testkit::ReadFile(log).find("reindexed (it was marked") != std::string::npos; }));
+    EXPECT_FALSE(StatusMgr::ShareIsNeedReindex("music"));
+    EXPECT_EQ(testkit::ParseJson(Ctl({"--json", "explain", "/music/a/notes.txt"}).out)["result"]["verdict"], "in the index");
 }
 
 // A pause holds the work back; progress --watch shows the backlog shrink once the daemon drains

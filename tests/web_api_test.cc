@@ -139,27 +139,32 @@ TEST_F(WebApiTest, EveryRouteAnswersWithTheLibrarysResultOrFailure) {
 
 // Pages follow each other in both directions, the same pages the command-line tool shows.
 TEST_F(WebApiTest, FolderPagesFollowEachOtherInBothDirectionsAsInTheTool) {
-    testkit::WriteFile(FolderConf(), R"({"/music/a": {}, "/music/b": {}, "/music/c": {}, "/photo/a": {}, "/photo/b": {}})");
+    // Names sort the other way round from paths.
+    testkit::WriteFile(FolderConf(), R"({"/music/a": {"name": "e"}, "/music/b": {"name": "d"}, "/music/c": {"name": "c"},
+                                         "/photo/a": {"name": "b"}, "/photo/b": {"name": "a"}})");
     const auto paths = [](const Json::Value& listing) {
         std::string shown;
         for (const auto& folder : listing["folder"]) shown += folder["path"].asString() + " ";
         return shown;
     };
-    for (const bool descending : {false, true}) {
-        std::vector<std::string> order = {"/music/a", "/music/b", "/music/c", "/photo/a", "/photo/b"};
-        if (descending) std::reverse(order.begin(), order.end());
+    const std::vector<std::string> byPath = {"/music/a", "/music/b", "/music/c", "/photo/a", "/photo/b"};
+    const std::vector<std::tuple<std::string, std::vector<std::string>, bool>> orders = {
+        {"", {}, false}, {"&sort_direction=DESC", {"--desc"}, true}, {"&sort_by=name", {"--sort", "name"}, true}};
+    for (const auto& [query, options, reversed] : orders) {
+        std::vector<std::string> order = byPath;
+        if (reversed) std::reverse(order.begin(), order.end());
         for (const size_t limit : {1, 2, 3, 5}) {
             for (const size_t offset : {0, 1, 2, 4, 5}) {
-                SCOPED_TRACE((descending ? "DESC" : "ASC") + std::string(" limit ") + std::to_string(limit) + " offset " + std::to_string(offset));
+                SCOPED_TRACE(query + " limit " + std::to_string(limit) + " offset " + std::to_string(offset));
                 std::string expected;
                 for (size_t i = offset; i < std::min(offset + limit, order.size()); ++i) expected += order[i] + " ";
                 const std::string page = "offset=" + std::to_string(offset) + "&limit=" + std::to_string(limit);
-                const Json::Value listing = Get("/api/folders?" + page + (descending ? "&sort_direction=DESC" : "")).body["result"];
+                const Json::Value listing = Get("/api/folders?" + page + query).body["result"];
                 EXPECT_EQ(paths(listing), expected);
                 EXPECT_EQ(listing["offset"].asUInt64(), offset);
                 std::vector<std::string> args = {FILEINDEXCTL, "--json", "folder", "list", "--offset", std::to_string(offset), "--limit",
                                                  std::to_string(limit)};
-                if (descending) args.push_back("--desc");
+                args.insert(args.end(), options.begin(), options.end());
                 EXPECT_EQ(paths(testkit::ParseJson(testkit::Run(args).out)["result"]), expected);
             }
         }
